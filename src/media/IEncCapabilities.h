@@ -1,12 +1,12 @@
 #pragma once
 
-/// What an encoder can do; the operations are those of the kind of encoder.
+// What an encoder can do; the operations are those of the kind of encoder.
 class IEncCapabilities {
 protected:
     ~IEncCapabilities() = default;
 };
 
-/// What a video encoder can do.
+// What a video encoder can do.
 class IVideoEncCapabilities : public IEncCapabilities {
 public:
     virtual bool SupportsBframes() = 0;

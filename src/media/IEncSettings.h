@@ -1,9 +1,9 @@
 #pragma once
 
-/// Settings of an encoder. Setters with a result return the value in force after the call.
+// Settings of an encoder. Setters with a result return the value in force after the call.
 class IEncSettings {
 public:
-    /// Target bit rate, kbit/s.
+    // Target bit rate, kbit/s.
     virtual int GetBitRateKbs() = 0;
     virtual int SetBitRateKbs(int kbs) = 0;
 
@@ -11,16 +11,16 @@ protected:
     ~IEncSettings() = default;
 };
 
-/// Settings of a video encoder.
+// Settings of a video encoder.
 class IVideoEncSettings : public IEncSettings {
 public:
-    /// Key-frame interval in milliseconds; 0 where the interval is counted in frames.
+    // Key-frame interval in milliseconds; 0 where the interval is counted in frames.
     virtual int GetKeyFrameIntMsecs() = 0;
     virtual void SetKeyFrameIntMsecs(int msecs) = 0;
-    /// Key-frame interval in frames, from 1.
+    // Key-frame interval in frames, from 1.
     virtual int GetKeyFrameInt() = 0;
     virtual void SetKeyFrameInt(int frames) = 0;
-    /// B pictures between two anchor pictures.
+    // B pictures between two anchor pictures.
     virtual int GetNumBframes() = 0;
     virtual int SetNumBframes(int count) = 0;
 

@@ -1,7 +1,7 @@
 #pragma once
 
-/// Common base of the objects that describe a stream. It has no operations: the stream's media type
-/// says which derived interface the object is.
+// Common base of the objects that describe a stream. It has no operations: the stream's media type
+// says which derived interface the object is.
 class IMediaConfig {
 protected:
     ~IMediaConfig() = default;

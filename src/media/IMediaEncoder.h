@@ -6,11 +6,11 @@ class IEncCapabilities;
 class IEncRunTimeControl;
 class IEncSettings;
 
-/// An encoder: raw samples in, coded samples out. The three interfaces that it hands out are parts
-/// of the encoder and live as long as it does; their derived kind follows from the media type.
+// An encoder: raw samples in, coded samples out. The three interfaces that it hands out are parts
+// of the encoder and live as long as it does; their derived kind follows from the media type.
 class IMediaEncoder : public ISampleProcessor {
 public:
-    /// Media type code of the coded stream (see MediaType).
+    // Media type code of the coded stream (see MediaType).
     virtual int GetEncoderMediaType() = 0;
     virtual IEncCapabilities* GetEncCapabilities() = 0;
     virtual IEncSettings* GetEncSettings() = 0;

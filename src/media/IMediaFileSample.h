@@ -1,7 +1,7 @@
 #pragma once
 
-/// A sample as the host reads it from a media file, as far as this system looks at it: the host's
-/// interface goes on behind these seven operations. Times are microseconds.
+// A sample as the host reads it from a media file, as far as this system looks at it: the host's
+// interface goes on behind these seven operations. Times are microseconds.
 class IMediaFileSample {
 public:
     virtual unsigned char* GetSampleData() = 0;

@@ -4,13 +4,13 @@
 
 #include "media/ISampleStreamConfig.h"
 
-/// Description of a stream: media type, the object that describes it (borrowed), and the key of an
-/// encrypted stream (an own copy).
+// Description of a stream: media type, the object that describes it (borrowed), and the key of an
+// encrypted stream (an own copy).
 class MediaStreamConfig : public ISampleStreamConfig {
 public:
     MediaStreamConfig(int type, IMediaConfig* config);
     MediaStreamConfig(int type, IMediaConfig* config, bool isEncrypted);
-    /// Encrypted when `key` is not null; copies its `length` bytes.
+    // Encrypted when `key` is not null; copies its `length` bytes.
     MediaStreamConfig(int type, IMediaConfig* config, unsigned char* key, int length);
 
     int GetMediaType() override { return mediaType; }
@@ -23,7 +23,7 @@ public:
 
 private:
     int mediaType;
-    IMediaConfig* mediaConfig;  ///< borrowed
+    IMediaConfig* mediaConfig;  // borrowed
     bool encrypted;
     std::unique_ptr<unsigned char[]> cryptoSessionKey;
     int cryptoSessionKeyLength;
