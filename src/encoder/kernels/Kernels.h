@@ -1,0 +1,147 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+namespace zolt {
+
+// Quantiser of one QP and one rounding: factors per coefficient position. Coefficients of a 4x4
+// block are kept column by column throughout the engine: position 4 * column + row. The factors are
+// symmetric in row and column, so they read the same either way.
+struct Quantizer {
+    alignas(32) std::int16_t forward[16];    // forward factor
+    alignas(32) std::int16_t dequant[16];    // normAdjust4x4 (clause 8.5.9) << (QP / 6)
+    alignas(32) std::int16_t dead_zone[16];  // largest coefficient magnitude whose level is 0
+    std::int32_t rounding;                   // added before the shift
+    std::int32_t shift;                      // 15 + QP / 6
+};
+
+// Levels are limited to this magnitude, the largest that the 28-bit escape code of clause 9.2.2.1
+// can carry at suffixLength 0.
+constexpr int kMaxLevel = 2063;
+
+// The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
+// thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
+// that the entries of the other tables must equal on every input stated here.
+//
+// Samples are 8-bit; strides are in samples. A "16x16 prediction" is 256 samples with stride 16, an
+// "8x8 prediction" 64 samples with stride 8, a "4x4 prediction" 16 samples with stride 4 unless a
+// stride is given; predictions, phases and coefficients are aligned to 32 bytes.
+struct Kernels {
+    const char* name;
+
+    // ---- Distortion of the motion search ----
+
+    // Splits a 16x16 block into its four sampling phases, 8 rows of 16 samples each (512 samples):
+    // phase 0 even rows and even columns, 1 odd rows and odd columns, 2 odd rows and even columns,
+    // 3 even rows and odd columns. A sample of another column parity is stored as 0.
+    void (*split_phases)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* phases);
+
+    // Sums of absolute differences between the phases of a 16x16 block and the block at ref:
+    // sums[p] = the sum over phases 0..p. Stops after phase p (0..2) when sums[p] >= limits[p] and
+    // returns false; returns true when all four sums are there.
+    bool (*sad_phases)(const std::uint8_t* phases, const std::uint8_t* ref, std::ptrdiff_t stride,
+                       const int* limits, int* sums);
+
+    // The same against the rounded average (a + b + 1) >> 1 of the blocks at a and b.
+    bool (*sad_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
+                               const std::uint8_t* b, std::ptrdiff_t stride, const int* limits,
+                               int* sums);
+
+    // ---- Reference planes ----
+
+    // Repeats the outermost samples of a width x height plane into the border around it.
+    void (*extend_edges)(std::uint8_t* origin, int width, int height, std::ptrdiff_t stride,
+                         int border);
+
+    // One row of count half samples below (rows -2..+3 are read) or right of (columns -2..+3 are
+    // read) the samples at src: clip((E - 5F + 20G + 20H - 5I + J + 16) >> 5), clause 8.4.2.2.1.
+    void (*half_vertical_row)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* dst,
+                              int count);
+    void (*half_horizontal_row)(const std::uint8_t* src, std::uint8_t* dst, int count);
+
+    // ---- Inter prediction ----
+
+    void (*copy_16x16)(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride);
+    void (*average_16x16)(std::uint8_t* pred, const std::uint8_t* a, std::ptrdiff_t a_stride,
+                          const std::uint8_t* b, std::ptrdiff_t b_stride);
+    // The centre half samples j of clause 8.4.2.2.1, from unrounded intermediate sums.
+    void (*centre_16x16)(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride);
+    // Bilinear chroma samples of clause 8.4.2.2.2; fx, fy in eighth pels, 0..7.
+    void (*chroma_8x8)(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int fx,
+                       int fy);
+
+    // ---- Residual ----
+
+    // Prediction error and forward core transform. Luma: 16 blocks in decoding order (Figure 6-10);
+    // chroma: the four blocks of one 8x8 component in raster order; one 4x4 block.
+    void (*transform_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
+                            const std::uint8_t* pred, std::int16_t* coefs);
+    void (*transform_8x8)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
+                          std::int16_t* coefs);
+    void (*transform_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
+                          std::int16_t* coefs);
+
+    // Quantises count blocks of 16 coefficients: level = sign(c) * min((|c| * forward + rounding)
+    // >> shift, kMaxLevel). Writes each block's levels in zig-zag order (clause 8.5.6, frame) to
+    // scan and replaces the coefficients by level * dequant. Returns a mask, bit n set when block n
+    // has a level other than 0. Needs |c| * forward + rounding < 2^31 and |c| < 2^15.
+    std::uint32_t (*quantize)(std::int16_t* coefs, int count, const Quantizer& quantizer,
+                              std::int16_t* scan);
+
+    // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and
+    // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction.
+    void (*reconstruct_16x16)(const std::int16_t* coefs, std::uint32_t mask,
+                              const std::uint8_t* pred, std::uint8_t* dst, std::ptrdiff_t stride);
+    void (*reconstruct_8x8)(const std::int16_t* coefs, std::uint32_t mask, const std::uint8_t* pred,
+                            std::uint8_t* dst, std::ptrdiff_t stride);
+    void (*reconstruct_4x4)(const std::int16_t* coefs, const std::uint8_t* pred, std::uint8_t* dst,
+                            std::ptrdiff_t stride);
+
+    // ---- Features and distortions of the intra decisions ----
+
+    // Sums of the 16 samples of each 4x4 block of a 16x16 block, blocks in raster order.
+    void (*block_sums)(const std::uint8_t* src, std::ptrdiff_t stride, std::int32_t* sums);
+
+    // With H the 4x4 Hadamard transform of 16 values (|value| < 2^16) and F = (|H| + 8) >> 4:
+    // energy[0] = F of the constant term, [1] the other three of the first row (horizontal
+    // frequencies), [2] the other three of the first column, [3] the remaining nine.
+    void (*hadamard_energy)(const std::int32_t* values, std::int32_t* energy);
+
+    // Distortion of a prediction at every sampling phase. 16x16: phase (x, y) at [4 * y + x] is the
+    // sum of absolute differences at the 16 samples (x + 4i, y + 4j). 8x8 and 4x4: the absolute sum
+    // of the 2x2 Hadamard transform of the differences at (x, y), (x + d, y), (x, y + d) and
+    // (x + d, y + d); 8x8: d = 4, 16 phases at [4 * y + x]; 4x4: d = 2, 4 phases at [2 * y + x].
+    void (*phase_sad_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
+                            const std::uint8_t* pred, std::int32_t* distortion);
+    void (*phase_satd_8x8)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
+                           std::int32_t* distortion);
+    void (*phase_satd_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
+                           std::int32_t* distortion);
+
+    // ---- Deblocking (clause 8.7.2) ----
+
+    // Filters one macroblock edge: pix is the first sample on the q side; "vertical" edges are
+    // crossed horizontally. Luma edges have 16 lines, chroma edges 8. tc0 holds tC0 of the edge's
+    // four segments (bS 1..3), -1 for a segment that is not filtered.
+    using NormalFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta,
+                                  const std::int8_t* tc0);
+    // The same with bS 4.
+    using StrongFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta);
+    NormalFilter deblock_luma_vertical;
+    NormalFilter deblock_luma_horizontal;
+    NormalFilter deblock_chroma_vertical;
+    NormalFilter deblock_chroma_horizontal;
+    StrongFilter deblock_luma_vertical_strong;
+    StrongFilter deblock_luma_horizontal_strong;
+    StrongFilter deblock_chroma_vertical_strong;
+    StrongFilter deblock_chroma_horizontal_strong;
+};
+
+// The tables this build has; scalar_kernels() runs on any processor.
+const Kernels& scalar_kernels();
+
+// The fastest table that this processor can run, chosen once per process.
+const Kernels& best_kernels();
+
+}  // namespace zolt
