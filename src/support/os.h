@@ -13,6 +13,9 @@ int os_last_error();
 // `size` is below 1.
 void os_error_text(int code, char* text, int size);
 
+// The number of this process.
+long os_process_id();
+
 // Sets an environment variable of this process, replacing an older value. Not safe beside other
 // threads that read or write the environment.
 void os_set_environment(const char* name, const char* value);

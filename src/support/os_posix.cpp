@@ -1,3 +1,5 @@
+#include <unistd.h>
+
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
@@ -20,6 +22,10 @@ void os_error_text(int code, char* text, int size) {
     // entries are constants, which makes this safe on any thread.
     const char* known = strerrordesc_np(code);
     std::snprintf(text, static_cast<size_t>(size), "%s", known ? known : "Unknown WIN32 error");
+}
+
+long os_process_id() {
+    return getpid();
 }
 
 void os_set_environment(const char* name, const char* value) {
