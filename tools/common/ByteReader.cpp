@@ -1,0 +1,118 @@
+#include "common/ByteReader.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <utility>
+
+#include "common/StopSignal.h"
+#include "common/ToolError.h"
+
+namespace zolt {
+
+ByteReader::ByteReader(const std::string& file_name)
+    : name_(file_name == "-" ? "standard input" : file_name), buffer_(kBufferSize) {
+    if (file_name == "-") {
+        descriptor_ = STDIN_FILENO;
+        return;
+    }
+    descriptor_ = open(file_name.c_str(), O_RDONLY | O_CLOEXEC);
+    if (descriptor_ < 0) {
+        throw ToolError(name_ + ": cannot be read: " + std::strerror(errno));
+    }
+}
+
+ByteReader::~ByteReader() {
+    if (descriptor_ > STDIN_FILENO) {
+        close(descriptor_);
+    }
+}
+
+ByteReader::ByteReader(ByteReader&& other) noexcept
+    : name_(std::move(other.name_)),
+      descriptor_(std::exchange(other.descriptor_, -1)),
+      buffer_(std::move(other.buffer_)),
+      begin_(std::exchange(other.begin_, 0)),
+      end_(std::exchange(other.end_, 0)) {}
+
+std::string_view ByteReader::peek(std::size_t count) {
+    if (buffered() < count) {
+        std::memmove(buffer_.data(), buffer_.data() + begin_, buffered());
+        end_ = buffered();
+        begin_ = 0;
+        while (end_ < count) {
+            const std::size_t got = read_some(buffer_.data() + end_, buffer_.size() - end_);
+            if (got == 0) {
+                break;
+            }
+            end_ += got;
+        }
+    }
+    return {reinterpret_cast<const char*>(buffer_.data()) + begin_, std::min(count, buffered())};
+}
+
+std::size_t ByteReader::read(void* data, std::size_t size) {
+    auto* const bytes = static_cast<unsigned char*>(data);
+    std::size_t taken = std::min(size, buffered());
+    std::memcpy(bytes, buffer_.data() + begin_, taken);
+    begin_ += taken;
+    while (taken < size) {
+        const std::size_t got = read_some(bytes + taken, size - taken);
+        if (got == 0) {
+            break;
+        }
+        taken += got;
+    }
+    return taken;
+}
+
+ByteReader::Line ByteReader::read_line(std::string& line, std::size_t max_length) {
+    line.clear();
+    while (true) {
+        const std::string_view next = peek(1);
+        if (next.empty()) {
+            return line.empty() ? Line::end_of_input : Line::cut_off;
+        }
+        if (next[0] == '\n') {
+            ++begin_;
+            return Line::whole;
+        }
+        if (line.size() == max_length) {
+            return Line::too_long;
+        }
+        line.push_back(next[0]);
+        ++begin_;
+    }
+}
+
+std::optional<std::int64_t> ByteReader::bytes_left() const {
+    struct stat status;
+    if (fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) {
+        return std::nullopt;
+    }
+    const off_t position = lseek(descriptor_, 0, SEEK_CUR);
+    if (position < 0) {
+        return std::nullopt;
+    }
+    return std::max<std::int64_t>(0, status.st_size - position) +
+           static_cast<std::int64_t>(buffered());
+}
+
+std::size_t ByteReader::read_some(unsigned char* data, std::size_t size) {
+    while (StopSignal::received() == 0) {
+        const ssize_t got = ::read(descriptor_, data, size);
+        if (got >= 0) {
+            return static_cast<std::size_t>(got);
+        }
+        if (errno != EINTR) {
+            throw ToolError(name_ + ": cannot be read: " + std::strerror(errno));
+        }
+    }
+    return 0;
+}
+
+}  // namespace zolt

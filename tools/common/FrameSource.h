@@ -1,0 +1,37 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "common/FrameRate.h"
+#include "common/PictureFormat.h"
+
+namespace zolt {
+
+// Pictures of one size and format, one after the other.
+class FrameSource {
+public:
+    virtual ~FrameSource() = default;
+
+    // What to call the source in a message.
+    virtual std::string name() const = 0;
+
+    virtual PictureFormat format() const = 0;
+
+    // The rate that the source states; nothing where it states none.
+    virtual std::optional<FrameRate> frame_rate() const = 0;
+
+    // What the user should know about the pictures, as part of a one-line note; empty for nothing.
+    virtual std::string remark() const { return ""; }
+
+    // About how many pictures are left to read; nothing where that cannot be known. For progress
+    // reports only.
+    virtual std::optional<std::int64_t> frames_left() const = 0;
+
+    // Reads the next picture into `sample` (format().sample_bytes() long); false at the end. Throws
+    // TruncatedInput when the input ends within a picture and ToolError when it cannot be read.
+    virtual bool read(unsigned char* sample) = 0;
+};
+
+}  // namespace zolt

@@ -1,0 +1,207 @@
+#include "zoltenc/EncodeRun.h"
+
+#include <algorithm>
+#include <cstdio>
+
+#include "common/RawReader.h"
+#include "common/StopSignal.h"
+#include "common/ToolError.h"
+#include "media/IConfigVideoAvc.h"
+#include "zoltenc/EncoderLibrary.h"
+#include "zoltenc/EncoderSession.h"
+#include "zoltenc/HostServices.h"
+#include "zoltenc/Progress.h"
+#include "zoltenc/open_source.h"
+
+namespace zolt {
+namespace {
+
+constexpr const char* kLibraryName = "libVideoH264ZoltEnc.so";
+
+std::string size_text(int width, int height) {
+    return std::to_string(width) + "x" + std::to_string(height);
+}
+
+std::string hex_text(const unsigned char* data, int size) {
+    std::string text;
+    for (int i = 0; i < size; ++i) {
+        char byte[4];
+        std::snprintf(byte, sizeof byte, " %02X", data[i]);
+        text += byte;
+    }
+    return text;
+}
+
+}  // namespace
+
+EncodeRun::EncodeRun(const Options& options)
+    : options_(options), source_(open_source(options)), output_(options.output) {
+    if (!options_.stats.empty()) {
+        stats_.emplace(options_.stats);
+    }
+    check_outputs();
+    choose_frame_rate();
+    if (options_.raw_format && dynamic_cast<RawReader*>(source_.get()) == nullptr) {
+        note(source_->name() + " has a size and a format of its own; --size and --format are for " +
+             "raw input");
+    }
+    if (!source_->remark().empty()) {
+        note(source_->name() + ": " + source_->remark());
+    }
+}
+
+void EncodeRun::run() {
+    skip_frames();
+
+    // What the library prints on standard output must not enter the stream.
+    HostServices::divert_library_output(options_.verbose);
+    HostServices::announce();
+    const EncoderLibrary library(options_.plugin.empty()
+                                     ? (HostServices::directory() / kLibraryName).string()
+                                     : options_.plugin);
+    EncoderSession session(library, source_->format(), frame_rate_,
+                           {options_.bit_rate_kbs, options_.key_frame_interval}, consumer_);
+    describe(library);
+
+    Progress progress(expected_frames(), frame_rate_, !options_.quiet);
+    try {
+        encode_all(session, progress);
+    } catch (const ToolError&) {
+        progress.clear();
+        if (options_.keep_partial && consumer_.pictures() > 0) {
+            commit();
+        }
+        throw;
+    }
+    progress.clear();
+    if (consumer_.pictures() == 0) {
+        if (StopSignal::received() != 0) {
+            return;
+        }
+        throw ToolError(!cut_.empty()
+                            ? cut_
+                            : source_->name() + ": holds no picture" +
+                                  (options_.skip > 0 ? " after those left out by --skip" : ""));
+    }
+    commit();
+    if (StopSignal::received() != 0) {
+        note("stopped by a signal; what was coded so far is in " + output_.name());
+    }
+    if (!options_.quiet) {
+        std::fprintf(stderr, "%s: %s\n", output_.name().c_str(),
+                     progress.summary(consumer_.pictures(), consumer_.bytes()).c_str());
+    }
+    if (options_.demonstration && !options_.quiet) {
+        std::fprintf(stderr, "To look at it: ffplay %s (or any player of H.264 streams)\n",
+                     output_.name().c_str());
+    }
+    if (!cut_.empty()) {
+        throw ToolError(cut_ + "; the pictures before it are in " + output_.name());
+    }
+}
+
+void EncodeRun::check_outputs() const {
+    const auto refuse_input = [this](const OutputFile& file) {
+        if (file.would_replace(options_.input)) {
+            throw UsageError(file.name() + ": is the input too; name another file to write");
+        }
+    };
+    refuse_input(output_);
+    if (!stats_) {
+        return;
+    }
+    refuse_input(stats_->file());
+    if (stats_->file().would_replace(output_)) {
+        throw UsageError(output_.name() + ": cannot hold both the stream and --stats");
+    }
+}
+
+void EncodeRun::skip_frames() {
+    std::vector<unsigned char> picture(source_->format().sample_bytes());
+    for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture.data()); ++frame) {}
+}
+
+void EncodeRun::choose_frame_rate() {
+    const std::optional<FrameRate> stated = source_->frame_rate();
+    frame_rate_ = stated ? *stated : options_.frame_rate.value_or(FrameRate{});
+    if (stated && options_.frame_rate) {
+        note(source_->name() + " states " + stated->to_string() +
+             " frames/s; --fps is for input that states none");
+    }
+}
+
+std::optional<std::int64_t> EncodeRun::expected_frames() const {
+    const std::optional<std::int64_t> left = source_->frames_left();
+    return left && options_.frames ? std::min(*left, *options_.frames)
+                                   : (left ? left : options_.frames);
+}
+
+void EncodeRun::describe(const EncoderLibrary& library) const {
+    const PictureFormat input = source_->format();
+    IConfigVideoAvc& stream = *consumer_.stream();
+    const std::string coded_size = size_text(stream.GetWidth(), stream.GetHeight());
+    if (stream.GetWidth() != input.width || stream.GetHeight() != input.height) {
+        note("the middle " + coded_size + " of the " + size_text(input.width, input.height) +
+             " pictures are coded: sides are multiples of 16");
+    }
+    if (!options_.verbose) {
+        return;
+    }
+    std::fprintf(stderr, "encoder: %s (%s)\n", library.encoder_name(), library.file_name().c_str());
+    std::fprintf(stderr, "input: %s, %s, %s frames/s\n", source_->name().c_str(),
+                 size_text(input.width, input.height).c_str(), frame_rate_.to_string().c_str());
+    std::fprintf(stderr, "stream: %s, bit rate %d kbit/s, key-frame interval %d\n",
+                 coded_size.c_str(), options_.bit_rate_kbs, options_.key_frame_interval);
+    std::fprintf(stderr, "sequence parameter set:%s\npicture parameter set:%s\n",
+                 hex_text(stream.GetSeqParSetData(), stream.GetSeqParSetSize()).c_str(),
+                 hex_text(stream.GetPicParSetData(), stream.GetPicParSetSize()).c_str());
+}
+
+void EncodeRun::encode_all(EncoderSession& session, Progress& progress) {
+    if (stats_) {
+        consumer_.set_picture_listener(
+            [this](const unsigned char* nal, std::size_t size, std::int64_t time) {
+                stats_->add(*consumer_.stream(), nal, size, time);
+            });
+    }
+    std::vector<unsigned char> picture(source_->format().sample_bytes());
+    for (std::int64_t frame = 0; frame != options_.frames.value_or(-1); ++frame) {
+        if (!read_picture(picture)) {
+            break;
+        }
+        session.encode(picture, frame_rate_.sample_time(frame));
+        progress.update(consumer_.pictures(), consumer_.bytes());
+    }
+    session.end();
+}
+
+// Reads the next picture; false at the end of the input, wherever that is, and after a stop signal.
+bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
+    if (StopSignal::received() != 0) {
+        return false;
+    }
+    try {
+        return source_->read(picture.data());
+    } catch (const TruncatedInput& error) {
+        // A stop signal cuts off the input too.
+        if (StopSignal::received() == 0) {
+            cut_ = error.what();
+        }
+        return false;
+    }
+}
+
+void EncodeRun::commit() {
+    output_.commit();
+    if (stats_) {
+        stats_->commit();
+    }
+}
+
+void EncodeRun::note(const std::string& text) const {
+    if (!options_.quiet) {
+        std::fprintf(stderr, "zoltenc: note: %s\n", text.c_str());
+    }
+}
+
+}  // namespace zolt

@@ -1,0 +1,37 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+class IMediaEncoder;
+
+namespace zolt {
+
+// An encoder plug-in: a shared library with the exports GetEncoderType, GetEncoderName and
+// GetNewEncoder. Its encoders must be gone before this object is.
+class EncoderLibrary {
+public:
+    // Throws a ToolError that names the file when it cannot be loaded or is no AVC encoder.
+    explicit EncoderLibrary(const std::string& file_name);
+    ~EncoderLibrary();
+    EncoderLibrary(const EncoderLibrary&) = delete;
+    EncoderLibrary& operator=(const EncoderLibrary&) = delete;
+
+    const std::string& file_name() const { return file_name_; }
+
+    // The encoder's display name.
+    const char* encoder_name() const { return get_encoder_name_(); }
+
+    std::unique_ptr<IMediaEncoder> new_encoder() const;
+
+private:
+    template <class Function>
+    Function find(const char* name) const;
+
+    std::string file_name_;
+    std::unique_ptr<void, int (*)(void*)> handle_;
+    const char* (*get_encoder_name_)() = nullptr;
+    IMediaEncoder* (*get_new_encoder_)() = nullptr;
+};
+
+}  // namespace zolt

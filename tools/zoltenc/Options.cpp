@@ -1,0 +1,161 @@
+#include "zoltenc/Options.h"
+
+#include <CLI/CLI.hpp>
+#include <iostream>
+#include <limits>
+
+#include "common/SyntheticSource.h"
+#include "common/ToolError.h"
+#include "common/numbers.h"
+
+namespace zolt {
+namespace {
+
+constexpr const char* kDemonstrationOutput = "out.264";
+constexpr FrameRate kMaxFrameRate{1000, 1};
+// The largest bit rate of level 2.2, Main profile (ITU-T H.264 Table A-1).
+constexpr int kMaxBitRateKbs = 4000;
+constexpr int kMaxCount = std::numeric_limits<std::int32_t>::max();
+
+// Refuses what is not a whole number of `low`..`high`.
+CLI::Validator whole_number(int low, int high) {
+    const std::string range = "a whole number from " + std::to_string(low) +
+                              (high == kMaxCount ? "" : " to " + std::to_string(high));
+    return CLI::Validator(
+        [=](std::string& text) -> std::string {
+            const auto number = parse_number(text);
+            const bool fits = number && *number >= low && *number <= high;
+            return fits ? "" : "'" + text + "' is not " + range;
+        },
+        "");
+}
+
+FrameRate parse_frame_rate(const std::string& text) {
+    const auto rate = FrameRate::parse(text);
+    if (!rate || rate->per_second() > kMaxFrameRate.per_second()) {
+        throw UsageError("--fps: '" + text +
+                         "' is not a frame rate above 0 and up to 1000, such as 25, 29.97 or "
+                         "30000/1001");
+    }
+    return *rate;
+}
+
+PictureFormat parse_raw_format(const std::string& size, const std::string& fourcc_text) {
+    PictureFormat format;
+    const std::size_t cross = size.find('x');
+    const auto width = parse_number(size.substr(0, cross));
+    const auto height =
+        cross == std::string::npos ? std::nullopt : parse_number(size.substr(cross + 1));
+    if (!width || !height) {
+        throw UsageError("--size: '" + size + "' is not WIDTHxHEIGHT, such as 176x144");
+    }
+    const std::string error = PictureFormat::size_error(*width, *height);
+    if (!error.empty()) {
+        throw UsageError("--size: " + error);
+    }
+    format.width = *width;
+    format.height = *height;
+    if (!fourcc_text.empty()) {
+        const auto code = PictureFormat::parse_fourcc(fourcc_text);
+        if (!code) {
+            throw UsageError("--format: '" + fourcc_text +
+                             "' is not one of IYUV YUY2 AYUV BGRA RGBA ARGB 'BGR ' 'RGB '");
+        }
+        format.fourcc_code = *code;
+    }
+    return format;
+}
+
+// Options whose values are read after the whole line, since they depend on each other.
+struct OptionTexts {
+    std::string fps;
+    std::string size;
+    std::string format;
+};
+
+// One entry after the other, in the order of the help text.
+void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
+    app.set_version_flag("--version", "zoltenc " ZOLT_VERSION);
+    app.add_option("INPUT", options.input,
+                   "Y4M or raw file, '-' for standard input, or the built-in moving test "
+                   "picture synthetic[:WxH[@FPS[:FRAMES]]]")
+        ->type_name("");
+    app.add_option("-o,--output", options.output, "File to write, '-' for standard output")
+        ->type_name("FILE");
+    app.add_option(
+           "-b,--bitrate", options.bit_rate_kbs,
+           "Target bit rate in kbit/s, up to 4000; 0: no rate control, every picture at QP 28")
+        ->check(whole_number(0, kMaxBitRateKbs))
+        ->type_name("KBPS")
+        ->capture_default_str();
+    app.add_option("-g,--keyint", options.key_frame_interval,
+                   "Key-frame interval in frames, from 1")
+        ->check(whole_number(1, kMaxCount))
+        ->type_name("N")
+        ->capture_default_str();
+    app.add_option("-r,--fps", texts.fps, "Frame rate where the input states none (otherwise 30)")
+        ->type_name("FPS");
+    app.add_option("-s,--size", texts.size, "Picture size of raw input")->type_name("WxH");
+    app.add_option("-f,--format", texts.format,
+                   "Colour format of raw input: IYUV (default) YUY2 AYUV BGRA RGBA ARGB 'BGR ' "
+                   "'RGB '")
+        ->type_name("FOURCC");
+    app.add_option("-n,--frames", options.frames, "Stop after this many frames")
+        ->check(whole_number(1, kMaxCount))
+        ->type_name("N");
+    app.add_option("--skip", options.skip, "Leave out this many frames first")
+        ->check(whole_number(0, kMaxCount))
+        ->type_name("N");
+    app.add_option("--stats", options.stats, "Write a CSV file with one row per picture")
+        ->type_name("FILE");
+    app.add_option("--plugin", options.plugin,
+                   "Encoder library (otherwise libVideoH264ZoltEnc.so beside this program)")
+        ->type_name("FILE");
+    app.add_flag("--keep-partial", options.keep_partial,
+                 "Keep what was written when coding fails in mid-stream");
+    CLI::Option* const quiet = app.add_flag("-q,--quiet", options.quiet, "Report errors only");
+    app.add_flag("-v,--verbose", options.verbose, "Say what is loaded and coded")->excludes(quiet);
+}
+
+}  // namespace
+
+std::optional<Options> Options::parse(int argc, const char* const* argv) {
+    Options options;
+    OptionTexts texts;
+    CLI::App app("Codes video to an H.264 elementary stream (Annex B).", "zoltenc");
+    app.get_formatter()->column_width(34);
+    add_options(app, options, texts);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& request) {
+        app.exit(request);
+        return std::nullopt;
+    } catch (const CLI::ParseError& error) {
+        throw UsageError(std::string(error.what()) + " (zoltenc --help lists the options)");
+    }
+
+    if (app.count("--output") == 0) {
+        if (app.count("INPUT") > 0) {
+            throw UsageError("-o is missing: name the file to write, or '-' for standard output");
+        }
+        options.output = kDemonstrationOutput;
+        options.demonstration = true;
+    }
+    if (options.output.empty() || (options.stats.empty() && app.count("--stats") > 0)) {
+        throw UsageError("an output needs a file name");
+    }
+    if (options.stats == "-") {
+        throw UsageError("--stats: standard output is not taken: name a file");
+    }
+    if (!texts.fps.empty()) {
+        options.frame_rate = parse_frame_rate(texts.fps);
+    }
+    if (!texts.size.empty()) {
+        options.raw_format = parse_raw_format(texts.size, texts.format);
+    } else if (!texts.format.empty()) {
+        throw UsageError("--format: raw input needs its size too: -s WIDTHxHEIGHT");
+    }
+    return options;
+}
+
+}  // namespace zolt
