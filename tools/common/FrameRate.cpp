@@ -1,5 +1,7 @@
 #include "common/FrameRate.h"
 
+#include <algorithm>
+#include <limits>
 #include <numeric>
 
 #include "common/numbers.h"
@@ -58,9 +60,12 @@ double FrameRate::per_second() const {
 }
 
 std::int64_t FrameRate::sample_time(std::int64_t index) const {
-    // index * 1000000 * denominator / numerator, split so that no product leaves 64 bits.
+    // index * 1000000 * denominator / numerator, split so that no product leaves 64 bits: only an
+    // absurdly low rate has times that do.
+    constexpr std::int64_t kMaxSeconds =
+        std::numeric_limits<std::int64_t>::max() / kMicrosecondsPerSecond - 1;
     const std::int64_t scaled = index * denominator;
-    return scaled / numerator * kMicrosecondsPerSecond +
+    return std::min(scaled / numerator, kMaxSeconds) * kMicrosecondsPerSecond +
            scaled % numerator * kMicrosecondsPerSecond / numerator;
 }
 

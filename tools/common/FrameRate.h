@@ -18,7 +18,8 @@ struct FrameRate {
 
     double per_second() const;
 
-    // Time in microseconds of frame `index` (0..2^32 - 1), rounded down.
+    // Time in microseconds of frame `index` (0..2^32 - 1), rounded down; it stays in range
+    // whatever the rate.
     std::int64_t sample_time(std::int64_t index) const;
 
     // "25" or "30000/1001".
