@@ -181,11 +181,15 @@ public:
 
     // ---- rate_control ----
     void InitRateControl();
+    void check_level_limit() const;
     void UpdateRateControlFrameRate(double fps);
     void FrameLevelRateControl();
     void UpdateFrameLevelRateControl();
     void SetMADParameter();
     void SetRDQParameter();
+    void choose_qp_I();
+    void choose_qp_P();
+    void fit_rate_model(int first, int window, const bool* rejected, int n);
     static double QP2Qstep(int qp);
     static int Qstep2QP(double q);
 
@@ -207,53 +211,96 @@ public:
     void processCurrentMB_I();
     void processCurrentMB_P();
     void setMBOffsets();
+    std::ptrdiff_t first_block() const;
+    void code_intra();
+    void code_intra4x4();
+    void set_block_availability();
+    void generatePredError16x16();
+    void predict_inter_chroma();
     void setMBType_CBP();
     void set_pred_MVD();
     void setMBValues_P();
-    void set_SkipMB_Values();
-    void generatePredError16x16();
-    void predict_inter_luma(int mode);
-    void predict_inter_chroma(int list);
 
     // ---- transform ----
-    void quantTransform_luma_4x4();
+    void quantTransform_luma_4x4(int k, const std::uint8_t* pred);
     void quantTransform_luma_16x16();
     void quantTransform_luma_16x16P();
     void quantTransform_chroma();
 
-    // ---- intrapredict ----
-    void ipred4(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
-                int left, int up_right, int up_left, int mode) const;
-    void ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
-                 int left, int mode) const;
-    void ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
-                 int left, int mode) const;
+    // ---- intrapredict: clause 8.3 ----
+    // The 13 neighbours of the 4x4 block at src: L, K, J, I, M, A..H. Where A..D or I..L or M are
+    // not available 128 stands in, for E..H D. Flags: 1 = available.
+    static void gather_neighbours4(std::uint8_t* neighbours, const std::uint8_t* src,
+                                   std::ptrdiff_t stride, int up, int left, int up_right,
+                                   int up_left);
+    // Predictions (strides 4, 16, 8) of a 4x4 luma block, mode 0..8, from its neighbours; of a
+    // 16x16 luma block, mode 0..3; and of an 8x8 chroma block, mode 0..3, from the samples around
+    // src. A mode that does not exist, and a 16x16 mode without its neighbours, end the process
+    // with status 104.
+    static void ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up, int left,
+                       int mode);
+    static void ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
+                        int left, int mode);
+    static void ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
+                        int left, int mode);
 
     // ---- learn: learned intra decisions ----
     int learn16_4();
     int setLearnPIMode();
     int learn16_mode();
     int learn_chroma_mode();
-    int learn4_mode(int k, int predicted_mode);
+    int learn4_mode(int k, int predicted_mode, std::uint8_t* pred);
+    void compute_block_features();
 
-    // ---- cavlc ----
+    // ---- cavlc: macroblock_layer(), clauses 7.3.5 and 9.2 ----
     void writeMBSyntax();
     void writeMBSyntax_P();
+    bool encode_mb_skip();
+    void encode_I4Modes();
+    void encode_MB_Pred_P();
+    void encode_CBP();
+    void encode_coded_blocks();
+    void encodeBlock();
+    void encode_luma_blocks();
+    void encode_chroma_ac_blocks(int component);
+    void encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count, int table);
 
     // ---- diamond: motion search ----
     void initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel);
     void framePredInitP();
-    void make_half_pixel_sds(int list);
-    void generateMBPred(int mb_y, int mb_x, int list);
+    void make_half_pixel_sds();
+    void generateMBPred();
+    void sd_search(_mv& result);
+    void estimate_half_pixel_sds(_mv& record);
+    void estimate_quarter_pixel_sds(_mv& record);
+    std::uint32_t find_sd_sad(const std::uint8_t* ref, std::uint32_t best_cost, int rate);
+    std::uint32_t find_qpix_sd_sad(const std::uint8_t* a, const std::uint8_t* b,
+                                   std::uint32_t best_cost, int rate);
+    int vector_rate(int x, int y) const;
 
     // ---- motioncomp ----
+    // Vector prediction of clause 8.4.1.3 for the partition of w x h samples at block column bx and
+    // row by of the current macroblock, with reference index ref; quarter pels.
     void form_mv_prediction(std::int16_t* pmv_x, std::int16_t* pmv_y, std::int8_t ref, int bx,
-                            int by, int w, int h, int list) const;
+                            int by, int w, int h) const;
+    // Luma prediction of the 16x16 block at sample (px, py) for a vector in quarter pels, and
+    // chroma prediction (plane 0 Cb, 1 Cr) of the 8x8 block at chroma sample (cx, cy) for the same
+    // vector.
     void qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int py) const;
     void qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy, int plane) const;
 
-    // ---- lfilter ----
+    // ---- lfilter: deblocking filter ----
     void filter_frame();
+    void filter_mb(int mb_x, int mb_y);
+    void filter_external_edge(int mb, bool vertical, std::uint8_t* y, std::ptrdiff_t chroma);
+    void filter_internal_edges(int mb, bool vertical, const std::uint8_t (&strengths)[4][4],
+                               std::uint8_t* y, std::ptrdiff_t chroma);
+    void filter_luma_edge(bool vertical, std::uint8_t* pix, int alpha, int beta,
+                          const std::int8_t* tc0, const std::uint8_t* strengths);
+    void filter_chroma_edge(bool vertical, std::ptrdiff_t offset, int alpha, int beta,
+                            const std::int8_t* tc0, const std::uint8_t* strengths);
+    void find_internal_edge_strength(int mb_x, int mb_y);
+    void find_external_edge_strength(int mb_x, int mb_y, bool vertical);
 
     // Writes msg and a line break to standard error and ends the process with status.
     [[noreturn]] static void exitOnError(const char* msg, int status);
@@ -329,13 +376,12 @@ public:
     // ---- Per-macroblock maps of the picture ----
     zolt::AlignedBuffer<std::uint8_t> g_mb_mode_store, g_mb_qp_store;
     zolt::AlignedBuffer<lfdata> g_lf_data_store;
-    zolt::AlignedBuffer<_mv> g_mv_store, g_me_blk_store;
+    zolt::AlignedBuffer<_mv> g_mv_store, g_me_mb_store;
     std::uint8_t* g_mb_mode = nullptr;  // MbMode
     std::uint8_t* g_mb_qp = nullptr;    // luma QP
     lfdata* g_lf_data = nullptr;
     _mv* g_mv_array = nullptr;  // 16x16 search results
-    _mv* g_me_blk_L0 =
-        nullptr;  // integer search results per 8x8 block: neighbours of later searches
+    _mv* g_me_mb_L0 = nullptr;  // their integer stage: the neighbours of later searches
 
     // ---- Per-4x4-block maps of the picture, g_blk_width entries per row ----
     zolt::AlignedBuffer<std::int8_t> g_i4mode_store, g_blk_ref_store;
@@ -409,6 +455,10 @@ public:
     std::uint32_t g_best_sad = 0;       // distortion of the running search's best candidate
     std::uint32_t g_sd_thresh[3] = {};  // partial costs that reject a candidate
     alignas(64) std::uint8_t g_cur_phases[512] = {};  // Kernels::split_phases of the macroblock
+
+    // ---- Deblocking: boundary strengths of the current macroblock ----
+    std::uint8_t bs_ver[4][4] = {};  // [vertical edge, 0 the left one][segment, top to bottom]
+    std::uint8_t bs_hor[4][4] = {};  // [horizontal edge, 0 the top one][segment, left to right]
 
     // ---- Rate control ----
     bool g_rc_initialized = false;            // InitRateControl has run since initialize_encoder

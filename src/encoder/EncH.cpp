@@ -4,4 +4,6 @@
 
 CEncH::CEncH(int width, int height) : encoder(new CEncoder(width, height)) {}
 
-CEncH::~CEncH() { delete encoder; }
+CEncH::~CEncH() {
+    delete encoder;
+}

@@ -84,10 +84,11 @@ struct Kernels {
 
     // Quantises count blocks of 16 coefficients: level = sign(c) * min((|c| * forward + rounding)
     // >> shift, kMaxLevel). Writes each block's levels in zig-zag order (clause 8.5.6, frame) to
-    // scan and replaces the coefficients by level * dequant. Returns a mask, bit n set when block n
-    // has a level other than 0. Needs |c| * forward + rounding < 2^31 and |c| < 2^15.
+    // scan and the mask of its levels that are not 0 to nonzero (bit n: scan position n), and
+    // replaces the coefficients by level * dequant. Returns bit b set when block b has a level
+    // other than 0. Needs |c| < 2^15 and |c| * forward + rounding < 2^31.
     std::uint32_t (*quantize)(std::int16_t* coefs, int count, const Quantizer& quantizer,
-                              std::int16_t* scan);
+                              std::int16_t* scan, std::uint16_t* nonzero);
 
     // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and
     // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction.

@@ -1,0 +1,33 @@
+#pragma once
+
+#include <cstdint>
+
+namespace zolt {
+
+// Number of bits of value up to its highest set bit; 0 for 0.
+inline int bit_length(std::uint32_t value) {
+#if defined(__GNUC__)
+    return value ? 32 - __builtin_clz(value) : 0;
+#else
+    int length = 0;
+    for (; value; value >>= 1) {
+        ++length;
+    }
+    return length;
+#endif
+}
+
+// Number of set bits.
+inline int bit_count(std::uint32_t value) {
+#if defined(__GNUC__)
+    return __builtin_popcount(value);
+#else
+    int count = 0;
+    for (; value; value &= value - 1) {
+        ++count;
+    }
+    return count;
+#endif
+}
+
+}  // namespace zolt

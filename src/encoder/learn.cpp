@@ -1,0 +1,326 @@
+#include <algorithm>
+
+#include "encoder/CEncoder.h"
+#include "encoder/tables.h"
+
+namespace {
+
+// Factors of the mean cost at which a candidate of the 16x16 mode search is dropped, by step.
+constexpr double thresh_16[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
+                                  1.0,  1.0,  1.1, 1.1,  1.0, 1.0, 0.0, 0.0};
+
+// The same for the chroma mode search.
+constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
+                                      1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0};
+
+// Factors of the predicted mode's share at which another 4x4 mode is dropped, by step.
+constexpr double thresh_4[4] = {2.0, 1.25, 1.0, 1.0};
+
+// Thresholds of the inter/intra tree as cubic polynomials of QP, in groups of four thresholds: four
+// cubic coefficients, four quadratic, four linear, four constant.
+constexpr float _treepoly_p_l35[48] = {
+    0.396436f,   -0.116441f,  -0.012461f, -0.074217f,  //
+    -30.936129f, 10.282344f,  1.307947f,  6.329199f,   //
+    802.40155f,  -278.76315f, -37.39575f, -167.7116f,  //
+    -6452.5205f, 2582.634f,   351.42606f, 1483.402f,   //
+    0.292684f,   0.0f,        0.0f,       0.0f,        //
+    -24.174469f, 0.0f,        0.0f,       0.0f,        //
+    661.51605f,  0.0f,        0.0f,       0.0f,        //
+    -5810.929f,  0.0f,        0.0f,       0.0f,        //
+    0.780864f,   0.793735f,   0.0f,       0.0f,        //
+    -61.603695f, -60.94964f,  0.0f,       0.0f,        //
+    1612.2955f,  1538.3248f,  0.0f,       0.0f,        //
+    -13234.332f, -12397.91f,  0.0f,       0.0f,
+};
+constexpr float _treepoly_p_g35[48] = {
+    1.751089f,   0.947046f,   0.298134f,   0.408572f,    //
+    -206.04788f, -109.98172f, -33.901867f, -48.610813f,  //
+    8079.7856f,  4260.11f,    1312.5981f,  1926.6243f,   //
+    -104869.03f, -54870.13f,  -17001.115f, -25251.97f,   //
+    0.271355f,   0.016247f,   2.677083f,   0.0f,         //
+    -30.558363f, -2.014197f,  -320.24258f, 0.0f,         //
+    1151.8096f,  86.05494f,   12779.068f,  0.0f,         //
+    -14434.155f, -1178.2196f, -169667.84f, 0.0f,         //
+    2.273295f,   1.367035f,   0.0f,        0.0f,         //
+    -266.52777f, -164.73254f, 0.0f,        0.0f,         //
+    10416.214f,  6595.0903f,  0.0f,        0.0f,         //
+    -134595.38f, -87233.516f, 0.0f,        0.0f,
+};
+
+constexpr int kHighQp = 35;    // from here on the inter/intra tree has its other form
+constexpr int kFittedQp = 18;  // lowest QP that the 16x16/4x4 thresholds were fitted for
+constexpr int kLargeQp = 32;   // three of those thresholds are 0 up to here
+
+struct Thresholds16_4 {
+    int t[7];
+};
+
+Thresholds16_4 compute16_4_thresh(int qp) {
+    const double q = qp < kFittedQp ? kFittedQp : qp;
+    const bool large = q > kLargeQp;
+    Thresholds16_4 thresholds = {{
+        static_cast<int>(0.236 * (q * q) - 6.487 * q + 76.65),
+        static_cast<int>(0.299 * (q * q) - 12.817 * q + 167.42),
+        large ? static_cast<int>(0.208 * (q * q) - 2.476 * q + 36.18) : 0,
+        static_cast<int>(0.164 * (q * q * q) - 13.728 * (q * q) + 387.89 * q - 3568.3),
+        static_cast<int>(1.009 * (q * q) - 46.551 * q + 584.13),
+        large ? static_cast<int>(1.918 * (q * q) - 123.678 * q + 2044.2) : 0,
+        large ? static_cast<int>(2.907 * (q * q) - 187.278 * q + 3147.0) : 0,
+    }};
+    if (qp < kFittedQp) {
+        for (int& t : thresholds.t) {
+            t = t * qp / kFittedQp;
+        }
+    }
+    return thresholds;
+}
+
+// True: intra 16x16. horizontal, vertical, mixed: texture of the block sums.
+bool decision_tree16_4(const Thresholds16_4& thresholds, int horizontal, int vertical, int mixed) {
+    const int* t = thresholds.t;
+    if (t[0] > mixed) {
+        return t[1] > mixed || (t[3] > vertical && t[4] > horizontal);
+    }
+    return t[2] > mixed && t[5] > horizontal && t[6] > vertical;
+}
+
+struct ThresholdsPI {
+    int t[12];
+};
+
+ThresholdsPI compute_PI_thresh(int qp) {
+    const float* table = qp < kHighQp ? _treepoly_p_l35 : _treepoly_p_g35;
+    const double q = qp;
+    ThresholdsPI thresholds;
+    for (int k = 0; k < 12; ++k) {
+        const float* c = table + 16 * (k / 4) + k % 4;
+        const double cubic = c[0], quadratic = c[4], linear = c[8], constant = c[12];
+        thresholds.t[k] =
+            static_cast<int>(quadratic * (q * q) + cubic * (q * q * q) + linear * q + constant);
+    }
+    return thresholds;
+}
+
+// True: inter. x: mixed texture of the source, y: energy of the inter prediction error.
+bool decision_treePI(int qp, const ThresholdsPI& thresholds, int x, int y) {
+    const int* t = thresholds.t;
+    const bool low_energy = t[0] > y;
+    if (qp < kHighQp) {
+        bool intra;
+        if (low_energy) {
+            intra = t[1] <= y ? t[4] > x : t[3] <= y && t[2] > x;
+        } else {
+            intra = t[8] <= y || t[9] > x;
+        }
+        return !intra;
+    }
+    if (low_energy) {
+        if (t[1] <= x) {
+            return true;
+        }
+        if (t[2] > y) {
+            return t[3] > y || t[5] <= x;
+        }
+        return t[4] <= x && t[6] > y;
+    }
+    return t[8] > y && t[9] <= x;
+}
+
+// The candidates of a progressive elimination and their running costs, by mode number.
+template <int count>
+struct Candidates {
+    bool enabled[count] = {};
+    int cost[count] = {};
+
+    int number() const {
+        int n = 0;
+        for (bool e : enabled) {
+            n += e ? 1 : 0;
+        }
+        return n;
+    }
+
+    double mean_cost() const {
+        int sum = 0;
+        for (int mode = 0; mode < count; ++mode) {
+            sum += enabled[mode] ? cost[mode] : 0;
+        }
+        return static_cast<double>(sum) / number();
+    }
+
+    // The enabled candidate of lowest cost, the first of equal ones; -1 when there is none.
+    int best() const {
+        int best_mode = -1;
+        for (int mode = 0; mode < count; ++mode) {
+            if (enabled[mode] && (best_mode < 0 || cost[mode] < cost[best_mode])) {
+                best_mode = mode;
+            }
+        }
+        return best_mode;
+    }
+};
+
+}  // namespace
+
+// Inter (non-zero) or intra (0) for a macroblock of a P picture, from its source samples and the
+// prediction error of its inter prediction in g_mb_pred.
+int CEncoder::setLearnPIMode() {
+    compute_block_features();
+    std::int32_t residual[16];
+    g_kernels->block_sums(g_mb_pred, 16, residual);
+    for (int b = 0; b < 16; ++b) {
+        residual[b] = g_block_sums[b] - residual[b];
+    }
+    std::int32_t energy[4];
+    g_kernels->hadamard_energy(residual, energy);
+    const int y = energy[0] + energy[1] + energy[2] + energy[3];
+    return decision_treePI(g_mbQp, compute_PI_thresh(g_mbQp), g_block_energy[3], y) ? 1 : 0;
+}
+
+// Intra 16x16 (16) or intra 4x4 (4). In P pictures the features are those of setLearnPIMode.
+int CEncoder::learn16_4() {
+    if (g_slp->sliceType == I_SLICE) {
+        compute_block_features();
+    }
+    return decision_tree16_4(compute16_4_thresh(g_mbQp), g_block_energy[1], g_block_energy[2],
+                             g_block_energy[3])
+               ? 16
+               : 4;
+}
+
+void CEncoder::compute_block_features() {
+    g_kernels->block_sums(g_mb_src_y, g_stride_luma, g_block_sums);
+    g_kernels->hadamard_energy(g_block_sums, g_block_energy);
+}
+
+// Intra 16x16 mode of the macroblock; leaves its prediction in g_mb_pred.
+int CEncoder::learn16_mode() {
+    alignas(64) std::uint8_t pred[4][256];
+    std::int32_t distortion[4][16];
+    Candidates<4> candidates;
+    const bool possible[4] = {g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left};
+    for (int mode = 0; mode < 4; ++mode) {
+        candidates.enabled[mode] = possible[mode];
+        if (possible[mode]) {
+            ipred16(pred[mode], g_mb_src_y, g_stride_luma, g_mb_up, g_mb_left, mode);
+            g_kernels->phase_sad_16x16(g_mb_src_y, g_stride_luma, pred[mode], distortion[mode]);
+        }
+    }
+    int best = -1;
+    for (int step = 0; step < 16; ++step) {
+        for (int mode = 0; mode < 4; ++mode) {
+            candidates.cost[mode] += candidates.enabled[mode] ? distortion[mode][step] : 0;
+        }
+        const double limit = candidates.mean_cost() * thresh_16[step];
+        best = candidates.best();
+        for (int mode = 0; mode < 4; ++mode) {
+            candidates.enabled[mode] =
+                candidates.enabled[mode] && !(candidates.cost[mode] >= limit);
+        }
+        if (candidates.number() < 2) {
+            break;
+        }
+    }
+    g_kernels->copy_16x16(g_mb_pred, pred[best], 16);
+    return best;
+}
+
+// Chroma mode of the macroblock; leaves its predictions in g_mb_pred.
+int CEncoder::learn_chroma_mode() {
+    constexpr int kLastStep = 11;
+    alignas(64) std::uint8_t pred[4][128];  // Cb, Cr
+    std::int32_t distortion[4][2][16];
+    Candidates<4> candidates;
+    const bool possible[4] = {true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left};
+    for (int mode = 0; mode < 4; ++mode) {
+        candidates.enabled[mode] = possible[mode];
+        if (possible[mode]) {
+            ipred_c(pred[mode], g_mb_src_u, g_stride_chroma, g_mb_up, g_mb_left, mode);
+            ipred_c(pred[mode] + 64, g_mb_src_v, g_stride_chroma, g_mb_up, g_mb_left, mode);
+            g_kernels->phase_satd_8x8(g_mb_src_u, g_stride_chroma, pred[mode], distortion[mode][0]);
+            g_kernels->phase_satd_8x8(g_mb_src_v, g_stride_chroma, pred[mode] + 64,
+                                      distortion[mode][1]);
+        }
+    }
+    int best = -1;
+    for (int step = 0; step <= kLastStep; ++step) {
+        for (int mode = 0; mode < 4; ++mode) {
+            if (candidates.enabled[mode]) {
+                candidates.cost[mode] += distortion[mode][0][step] + distortion[mode][1][step];
+            }
+        }
+        candidates.cost[0] -= candidates.enabled[0] ? g_intra_lambda : 0;
+        if (step < 3 || step % 2 == 0) {
+            continue;
+        }
+        const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
+        best = candidates.best();
+        for (int mode = 0; mode < 4; ++mode) {
+            candidates.enabled[mode] = candidates.enabled[mode] && candidates.cost[mode] <= limit;
+        }
+        if (candidates.number() == 0) {
+            break;
+        }
+    }
+    std::copy(pred[best], pred[best] + 128, g_mb_pred + 256);
+    return best;
+}
+
+// Mode of intra 4x4 block k, whose predicted mode is predicted_mode; leaves its prediction in pred.
+int CEncoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
+    const std::uint8_t* src =
+        g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
+    const bool up = g_blk_up[k] != 0;
+    const bool left = g_blk_left[k] != 0;
+    std::uint8_t neighbours[13];
+    gather_neighbours4(neighbours, src, g_stride_luma, up, left, g_blk_up_right[k],
+                       g_blk_up_left[k]);
+
+    std::int32_t distortion[9][4];
+    ipred4(pred, neighbours, up, left, predicted_mode);
+    g_kernels->phase_satd_4x4(src, g_stride_luma, pred, distortion[predicted_mode]);
+    const std::int32_t* d = distortion[predicted_mode];
+    const int predicted_cost = d[0] + d[1] + d[2] + d[3];
+
+    Candidates<9> candidates;
+    const bool both = up && left;
+    const bool possible[9] = {up, left, true, up, both, both, both, up, left};
+    for (int mode = 0; mode < 9; ++mode) {
+        candidates.enabled[mode] = possible[mode] && mode != predicted_mode;
+    }
+    if (candidates.number() == 0 || predicted_cost <= 8 * g_intra_lambda + 64) {
+        return predicted_mode;
+    }
+
+    alignas(32) std::uint8_t other[9][16];
+    for (int mode = 0; mode < 9; ++mode) {
+        if (candidates.enabled[mode]) {
+            ipred4(other[mode], neighbours, up, left, mode);
+            g_kernels->phase_satd_4x4(src, g_stride_luma, other[mode], distortion[mode]);
+        }
+    }
+    const int share = predicted_cost >> 2;
+    for (int step = 0; step < 4; ++step) {
+        for (int mode = 0; mode < 9; ++mode) {
+            if (candidates.enabled[mode]) {
+                candidates.cost[mode] += distortion[mode][step] + 2 * g_intra_lambda;
+            }
+        }
+        if (step == 3) {
+            break;
+        }
+        const double limit = (step + 1) * share * thresh_4[step];
+        for (int mode = 0; mode < 9; ++mode) {
+            candidates.enabled[mode] = candidates.enabled[mode] && !(candidates.cost[mode] > limit);
+        }
+        if (candidates.number() == 0) {
+            return predicted_mode;
+        }
+    }
+    const int best = candidates.best();
+    if (4 * share <= candidates.cost[best]) {
+        return predicted_mode;
+    }
+    std::copy(other[best], other[best] + 16, pred);
+    return best;
+}

@@ -1,0 +1,207 @@
+#include <algorithm>
+#include <cstring>
+
+#include "encoder/CEncoder.h"
+#include "encoder/tables.h"
+
+namespace {
+
+// Writes value to the 4x4 entries at p of a map with `stride` entries per row.
+template <typename T>
+void fill_blocks(T* p, std::ptrdiff_t stride, T value) {
+    for (int row = 0; row < 4; ++row) {
+        std::fill(p + row * stride, p + row * stride + 4, value);
+    }
+}
+
+}  // namespace
+
+// A macroblock of an I picture: decisions, levels, reconstruction, maps.
+void CEncoder::processCurrentMB_I() {
+    setMBOffsets();
+    code_intra();
+}
+
+// A macroblock of a P picture.
+void CEncoder::processCurrentMB_P() {
+    setMBOffsets();
+    generatePredError16x16();
+    g_skip_flag = 0;
+    if (!setLearnPIMode()) {
+        const std::ptrdiff_t block = first_block();
+        fill_blocks(g_blk_mvx + block, g_blk_width, std::int16_t{0});
+        fill_blocks(g_blk_mvy + block, g_blk_width, std::int16_t{0});
+        code_intra();
+        return;
+    }
+    g_cur_mb_mode = MB_P16x16;
+    g_mb_mode[g_mapMBNumber] = MB_P16x16;
+    quantTransform_luma_16x16P();
+    predict_inter_chroma();
+    quantTransform_chroma();
+    setMBValues_P();
+}
+
+// What every macroblock starts with.
+void CEncoder::setMBOffsets() {
+    lfdata& lf = g_lf_data[g_mapMBNumber];
+    lf.disable_flag = static_cast<std::uint8_t>(g_slp->disable_deblocking_filter_idc);
+    lf.alpha_offset = static_cast<std::int8_t>(g_slp->slice_alpha_c0_offset);
+    lf.beta_offset = static_cast<std::int8_t>(g_slp->slice_beta_offset);
+    g_chroma_mode = 0;
+    g_mb_qp[g_mapMBNumber] = static_cast<std::uint8_t>(g_mbQp);
+
+    g_mb_y = g_mapMBNumber / g_mb_width;
+    g_mb_x = g_mapMBNumber % g_mb_width;
+    g_mb_up = g_mb_y > 0;
+    g_mb_left = g_mb_x > 0;
+    g_mb_src_y = g_cur_y + static_cast<std::ptrdiff_t>(16 * g_mb_y) * g_stride_luma + 16 * g_mb_x;
+    const std::ptrdiff_t chroma =
+        static_cast<std::ptrdiff_t>(8 * g_mb_y) * g_stride_chroma + 8 * g_mb_x;
+    g_mb_src_u = g_cur_u + chroma;
+    g_mb_src_v = g_cur_v + chroma;
+
+    g_sad_lambda = zolt::QP2QUANT[std::max(0, g_mbQp - 12)];
+    g_intra_lambda = g_sad_lambda;
+}
+
+// Entry of the macroblock's top left block in the per-4x4-block maps.
+std::ptrdiff_t CEncoder::first_block() const {
+    return static_cast<std::ptrdiff_t>(4 * g_mb_y) * g_blk_width + 4 * g_mb_x;
+}
+
+void CEncoder::code_intra() {
+    fill_blocks(g_blk_ref + first_block(), g_blk_width, std::int8_t{-1});
+    g_cur_mb_mode = learn16_4() == 16 ? MB_INTRA16x16 : MB_INTRA4x4;
+    g_mb_mode[g_mapMBNumber] = g_cur_mb_mode;
+    if (g_cur_mb_mode == MB_INTRA16x16) {
+        // The chroma mode does not depend on luma, nor luma on chroma.
+        g_ipMBPred[0] = static_cast<std::uint8_t>(learn16_mode());
+        quantTransform_luma_16x16();
+    } else {
+        code_intra4x4();
+    }
+    g_chroma_mode = static_cast<std::uint8_t>(learn_chroma_mode());
+    quantTransform_chroma();
+    setMBType_CBP();
+}
+
+// Intra 4x4 luma, block by block: each is predicted from the reconstruction of those before it.
+void CEncoder::code_intra4x4() {
+    set_block_availability();
+    const std::ptrdiff_t stride = g_blk_width + 2;
+    std::int8_t* modes = g_i4mode + (4 * g_mb_y + 1) * stride + 4 * g_mb_x + 1;
+    if (!g_mb_left) {
+        for (int y = 0; y < 4; ++y) {
+            modes[y * stride - 1] = -1;
+        }
+    }
+    if (!g_mb_up) {
+        std::memset(modes - stride, -1, 4);
+    }
+    g_luma_mask = 0;
+    for (int k = 0; k < 16; ++k) {
+        std::int8_t* entry = modes + zolt::luma_scan_j[k] * stride + zolt::luma_scan_i[k];
+        const int above = entry[-stride];
+        const int left = entry[-1];
+        const int predicted = above >= 0 && left >= 0 ? std::min(above, left) : 2;
+
+        alignas(32) std::uint8_t pred[16];
+        const int mode = learn4_mode(k, predicted, pred);
+        *entry = static_cast<std::int8_t>(mode);
+        g_ipMBPred[k] = static_cast<std::uint8_t>(mode);
+        g_prev_intra4x4_pred_mode_flag[k] = mode == predicted;
+        g_rem_intra4x4_pred_mode[k] = static_cast<std::uint8_t>(mode > predicted ? mode - 1 : mode);
+        quantTransform_luma_4x4(k, pred);
+    }
+}
+
+// Neighbour availability of the 4x4 blocks, clause 6.4.11.4 for one slice per picture.
+void CEncoder::set_block_availability() {
+    constexpr unsigned kTopRow = 1u << 0 | 1u << 1 | 1u << 4 | 1u << 5;
+    constexpr unsigned kLeftColumn = 1u << 0 | 1u << 2 | 1u << 8 | 1u << 10;
+    constexpr unsigned kNoUpRight = 1u << 3 | 1u << 7 | 1u << 11 | 1u << 13 | 1u << 15;
+    for (int k = 0; k < 16; ++k) {
+        g_blk_up[k] = (kTopRow >> k & 1) ? g_mb_up : 1;
+        g_blk_left[k] = (kLeftColumn >> k & 1) ? g_mb_left : 1;
+        g_blk_up_left[k] = g_blk_up[k] && g_blk_left[k];
+        g_blk_up_right[k] = (kNoUpRight >> k & 1) ? 0 : g_blk_up[k];
+    }
+    g_blk_up_right[5] = g_mb_up && g_mb_x < g_mb_width - 1;
+}
+
+// Search, vector maps and luma prediction of a P macroblock.
+void CEncoder::generatePredError16x16() {
+    generateMBPred();
+    const _mv& mv = g_mv_array[g_mapMBNumber];
+    const std::int16_t x = static_cast<std::int16_t>(4 * mv.x + mv.dx);
+    const std::int16_t y = static_cast<std::int16_t>(4 * mv.y + mv.dy);
+    const std::ptrdiff_t block = first_block();
+    fill_blocks(g_blk_mvx + block, g_blk_width, x);
+    fill_blocks(g_blk_mvy + block, g_blk_width, y);
+    fill_blocks(g_blk_ref + block, g_blk_width, std::int8_t{0});
+    qpmc_16x16_L0(g_mb_pred, x, y, 16 * g_mb_x, 16 * g_mb_y);
+}
+
+void CEncoder::predict_inter_chroma() {
+    const std::ptrdiff_t block = first_block();
+    for (int plane = 0; plane < 2; ++plane) {
+        qpmc_c_core(g_mb_pred + 256 + 64 * plane, g_blk_mvx[block], g_blk_mvy[block], 8 * g_mb_x,
+                    8 * g_mb_y, plane);
+    }
+}
+
+// mb_type and coded_block_pattern (Tables 7-11, 7-13; clause 7.4.5) of the coded blocks.
+void CEncoder::setMBType_CBP() {
+    const int chroma = g_chroma_ac_mask ? 2 : g_chroma_dc_mask ? 1 : 0;
+    int luma = 0;
+    for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
+        luma |= (g_luma_mask >> (4 * block8x8) & 0xf) ? 1 << block8x8 : 0;
+    }
+    const int intra_base = g_slp->sliceType == P_SLICE ? 5 : 0;  // P: after the inter types
+    switch (g_cur_mb_mode) {
+        case MB_P16x16:
+            g_mb_type = 0;
+            break;
+        case MB_INTRA4x4:
+            g_mb_type = intra_base;
+            break;
+        case MB_INTRA16x16:
+            luma = luma ? 15 : 0;
+            g_mb_type = intra_base + 1 + g_ipMBPred[0] + 4 * chroma + (luma ? 12 : 0);
+            break;
+        default:
+            exitOnError("setMBType_CBP. Unsupported mode\n", -1);
+    }
+    g_coded_block_pattern = luma + 16 * chroma;
+}
+
+// The vector prediction that the search used; the macroblock's neighbours have not changed since.
+void CEncoder::set_pred_MVD() {
+    const std::ptrdiff_t block = first_block();
+    g_mvd_x = static_cast<std::int16_t>(g_blk_mvx[block] - g_pmv_x);
+    g_mvd_y = static_cast<std::int16_t>(g_blk_mvy[block] - g_pmv_y);
+}
+
+// Syntax values of an inter macroblock, and whether it is sent as P_Skip: when it has no levels and
+// its vector is the one a decoder infers (clause 8.4.1.1).
+void CEncoder::setMBValues_P() {
+    setMBType_CBP();
+    set_pred_MVD();
+    const bool last = g_mapMBNumber == g_num_mbs - 1;
+    if (last || g_coded_block_pattern != 0) {
+        return;
+    }
+    const std::ptrdiff_t block = first_block();
+    const auto is_zero = [this](std::ptrdiff_t b) {
+        return g_blk_mvx[b] == 0 && g_blk_mvy[b] == 0;
+    };
+    const auto holds_still = [&](std::ptrdiff_t b) { return g_blk_ref[b] == 0 && is_zero(b); };
+    const bool zero_skip_vector =
+        !g_mb_left || !g_mb_up || holds_still(block - 1) || holds_still(block - g_blk_width);
+    if (zero_skip_vector ? is_zero(block) : g_mvd_x == 0 && g_mvd_y == 0) {
+        // Without levels the reconstruction already is the prediction that the decoder forms.
+        g_skip_flag = 1;
+        g_mb_mode[g_mapMBNumber] = MB_SKIP;
+    }
+}

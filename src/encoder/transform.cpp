@@ -1,0 +1,232 @@
+#include <algorithm>
+#include <cstdlib>
+
+#include "encoder/CEncoder.h"
+#include "encoder/bitops.h"
+#include "encoder/kernels/zigzag.h"
+#include "encoder/tables.h"
+
+namespace {
+
+using zolt::Quantizer;
+
+// Forward quantiser factors by QP % 6 and position class: both coordinates even, both odd, other.
+constexpr std::int16_t quant_coef[6][3] = {{13107, 5243, 8066}, {11916, 4660, 7490},
+                                           {10082, 4194, 6554}, {9362, 3647, 5825},
+                                           {8192, 3355, 5243},  {7282, 2893, 4559}};
+
+// normAdjust4x4 in the same order (clause 8.5.9).
+constexpr std::int16_t dequant_coef[6][3] = {{10, 16, 13}, {11, 18, 14}, {13, 20, 16},
+                                             {14, 23, 18}, {16, 25, 20}, {18, 29, 23}};
+
+constexpr int kQpCount = 52;
+
+struct QuantizerTable {
+    Quantizer by_qp[kQpCount];
+};
+
+// divisor: 3 for intra rounding, 6 for inter rounding.
+constexpr QuantizerTable make_quantizers(int divisor) {
+    QuantizerTable table{};
+    for (int qp = 0; qp < kQpCount; ++qp) {
+        Quantizer& q = table.by_qp[qp];
+        q.shift = 15 + qp / 6;
+        q.rounding = (1 << q.shift) / divisor;
+        for (int position = 0; position < 16; ++position) {
+            const int odd = (position & 1) + (position >> 2 & 1);
+            const int position_class = odd == 0 ? 0 : odd == 2 ? 1 : 2;
+            const int factor = quant_coef[qp % 6][position_class];
+            q.forward[position] = static_cast<std::int16_t>(factor);
+            q.dequant[position] =
+                static_cast<std::int16_t>(dequant_coef[qp % 6][position_class] << (qp / 6));
+            q.dead_zone[position] =
+                static_cast<std::int16_t>(((1 << q.shift) - 1 - q.rounding) / factor);
+        }
+    }
+    return table;
+}
+
+constexpr QuantizerTable kIntraQuantizers = make_quantizers(3);
+constexpr QuantizerTable kInterQuantizers = make_quantizers(6);
+
+// Cost of a level of magnitude 1 by the number of zeros before it in zig-zag order.
+constexpr std::uint8_t COEFF_COST[16] = {3, 2, 2, 1, 1, 1};
+constexpr int kLargeLevelCost = 9999;
+
+// An 8x8 block whose cost is lower than kMin8x8Cost, and a macroblock lower than
+// kMinMacroblockCost, is not worth its levels.
+constexpr int kMin8x8Cost = 5;
+constexpr int kMinMacroblockCost = 6;
+
+// Cost of an inter block's levels; counting stops above 5, which keeps any 8x8 block.
+int coefficient_cost(const std::int16_t* scan, unsigned nonzero) {
+    int cost = 0;
+    int run = 0;
+    for (int n = 0; nonzero >> n != 0 && cost <= 5; ++n) {
+        if ((nonzero >> n & 1) == 0) {
+            ++run;
+        } else if (std::abs(scan[n]) > 1) {
+            cost += kLargeLevelCost;
+        } else {
+            cost += COEFF_COST[run];
+            run = 0;
+        }
+    }
+    return cost;
+}
+
+// Level of a DC value: the rounding offset is doubled and the shift one larger than for AC.
+int quantize_dc(int value, const Quantizer& q) {
+    const int magnitude = std::min(
+        (std::abs(value) * q.forward[0] + 2 * q.rounding) >> (q.shift + 1), zolt::kMaxLevel);
+    return value < 0 ? -magnitude : magnitude;
+}
+
+// The 4x4 Hadamard transform of clause 8.5.10, in place.
+void hadamard_4x4(int* v) {
+    for (int pass = 0; pass < 2; ++pass) {
+        const int step = pass == 0 ? 1 : 4;
+        for (int i = 0; i < 4; ++i) {
+            int* x = v + (pass == 0 ? 4 * i : i);
+            const int a = x[0] + x[step];
+            const int b = x[0] - x[step];
+            const int c = x[2 * step] + x[3 * step];
+            const int d = x[2 * step] - x[3 * step];
+            x[0] = a + c;
+            x[step] = a - c;
+            x[2 * step] = b - d;
+            x[3 * step] = b + d;
+        }
+    }
+}
+
+// Block index in decoding order of raster block 0..15, and of its zig-zag index.
+constexpr std::uint8_t kDecodingOrder[16] = {0, 1, 4, 5, 2, 3, 6, 7, 8, 9, 12, 13, 10, 11, 14, 15};
+constexpr std::uint8_t inv_zigzag_blk_map[16] = {0, 1, 5,  6,  2, 4,  7,  12,
+                                                 3, 8, 11, 13, 9, 10, 14, 15};
+
+}  // namespace
+
+const zolt::Quantizer& zolt::intra_quantizer(int qp) {
+    return kIntraQuantizers.by_qp[qp];
+}
+
+const zolt::Quantizer& zolt::inter_quantizer(int qp) {
+    return kInterQuantizers.by_qp[qp];
+}
+
+// Intra 4x4 block k: transform, levels, reconstruction in the current picture. pred: 4x4 samples.
+void CEncoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
+    const Quantizer& q =
+        g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(g_mbQp) : zolt::inter_quantizer(g_mbQp);
+    std::uint8_t* block =
+        g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
+    std::int16_t* coefs = g_mb_coefs + 16 * k;
+    g_kernels->transform_4x4(block, g_stride_luma, pred, coefs);
+    const unsigned coded = g_kernels->quantize(coefs, 1, q, g_scan_levels + 16 * k, g_nonzero + k);
+    g_luma_mask |= coded << k;
+    if (coded) {
+        g_kernels->reconstruct_4x4(coefs, pred, block, g_stride_luma);
+    } else {
+        for (int y = 0; y < 4; ++y) {
+            std::copy(pred + 4 * y, pred + 4 * y + 4, block + y * g_stride_luma);
+        }
+    }
+}
+
+// Intra 16x16 luma (clause 8.5.2): the DC coefficients have a transform of their own.
+void CEncoder::quantTransform_luma_16x16() {
+    const Quantizer& q = zolt::intra_quantizer(g_mbQp);
+    g_kernels->transform_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, g_mb_coefs);
+
+    int dc[16];
+    for (int r = 0; r < 16; ++r) {
+        std::int16_t& coef = g_mb_coefs[16 * kDecodingOrder[r]];
+        dc[r] = coef;
+        coef = 0;
+    }
+    g_luma_mask = g_kernels->quantize(g_mb_coefs, 16, q, g_scan_levels, g_nonzero);
+
+    hadamard_4x4(dc);
+    for (int r = 0; r < 16; ++r) {
+        const int level = quantize_dc(dc[r] >> 1, q);
+        g_luma_dc[inv_zigzag_blk_map[r]] = static_cast<std::int16_t>(level);
+        dc[r] = level * q.dequant[0];
+    }
+    hadamard_4x4(dc);
+    std::uint32_t reconstructed = g_luma_mask;
+    for (int r = 0; r < 16; ++r) {
+        const int k = kDecodingOrder[r];
+        const int value = (dc[r] + 2) >> 2;
+        g_mb_coefs[16 * k] = static_cast<std::int16_t>(value);
+        reconstructed |= (value != 0 ? 1u : 0u) << k;
+    }
+    g_kernels->reconstruct_16x16(g_mb_coefs, reconstructed, g_mb_pred, g_mb_src_y, g_stride_luma);
+}
+
+// Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
+void CEncoder::quantTransform_luma_16x16P() {
+    g_kernels->transform_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, g_mb_coefs);
+    g_luma_mask = g_kernels->quantize(g_mb_coefs, 16, zolt::inter_quantizer(g_mbQp), g_scan_levels,
+                                      g_nonzero);
+    int macroblock_cost = 0;
+    for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
+        int cost = 0;
+        for (int k = 4 * block8x8; k < 4 * block8x8 + 4; ++k) {
+            cost += coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k]);
+        }
+        if (cost < kMin8x8Cost) {
+            g_luma_mask &= ~(0xfu << (4 * block8x8));
+        } else {
+            macroblock_cost += cost;
+        }
+    }
+    if (macroblock_cost < kMinMacroblockCost) {
+        g_luma_mask = 0;
+    }
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y, g_stride_luma);
+}
+
+// Chroma of any macroblock (clause 8.5.4): the four DC coefficients of a component have a 2x2
+// transform of their own.
+void CEncoder::quantTransform_chroma() {
+    const int qp = zolt::QP_SCALE_CR[g_mbQp];
+    const Quantizer& q =
+        g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+    g_chroma_ac_mask = 0;
+    g_chroma_dc_mask = 0;
+    for (int component = 0; component < 2; ++component) {
+        const std::uint8_t* pred = g_mb_pred + 256 + 64 * component;
+        std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
+        std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
+        g_kernels->transform_8x8(samples, g_stride_chroma, pred, coefs);
+
+        int c[4];
+        for (int b = 0; b < 4; ++b) {
+            c[b] = coefs[16 * b];
+            coefs[16 * b] = 0;
+        }
+        const std::uint32_t ac_mask = g_kernels->quantize(
+            coefs, 4, q, g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
+
+        const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
+                          c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
+        int d[4];
+        for (int b = 0; b < 4; ++b) {
+            const int level = quantize_dc(f[b], q);
+            g_chroma_dc[component][b] = static_cast<std::int16_t>(level);
+            g_chroma_dc_mask |= (level != 0 ? 1u : 0u) << component;
+            d[b] = level * q.dequant[0];
+        }
+        const int dc[4] = {d[0] + d[1] + d[2] + d[3], d[0] - d[1] + d[2] - d[3],
+                           d[0] + d[1] - d[2] - d[3], d[0] - d[1] - d[2] + d[3]};
+        std::uint32_t reconstructed = ac_mask;
+        for (int b = 0; b < 4; ++b) {
+            const int value = dc[b] >> 1;
+            coefs[16 * b] = static_cast<std::int16_t>(value);
+            reconstructed |= (value != 0 ? 1u : 0u) << b;
+        }
+        g_kernels->reconstruct_8x8(coefs, reconstructed, pred, samples, g_stride_chroma);
+        g_chroma_ac_mask |= ac_mask << (4 * component);
+    }
+}
