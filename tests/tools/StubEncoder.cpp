@@ -15,6 +15,7 @@
 #include "media/MediaSample.h"
 #include "media/MediaStreamConfig.h"
 #include "media/MediaType.h"
+#include "support/ErrMgr.h"
 
 namespace {
 
@@ -38,6 +39,7 @@ public:
 
     int PutStreamConfig(ISampleStreamConfig* config) override {
         if (misbehaves("refuse")) {
+            ErrMgr::AddErr("StubEncoder", "PutStreamConfig", nullptr, "reason %d", 42);
             return 1;
         }
         input_ = static_cast<IConfigVideoUncompressed*>(config->GetMediaConfig());

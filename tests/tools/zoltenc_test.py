@@ -123,6 +123,7 @@ class BadLibrary(ToolTest):
             "in.y4m", "-o", "out.264", "--plugin", plugin, stub=False, stub_does=stub_does
         )
         self.assert_fails(result, 1, *texts)
+        self.assertEqual(result.stdout, b"")
         self.assertNotIn("out.264", self.files())
 
     def test_libraries_that_are_no_encoder(self):
@@ -134,8 +135,20 @@ class BadLibrary(ToolTest):
         self.refused(STUB_ENCODER, STUB_ENCODER, "no encoder object", stub_does="null")
 
     def test_encoders_that_fail(self):
-        self.refused(STUB_ENCODER, "refuses the input", stub_does="refuse")
+        self.refused(STUB_ENCODER, "refuses the input: reason 42", stub_does="refuse")
         self.refused(STUB_ENCODER, "dropped picture 2", stub_does="drop at 2")
+
+    def test_the_error_text_is_that_of_the_programs_own_error_manager(self):
+        result = self.zoltenc(
+            "in.y4m",
+            "-o",
+            "-",
+            stub_does="refuse",
+            environment={"STREAMING_ENGINE_LIB": str(self.folder)},
+        )
+        self.assert_fails(result, 1, "refuses the input")
+        self.assertNotIn("42", result.stderr)
+        self.assertEqual(result.stdout, b"")
 
     def test_an_encoder_that_ends_the_process_leaves_no_file(self):
         result = self.zoltenc("in.y4m", "-o", "out.264", stub_does="exit at 2")

@@ -1,13 +1,14 @@
 #include "zoltenc/PictureStats.h"
 
+#include <optional>
+
+#include "avcdump/SliceHeader.h"
 #include "media/IConfigVideoAvc.h"
-#include "zoltenc/slice_qp.h"
 
 namespace zolt {
 namespace {
 
-constexpr int kNalTypeMask = 31;
-constexpr int kNalTypeIdr = 5;
+constexpr std::uint64_t kSliceTypeI = 2;
 
 }  // namespace
 
@@ -17,9 +18,20 @@ PictureStats::PictureStats(const std::string& file_name) : file_(file_name) {
 
 void PictureStats::add(IConfigVideoAvc& stream, const unsigned char* nal, std::size_t size,
                        std::int64_t time) {
-    const bool idr = size > 0 && (nal[0] & kNalTypeMask) == kNalTypeIdr;
-    write_row(std::to_string(index_++) + "," + std::to_string(time) + "," + (idr ? "I" : "P") +
-              "," + std::to_string(size) + "," + std::to_string(slice_qp(stream, nal, size)));
+    parameter_sets_.add_seq_par_set(stream.GetSeqParSetData(), stream.GetSeqParSetSize());
+    parameter_sets_.add_pic_par_set(stream.GetPicParSetData(), stream.GetPicParSetSize());
+    const std::optional<SliceHeader> slice =
+        SliceHeader::read(nal, static_cast<int>(size), parameter_sets_);
+
+    std::string row = std::to_string(index_++) + "," + std::to_string(time) + ",";
+    if (slice) {
+        row += slice->slice_type == kSliceTypeI ? "I" : "P";
+    }
+    row += "," + std::to_string(size) + ",";
+    if (slice && slice->is_complete) {
+        row += std::to_string(slice->slice_qp);
+    }
+    write_row(row);
 }
 
 void PictureStats::write_row(const std::string& row) {

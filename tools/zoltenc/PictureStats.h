@@ -3,8 +3,8 @@
 #include <cstddef>
 #include <cstdint>
 #include <string>
-#include <vector>
 
+#include "avcdump/ParameterSets.h"
 #include "common/OutputFile.h"
 
 class IConfigVideoAvc;
@@ -12,7 +12,8 @@ class IConfigVideoAvc;
 namespace zolt {
 
 // A CSV file with one row per coded picture: index, time in microseconds, type (I or P), bytes of
-// its NAL unit, quantisation parameter of its slice.
+// its NAL unit, quantisation parameter of its slice; what a damaged slice does not tell is left
+// empty.
 class PictureStats {
 public:
     explicit PictureStats(const std::string& file_name);
@@ -29,6 +30,7 @@ private:
     void write_row(const std::string& row);
 
     OutputFile file_;
+    ParameterSets parameter_sets_;
     std::int64_t index_ = 0;
 };
 
