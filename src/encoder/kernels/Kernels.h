@@ -91,7 +91,8 @@ struct Kernels {
                               std::int16_t* scan, std::uint16_t* nonzero);
 
     // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and
-    // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction.
+    // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction. Needs |c| <
+    // 2^15.
     void (*reconstruct_16x16)(const std::int16_t* coefs, std::uint32_t mask,
                               const std::uint8_t* pred, std::uint8_t* dst, std::ptrdiff_t stride);
     void (*reconstruct_8x8)(const std::int16_t* coefs, std::uint32_t mask, const std::uint8_t* pred,
@@ -139,10 +140,24 @@ struct Kernels {
     StrongFilter deblock_chroma_horizontal_strong;
 };
 
-// The tables this build has; scalar_kernels() runs on any processor.
+// The scalar table; it runs on any processor.
 const Kernels& scalar_kernels();
 
-// The fastest table that this processor can run, chosen once per process.
+// The tables that this processor can run, the scalar one first, the fastest last; found once per
+// process.
+class KernelTables {
+public:
+    KernelTables(const Kernels* first, const Kernels* last) : m_first(first), m_last(last) {}
+    const Kernels* begin() const { return m_first; }
+    const Kernels* end() const { return m_last; }
+
+private:
+    const Kernels* m_first;
+    const Kernels* m_last;
+};
+KernelTables kernel_tables();
+
+// The last of them.
 const Kernels& best_kernels();
 
 }  // namespace zolt

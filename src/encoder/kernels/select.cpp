@@ -1,9 +1,37 @@
 #include "encoder/kernels/Kernels.h"
 
+#if defined(__x86_64__) || defined(__i386__)
+#define ZOLT_X86 1
+#include "encoder/kernels/x86_tables.h"
+#endif
+
 namespace zolt {
 
 const Kernels& best_kernels() {
-    return scalar_kernels();
+    return *(kernel_tables().end() - 1);
+}
+
+KernelTables kernel_tables() {
+    struct Tables {
+        Kernels table[3] = {scalar_kernels()};
+        int count = 1;
+
+        Tables() {
+#ifdef ZOLT_X86
+            __builtin_cpu_init();
+            if (__builtin_cpu_supports("sse2")) {
+                table[count] = with_sse2(table[count - 1]);
+                ++count;
+            }
+            if (__builtin_cpu_supports("avx2")) {
+                table[count] = with_avx2(table[count - 1]);
+                ++count;
+            }
+#endif
+        }
+    };
+    static const Tables tables;
+    return {tables.table, tables.table + tables.count};
 }
 
 }  // namespace zolt

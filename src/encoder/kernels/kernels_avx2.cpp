@@ -1,0 +1,618 @@
+// Compiled for AVX2: nothing but intrinsics and functions of this file, so that no inline function
+// that other files share is emitted with instructions that an older processor lacks.
+#include <immintrin.h>
+
+#include "encoder/kernels/deblock_simd.h"
+#include "encoder/kernels/x86_tables.h"
+
+namespace zolt {
+namespace {
+
+using std::int16_t;
+using std::int32_t;
+using std::int8_t;
+using std::ptrdiff_t;
+using std::uint16_t;
+using std::uint32_t;
+using std::uint8_t;
+
+__m128i load_16(const void* p) {
+    return _mm_loadu_si128(static_cast<const __m128i*>(p));
+}
+__m128i load_8(const void* p) {
+    return _mm_loadl_epi64(static_cast<const __m128i*>(p));
+}
+__m256i load_32(const void* p) {
+    return _mm256_loadu_si256(static_cast<const __m256i*>(p));
+}
+__m256i load_aligned(const void* p) {
+    return _mm256_load_si256(static_cast<const __m256i*>(p));
+}
+void store_16(void* p, __m128i v) {
+    _mm_storeu_si128(static_cast<__m128i*>(p), v);
+}
+void store_8(void* p, __m128i v) {
+    _mm_storel_epi64(static_cast<__m128i*>(p), v);
+}
+void store_32(void* p, __m256i v) {
+    _mm256_storeu_si256(static_cast<__m256i*>(p), v);
+}
+
+// Two vectors of 16 bytes, the first in the low lane.
+__m256i join(__m128i low, __m128i high) {
+    return _mm256_inserti128_si256(_mm256_castsi128_si256(low), high, 1);
+}
+__m128i high_lane(__m256i v) {
+    return _mm256_extracti128_si256(v, 1);
+}
+__m128i low_lane(__m256i v) {
+    return _mm256_castsi256_si128(v);
+}
+
+// ---- Distortion of the motion search ----
+
+__m256i even_columns() {
+    return _mm256_set1_epi16(0x00ff);
+}
+__m256i odd_columns() {
+    return _mm256_set1_epi16(static_cast<short>(0xff00));
+}
+
+// SAD of one phase, two of its rows at a time.
+template <typename TwoRows>
+int phase_sad(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
+    __m256i sum = _mm256_setzero_si256();
+    for (int row = 0; row < 8; row += 2) {
+        const __m256i samples = _mm256_and_si256(two_rows(2 * row + first_row), columns);
+        sum = _mm256_add_epi32(sum, _mm256_sad_epu8(samples, load_aligned(phase + 16 * row)));
+    }
+    const __m128i lanes = _mm_add_epi32(low_lane(sum), high_lane(sum));
+    return _mm_cvtsi128_si32(_mm_add_epi32(lanes, _mm_srli_si128(lanes, 8)));
+}
+
+template <typename TwoRows>
+bool sum_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two_rows) {
+    sums[0] = phase_sad(phases, 0, even_columns(), two_rows);
+    if (sums[0] >= limits[0]) {
+        return false;
+    }
+    sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), two_rows);
+    if (sums[1] >= limits[1]) {
+        return false;
+    }
+    sums[2] = sums[1] + phase_sad(phases + 256, 1, even_columns(), two_rows);
+    if (sums[2] >= limits[2]) {
+        return false;
+    }
+    sums[3] = sums[2] + phase_sad(phases + 384, 0, odd_columns(), two_rows);
+    return true;
+}
+
+bool sad_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, const int* limits,
+                int* sums) {
+    return sum_phases(phases, limits, sums, [=](int y) {
+        const uint8_t* row = ref + y * stride;
+        return join(load_16(row), load_16(row + 2 * stride));
+    });
+}
+
+bool sad_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
+                        const int* limits, int* sums) {
+    return sum_phases(phases, limits, sums, [=](int y) {
+        const ptrdiff_t first = y * stride;
+        const ptrdiff_t second = first + 2 * stride;
+        return _mm256_avg_epu8(join(load_16(a + first), load_16(a + second)),
+                               join(load_16(b + first), load_16(b + second)));
+    });
+}
+
+// ---- Reference planes ----
+
+// 32 half samples between p[0] and p[step].
+__m256i half_samples(const uint8_t* p, ptrdiff_t step) {
+    const __m256i e = load_32(p - 2 * step), f = load_32(p - step), g = load_32(p);
+    const __m256i h = load_32(p + step), i = load_32(p + 2 * step), j = load_32(p + 3 * step);
+    const __m256i first = _mm256_set1_epi16(static_cast<short>(0xfb01));  // 1, -5
+    const __m256i middle = _mm256_set1_epi16(0x1414);                     // 20, 20
+    const __m256i last = _mm256_set1_epi16(0x01fb);                       // -5, 1
+    const __m256i rounding = _mm256_set1_epi16(16);
+    const auto filter = [=](__m256i ef, __m256i gh, __m256i ij) {
+        const __m256i sum = _mm256_add_epi16(
+            _mm256_add_epi16(_mm256_maddubs_epi16(ef, first), _mm256_maddubs_epi16(gh, middle)),
+            _mm256_add_epi16(_mm256_maddubs_epi16(ij, last), rounding));
+        return _mm256_srai_epi16(sum, 5);
+    };
+    return _mm256_packus_epi16(
+        filter(_mm256_unpacklo_epi8(e, f), _mm256_unpacklo_epi8(g, h), _mm256_unpacklo_epi8(i, j)),
+        filter(_mm256_unpackhi_epi8(e, f), _mm256_unpackhi_epi8(g, h), _mm256_unpackhi_epi8(i, j)));
+}
+
+// A row of count >= 32 half samples; the last step overlaps the one before it.
+void half_row(const uint8_t* src, ptrdiff_t step, uint8_t* dst, int count) {
+    for (int x = 0; x < count - 32; x += 32) {
+        store_32(dst + x, half_samples(src + x, step));
+    }
+    store_32(dst + count - 32, half_samples(src + count - 32, step));
+}
+
+void half_vertical_row(const uint8_t* src, ptrdiff_t stride, uint8_t* dst, int count) {
+    if (count < 32) {
+        scalar_kernels().half_vertical_row(src, stride, dst, count);
+        return;
+    }
+    half_row(src, stride, dst, count);
+}
+
+void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
+    if (count < 32) {
+        scalar_kernels().half_horizontal_row(src, dst, count);
+        return;
+    }
+    half_row(src, 1, dst, count);
+}
+
+// ---- Inter prediction ----
+
+void copy_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
+    for (int y = 0; y < 16; y += 2) {
+        store_32(pred + 16 * y, join(load_16(src + y * stride), load_16(src + (y + 1) * stride)));
+    }
+}
+
+void average_16x16(uint8_t* pred, const uint8_t* a, ptrdiff_t a_stride, const uint8_t* b,
+                   ptrdiff_t b_stride) {
+    for (int y = 0; y < 16; ++y) {
+        store_16(pred + 16 * y, _mm_avg_epu8(load_16(a + y * a_stride), load_16(b + y * b_stride)));
+    }
+}
+
+// Unrounded vertical sums of 16 samples.
+__m256i vertical_sums(const uint8_t* p, ptrdiff_t stride) {
+    const auto row = [=](int y) { return _mm256_cvtepu8_epi16(load_16(p + y * stride)); };
+    const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(row(0), row(1)), 2),
+                                       _mm256_add_epi16(row(-1), row(2)));
+    return _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(row(-2), row(3)), t),
+                            _mm256_slli_epi16(t, 2));
+}
+
+// (outer - 5 * middle + 20 * inner + 512) >> 10 with 32-bit sums.
+__m256i centre_samples(__m256i outer, __m256i middle, __m256i inner) {
+    const __m256i ones = _mm256_set1_epi16(1);
+    const __m256i outer_middle = _mm256_set1_epi32(static_cast<int>(0xfffb0001u));  // 1, -5
+    const __m256i inner_rounding = _mm256_set1_epi32(512 << 16 | 20);
+    const __m256i low =
+        _mm256_add_epi32(_mm256_madd_epi16(_mm256_unpacklo_epi16(outer, middle), outer_middle),
+                         _mm256_madd_epi16(_mm256_unpacklo_epi16(inner, ones), inner_rounding));
+    const __m256i high =
+        _mm256_add_epi32(_mm256_madd_epi16(_mm256_unpackhi_epi16(outer, middle), outer_middle),
+                         _mm256_madd_epi16(_mm256_unpackhi_epi16(inner, ones), inner_rounding));
+    return _mm256_packs_epi32(_mm256_srai_epi32(low, 10), _mm256_srai_epi32(high, 10));
+}
+
+void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
+    alignas(32) int16_t sums[32];  // columns -2..18
+    for (int y = 0; y < 16; ++y) {
+        const uint8_t* row = src + y * stride - 2;
+        store_32(sums, vertical_sums(row, stride));
+        store_32(sums + 5, vertical_sums(row + 5, stride));
+        const __m256i samples =
+            centre_samples(_mm256_add_epi16(load_32(sums), load_32(sums + 5)),
+                           _mm256_add_epi16(load_32(sums + 1), load_32(sums + 4)),
+                           _mm256_add_epi16(load_32(sums + 2), load_32(sums + 3)));
+        store_16(pred + 16 * y, _mm_packus_epi16(low_lane(samples), high_lane(samples)));
+    }
+}
+
+void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
+    const __m128i columns = _mm_set1_epi16(static_cast<short>((8 - fx) | fx << 8));
+    const __m128i upper_weight = _mm_set1_epi16(static_cast<short>(8 - fy));
+    const __m128i lower_weight = _mm_set1_epi16(static_cast<short>(fy));
+    const auto horizontal = [&](const uint8_t* row) {
+        return _mm_maddubs_epi16(_mm_unpacklo_epi8(load_8(row), load_8(row + 1)), columns);
+    };
+    __m128i upper = horizontal(src);
+    for (int y = 0; y < 8; ++y) {
+        const __m128i lower = horizontal(src + (y + 1) * stride);
+        const __m128i sum = _mm_add_epi16(_mm_mullo_epi16(upper, upper_weight),
+                                          _mm_mullo_epi16(lower, lower_weight));
+        const __m128i rounded = _mm_srli_epi16(_mm_add_epi16(sum, _mm_set1_epi16(32)), 6);
+        store_8(pred + 8 * y, _mm_packus_epi16(rounded, rounded));
+        upper = lower;
+    }
+}
+
+// ---- Residual ----
+
+// Forward core transform across four vectors.
+void forward_butterfly(__m256i* v) {
+    const __m256i s = _mm256_add_epi16(v[0], v[3]);
+    const __m256i d = _mm256_sub_epi16(v[0], v[3]);
+    const __m256i t = _mm256_add_epi16(v[1], v[2]);
+    const __m256i u = _mm256_sub_epi16(v[1], v[2]);
+    v[0] = _mm256_add_epi16(s, t);
+    v[1] = _mm256_add_epi16(_mm256_add_epi16(d, d), u);
+    v[2] = _mm256_sub_epi16(s, t);
+    v[3] = _mm256_sub_epi16(d, _mm256_add_epi16(u, u));
+}
+
+// Inverse core transform across four vectors.
+void inverse_butterfly(__m256i* v) {
+    const __m256i e = _mm256_add_epi16(v[0], v[2]);
+    const __m256i f = _mm256_sub_epi16(v[0], v[2]);
+    const __m256i g = _mm256_sub_epi16(_mm256_srai_epi16(v[1], 1), v[3]);
+    const __m256i h = _mm256_add_epi16(v[1], _mm256_srai_epi16(v[3], 1));
+    v[0] = _mm256_add_epi16(e, h);
+    v[1] = _mm256_add_epi16(f, g);
+    v[2] = _mm256_sub_epi16(f, g);
+    v[3] = _mm256_sub_epi16(e, h);
+}
+
+// Transposes the four 4x4 blocks that stand side by side in four vectors.
+void transpose_four(__m256i* v) {
+    const __m256i a = _mm256_unpacklo_epi16(v[0], v[1]);
+    const __m256i b = _mm256_unpackhi_epi16(v[0], v[1]);
+    const __m256i c = _mm256_unpacklo_epi16(v[2], v[3]);
+    const __m256i d = _mm256_unpackhi_epi16(v[2], v[3]);
+    const __m256i even_01 = _mm256_unpacklo_epi32(a, c);
+    const __m256i even_23 = _mm256_unpackhi_epi32(a, c);
+    const __m256i odd_01 = _mm256_unpacklo_epi32(b, d);
+    const __m256i odd_23 = _mm256_unpackhi_epi32(b, d);
+    v[0] = _mm256_unpacklo_epi64(even_01, odd_01);
+    v[1] = _mm256_unpackhi_epi64(even_01, odd_01);
+    v[2] = _mm256_unpacklo_epi64(even_23, odd_23);
+    v[3] = _mm256_unpackhi_epi64(even_23, odd_23);
+}
+
+// Coefficients of four blocks from the rows of their residual; blocks[0], [1] in the low lane.
+void transform_four(__m256i* v, int16_t* const* blocks) {
+    forward_butterfly(v);
+    transpose_four(v);
+    forward_butterfly(v);
+    const __m256i even_01 = _mm256_unpacklo_epi64(v[0], v[1]);
+    const __m256i even_23 = _mm256_unpacklo_epi64(v[2], v[3]);
+    const __m256i odd_01 = _mm256_unpackhi_epi64(v[0], v[1]);
+    const __m256i odd_23 = _mm256_unpackhi_epi64(v[2], v[3]);
+    store_32(blocks[0], _mm256_permute2x128_si256(even_01, even_23, 0x20));
+    store_32(blocks[1], _mm256_permute2x128_si256(odd_01, odd_23, 0x20));
+    store_32(blocks[2], _mm256_permute2x128_si256(even_01, even_23, 0x31));
+    store_32(blocks[3], _mm256_permute2x128_si256(odd_01, odd_23, 0x31));
+}
+
+// First block in decoding order of block row r of a 16x16 block (Figure 6-10); its neighbours to
+// the right are 1, 4 and 5 blocks later.
+constexpr int first_in_row(int r) {
+    return 2 * (r & 1) + 8 * (r >> 1);
+}
+
+void transform_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
+    for (int r = 0; r < 4; ++r, src += 4 * stride, pred += 64) {
+        __m256i v[4];
+        for (int y = 0; y < 4; ++y) {
+            v[y] = _mm256_sub_epi16(_mm256_cvtepu8_epi16(load_16(src + y * stride)),
+                                    _mm256_cvtepu8_epi16(load_16(pred + 16 * y)));
+        }
+        int16_t* first = coefs + 16 * first_in_row(r);
+        int16_t* const blocks[4] = {first, first + 16, first + 64, first + 80};
+        transform_four(v, blocks);
+    }
+}
+
+// Rows y and y + 4 of an 8x8 block, one in each lane.
+__m256i two_rows_of_8(const uint8_t* p, ptrdiff_t stride) {
+    return _mm256_cvtepu8_epi16(_mm_unpacklo_epi64(load_8(p), load_8(p + 4 * stride)));
+}
+
+void transform_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
+    __m256i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm256_sub_epi16(two_rows_of_8(src + y * stride, stride),
+                                two_rows_of_8(pred + 8 * y, 8));
+    }
+    int16_t* const blocks[4] = {coefs, coefs + 16, coefs + 32, coefs + 48};
+    transform_four(v, blocks);
+}
+
+// Puts 16 coefficients kept column by column into zig-zag order (Kernels.h, zigzag.h).
+__m256i zigzag(__m256i v) {
+    constexpr char x = -1;              // from the other lane
+    const __m128i low = low_lane(v);    // positions 0..7
+    const __m128i high = high_lane(v);  // positions 8..15
+    // Order 0 4 1 2 5 8 12 9, then 6 3 7 10 13 14 11 15.
+    const __m128i first = _mm_or_si128(
+        _mm_shuffle_epi8(low, _mm_setr_epi8(0, 1, 8, 9, 2, 3, 4, 5, 10, 11, x, x, x, x, x, x)),
+        _mm_shuffle_epi8(high, _mm_setr_epi8(x, x, x, x, x, x, x, x, x, x, 0, 1, 8, 9, 2, 3)));
+    const __m128i second = _mm_or_si128(
+        _mm_shuffle_epi8(low, _mm_setr_epi8(12, 13, 6, 7, 14, 15, x, x, x, x, x, x, x, x, x, x)),
+        _mm_shuffle_epi8(high,
+                         _mm_setr_epi8(x, x, x, x, x, x, 4, 5, 10, 11, 12, 13, 6, 7, 14, 15)));
+    return join(first, second);
+}
+
+uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t* scan,
+                  uint16_t* nonzero) {
+    const __m256i zero = _mm256_setzero_si256();
+    const __m256i dead_zone = load_aligned(quantizer.dead_zone);
+    const __m256i forward = load_aligned(quantizer.forward);
+    const __m256i dequant = load_aligned(quantizer.dequant);
+    const __m256i rounding = _mm256_set1_epi32(quantizer.rounding);
+    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
+    const __m256i largest = _mm256_set1_epi16(kMaxLevel);
+    uint32_t mask = 0;
+    for (int block = 0; block < count; ++block, coefs += 16, scan += 16) {
+        const __m256i c = load_aligned(coefs);
+        const __m256i magnitude = _mm256_abs_epi16(c);
+        const __m256i coded = _mm256_cmpgt_epi16(magnitude, dead_zone);
+        if (_mm256_testz_si256(coded, coded)) {
+            store_32(coefs, zero);
+            store_32(scan, zero);
+            nonzero[block] = 0;
+            continue;
+        }
+        const __m256i low = _mm256_mullo_epi16(magnitude, forward);
+        const __m256i high = _mm256_mulhi_epu16(magnitude, forward);
+        const __m256i first =
+            _mm256_srl_epi32(_mm256_add_epi32(_mm256_unpacklo_epi16(low, high), rounding), shift);
+        const __m256i second =
+            _mm256_srl_epi32(_mm256_add_epi32(_mm256_unpackhi_epi16(low, high), rounding), shift);
+        const __m256i level =
+            _mm256_sign_epi16(_mm256_min_epi16(_mm256_packs_epi32(first, second), largest), c);
+        store_32(coefs, _mm256_mullo_epi16(level, dequant));
+        const __m256i in_order = zigzag(level);
+        store_32(scan, in_order);
+        const __m128i bytes = _mm_packs_epi16(low_lane(in_order), high_lane(in_order));
+        const int zeros = _mm_movemask_epi8(_mm_cmpeq_epi8(bytes, _mm_setzero_si128()));
+        nonzero[block] = static_cast<uint16_t>(~zeros);
+        mask |= 1u << block;
+    }
+    return mask;
+}
+
+// Sums of the magnitudes of 16 coefficients, in eight parts.
+__m256i magnitudes(__m256i coefs) {
+    return _mm256_madd_epi16(_mm256_abs_epi16(coefs), _mm256_set1_epi16(1));
+}
+
+// Rows of the residual of four blocks, blocks 0 and 1 in the low lane. Returns false when 16-bit
+// sums might not be exact: no sum of the inverse transform, rounding included, exceeds the sum of
+// a block's magnitudes.
+bool inverse_four(const __m256i* b, __m256i* rows) {
+    constexpr int kLargestSum = 32767 - 32;
+    const __m256i parts = _mm256_hadd_epi32(_mm256_hadd_epi32(magnitudes(b[0]), magnitudes(b[1])),
+                                            _mm256_hadd_epi32(magnitudes(b[2]), magnitudes(b[3])));
+    const __m128i sums = _mm_add_epi32(low_lane(parts), high_lane(parts));
+    if (_mm_movemask_epi8(_mm_cmpgt_epi32(sums, _mm_set1_epi32(kLargestSum))) != 0) {
+        return false;
+    }
+    const __m256i even_01 = _mm256_permute2x128_si256(b[0], b[2], 0x20);
+    const __m256i even_23 = _mm256_permute2x128_si256(b[0], b[2], 0x31);
+    const __m256i odd_01 = _mm256_permute2x128_si256(b[1], b[3], 0x20);
+    const __m256i odd_23 = _mm256_permute2x128_si256(b[1], b[3], 0x31);
+    rows[0] = _mm256_unpacklo_epi64(even_01, odd_01);
+    rows[1] = _mm256_unpackhi_epi64(even_01, odd_01);
+    rows[2] = _mm256_unpacklo_epi64(even_23, odd_23);
+    rows[3] = _mm256_unpackhi_epi64(even_23, odd_23);
+    inverse_butterfly(rows);
+    transpose_four(rows);
+    inverse_butterfly(rows);
+    for (int y = 0; y < 4; ++y) {
+        rows[y] = _mm256_srai_epi16(_mm256_add_epi16(rows[y], _mm256_set1_epi16(32)), 6);
+    }
+    return true;
+}
+
+__m256i block_or_zero(const int16_t* coefs, uint32_t mask, int block) {
+    return mask >> block & 1 ? load_aligned(coefs + 16 * block) : _mm256_setzero_si256();
+}
+
+void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                       ptrdiff_t stride) {
+    for (int r = 0; r < 4; ++r) {
+        const uint8_t* row_pred = pred + 64 * r;
+        uint8_t* row_dst = dst + 4 * r * stride;
+        const int first = first_in_row(r);
+        if ((mask >> first & 0x33) == 0) {
+            for (int y = 0; y < 4; ++y) {
+                store_16(row_dst + y * stride, load_16(row_pred + 16 * y));
+            }
+            continue;
+        }
+        const __m256i blocks[4] = {
+            block_or_zero(coefs, mask, first), block_or_zero(coefs, mask, first + 1),
+            block_or_zero(coefs, mask, first + 4), block_or_zero(coefs, mask, first + 5)};
+        __m256i rows[4];
+        if (!inverse_four(blocks, rows)) {
+            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
+            return;
+        }
+        for (int y = 0; y < 4; ++y) {
+            const __m256i sum =
+                _mm256_add_epi16(rows[y], _mm256_cvtepu8_epi16(load_16(row_pred + 16 * y)));
+            store_16(row_dst + y * stride, _mm_packus_epi16(low_lane(sum), high_lane(sum)));
+        }
+    }
+}
+
+void reconstruct_8x8(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                     ptrdiff_t stride) {
+    if (mask == 0) {
+        for (int y = 0; y < 8; ++y) {
+            store_8(dst + y * stride, load_8(pred + 8 * y));
+        }
+        return;
+    }
+    const __m256i blocks[4] = {block_or_zero(coefs, mask, 0), block_or_zero(coefs, mask, 1),
+                               block_or_zero(coefs, mask, 2), block_or_zero(coefs, mask, 3)};
+    __m256i rows[4];
+    if (!inverse_four(blocks, rows)) {
+        scalar_kernels().reconstruct_8x8(coefs, mask, pred, dst, stride);
+        return;
+    }
+    for (int y = 0; y < 4; ++y) {
+        const __m256i sum = _mm256_add_epi16(rows[y], two_rows_of_8(pred + 8 * y, 8));
+        const __m128i samples = _mm_packus_epi16(low_lane(sum), high_lane(sum));
+        store_8(dst + y * stride, samples);
+        store_8(dst + (y + 4) * stride, _mm_srli_si128(samples, 8));
+    }
+}
+
+// ---- Features of the intra decisions ----
+
+void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
+    const __m256i byte_ones = _mm256_set1_epi8(1);
+    const __m256i ones = _mm256_set1_epi16(1);
+    for (int block_row = 0; block_row < 4; ++block_row, src += 4 * stride) {
+        const __m256i upper = join(load_16(src), load_16(src + stride));
+        const __m256i lower = join(load_16(src + 2 * stride), load_16(src + 3 * stride));
+        const __m256i pairs = _mm256_add_epi16(_mm256_maddubs_epi16(upper, byte_ones),
+                                               _mm256_maddubs_epi16(lower, byte_ones));
+        const __m256i quads = _mm256_madd_epi16(pairs, ones);
+        store_16(sums + 4 * block_row, _mm_add_epi32(low_lane(quads), high_lane(quads)));
+    }
+}
+
+// ---- Deblocking of luma ----
+
+// Sixteen lines of an edge.
+struct Lanes {
+    static constexpr int kLanes = 16;
+    __m256i v;
+
+    static Lanes load(const uint8_t* p) { return {_mm256_cvtepu8_epi16(load_16(p))}; }
+    void store(uint8_t* p) const { store_16(p, _mm_packus_epi16(low_lane(v), high_lane(v))); }
+    static Lanes splat(int value) { return {_mm256_set1_epi16(static_cast<short>(value))}; }
+
+    friend Lanes operator+(Lanes a, Lanes b) { return {_mm256_add_epi16(a.v, b.v)}; }
+    friend Lanes operator-(Lanes a, Lanes b) { return {_mm256_sub_epi16(a.v, b.v)}; }
+    friend Lanes operator*(Lanes a, Lanes b) { return {_mm256_mullo_epi16(a.v, b.v)}; }
+    friend Lanes operator&(Lanes a, Lanes b) { return {_mm256_and_si256(a.v, b.v)}; }
+    static Lanes andnot(Lanes a, Lanes b) { return {_mm256_andnot_si256(a.v, b.v)}; }
+    static Lanes less(Lanes a, Lanes b) { return {_mm256_cmpgt_epi16(b.v, a.v)}; }
+    static Lanes min(Lanes a, Lanes b) { return {_mm256_min_epi16(a.v, b.v)}; }
+    static Lanes max(Lanes a, Lanes b) { return {_mm256_max_epi16(a.v, b.v)}; }
+    static Lanes average(Lanes a, Lanes b) { return {_mm256_avg_epu16(a.v, b.v)}; }
+    static Lanes shift_right(Lanes a, int n) { return {_mm256_srai_epi16(a.v, n)}; }
+    static Lanes absolute_difference(Lanes a, Lanes b) {
+        return {_mm256_abs_epi16(_mm256_sub_epi16(a.v, b.v))};
+    }
+    static Lanes select(Lanes mask, Lanes a, Lanes b) {
+        return {_mm256_blendv_epi8(b.v, a.v, mask.v)};
+    }
+    static bool any(Lanes a) { return !_mm256_testz_si256(a.v, a.v); }
+};
+
+// tC0 of four segments, four lines each.
+Lanes luma_tc0(const int8_t* tc0) {
+    return {_mm256_set_epi16(tc0[3], tc0[3], tc0[3], tc0[3], tc0[2], tc0[2], tc0[2], tc0[2], tc0[1],
+                             tc0[1], tc0[1], tc0[1], tc0[0], tc0[0], tc0[0], tc0[0])};
+}
+
+// The rows p3..q3 around a horizontal edge.
+struct Rows {
+    uint8_t* row[8];
+
+    Rows(uint8_t* first, ptrdiff_t stride) {
+        for (int i = 0; i < 8; ++i) {
+            row[i] = first + i * stride;
+        }
+    }
+};
+
+// Transposes 16 rows of 8 samples into 8 rows of 16.
+void transpose_16x8(const uint8_t* src, ptrdiff_t stride, uint8_t* dst) {
+    __m128i a[8];  // rows i and i + 8 interleaved
+    for (int i = 0; i < 8; ++i) {
+        a[i] = _mm_unpacklo_epi8(load_8(src + i * stride), load_8(src + (i + 8) * stride));
+    }
+    __m128i b[8];
+    for (int i = 0; i < 4; ++i) {
+        b[2 * i] = _mm_unpacklo_epi8(a[i], a[i + 4]);
+        b[2 * i + 1] = _mm_unpackhi_epi8(a[i], a[i + 4]);
+    }
+    // b[2i + h]: rows i, i + 4, i + 8, i + 12 of columns 4h..4h + 3.
+    for (int h = 0; h < 2; ++h) {
+        const __m128i even_low = _mm_unpacklo_epi8(b[h], b[4 + h]);
+        const __m128i even_high = _mm_unpackhi_epi8(b[h], b[4 + h]);
+        const __m128i odd_low = _mm_unpacklo_epi8(b[2 + h], b[6 + h]);
+        const __m128i odd_high = _mm_unpackhi_epi8(b[2 + h], b[6 + h]);
+        store_16(dst + 64 * h, _mm_unpacklo_epi8(even_low, odd_low));
+        store_16(dst + 64 * h + 16, _mm_unpackhi_epi8(even_low, odd_low));
+        store_16(dst + 64 * h + 32, _mm_unpacklo_epi8(even_high, odd_high));
+        store_16(dst + 64 * h + 48, _mm_unpackhi_epi8(even_high, odd_high));
+    }
+}
+
+// Transposes 8 rows of 16 samples into 16 rows of 8.
+void transpose_8x16(const uint8_t* src, uint8_t* dst, ptrdiff_t stride) {
+    __m128i a[8];  // rows i and i + 4 interleaved, columns 0..7 and 8..15
+    for (int i = 0; i < 4; ++i) {
+        const __m128i upper = load_16(src + 16 * i);
+        const __m128i lower = load_16(src + 16 * (i + 4));
+        a[i] = _mm_unpacklo_epi8(upper, lower);
+        a[4 + i] = _mm_unpackhi_epi8(upper, lower);
+    }
+    for (int h = 0; h < 2; ++h, dst += 8 * stride) {
+        const __m128i* rows = a + 4 * h;
+        const __m128i even_low = _mm_unpacklo_epi8(rows[0], rows[2]);
+        const __m128i even_high = _mm_unpackhi_epi8(rows[0], rows[2]);
+        const __m128i odd_low = _mm_unpacklo_epi8(rows[1], rows[3]);
+        const __m128i odd_high = _mm_unpackhi_epi8(rows[1], rows[3]);
+        const __m128i columns[4] = {
+            _mm_unpacklo_epi8(even_low, odd_low), _mm_unpackhi_epi8(even_low, odd_low),
+            _mm_unpacklo_epi8(even_high, odd_high), _mm_unpackhi_epi8(even_high, odd_high)};
+        for (int i = 0; i < 4; ++i) {
+            store_8(dst + 2 * i * stride, columns[i]);
+            store_8(dst + (2 * i + 1) * stride, _mm_srli_si128(columns[i], 8));
+        }
+    }
+}
+
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+                             const int8_t* tc0) {
+    luma_rows(Rows(pix - 4 * stride, stride).row, alpha, beta, luma_tc0(tc0));
+}
+
+void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    luma_rows_strong<Lanes>(Rows(pix - 4 * stride, stride).row, alpha, beta);
+}
+
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
+    alignas(32) uint8_t block[128];
+    transpose_16x8(pix - 4, stride, block);
+    luma_rows(Rows(block, 16).row, alpha, beta, luma_tc0(tc0));
+    transpose_8x16(block, pix - 4, stride);
+}
+
+void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    alignas(32) uint8_t block[128];
+    transpose_16x8(pix - 4, stride, block);
+    luma_rows_strong<Lanes>(Rows(block, 16).row, alpha, beta);
+    transpose_8x16(block, pix - 4, stride);
+}
+
+}  // namespace
+
+Kernels with_avx2(const Kernels& base) {
+    Kernels k = base;
+    k.name = "avx2";
+    k.sad_phases = sad_phases;
+    k.sad_phases_average = sad_phases_average;
+    k.half_vertical_row = half_vertical_row;
+    k.half_horizontal_row = half_horizontal_row;
+    k.copy_16x16 = copy_16x16;
+    k.average_16x16 = average_16x16;
+    k.centre_16x16 = centre_16x16;
+    k.chroma_8x8 = chroma_8x8;
+    k.transform_16x16 = transform_16x16;
+    k.transform_8x8 = transform_8x8;
+    k.quantize = quantize;
+    k.reconstruct_16x16 = reconstruct_16x16;
+    k.reconstruct_8x8 = reconstruct_8x8;
+    k.block_sums = block_sums;
+    k.deblock_luma_vertical = deblock_luma_vertical;
+    k.deblock_luma_horizontal = deblock_luma_horizontal;
+    k.deblock_luma_vertical_strong = deblock_luma_vertical_strong;
+    k.deblock_luma_horizontal_strong = deblock_luma_horizontal_strong;
+    return k;
+}
+
+}  // namespace zolt

@@ -1,0 +1,788 @@
+#include <emmintrin.h>
+
+#include <cstring>
+
+#include "encoder/kernels/deblock_simd.h"
+#include "encoder/kernels/x86_tables.h"
+#include "encoder/kernels/zigzag.h"
+
+namespace zolt {
+namespace {
+
+using std::int16_t;
+using std::int32_t;
+using std::int8_t;
+using std::ptrdiff_t;
+using std::uint16_t;
+using std::uint32_t;
+using std::uint8_t;
+
+__m128i load(const void* p) {
+    return _mm_loadu_si128(static_cast<const __m128i*>(p));
+}
+__m128i load_aligned(const void* p) {
+    return _mm_load_si128(static_cast<const __m128i*>(p));
+}
+__m128i load_8(const void* p) {
+    return _mm_loadl_epi64(static_cast<const __m128i*>(p));
+}
+__m128i load_4(const void* p) {
+    int32_t value;
+    std::memcpy(&value, p, sizeof value);
+    return _mm_cvtsi32_si128(value);
+}
+void store(void* p, __m128i v) {
+    _mm_storeu_si128(static_cast<__m128i*>(p), v);
+}
+void store_8(void* p, __m128i v) {
+    _mm_storel_epi64(static_cast<__m128i*>(p), v);
+}
+void store_4(void* p, __m128i v) {
+    const int32_t value = _mm_cvtsi128_si32(v);
+    std::memcpy(p, &value, sizeof value);
+}
+
+__m128i widen_low(__m128i samples) {
+    return _mm_unpacklo_epi8(samples, _mm_setzero_si128());
+}
+__m128i widen_high(__m128i samples) {
+    return _mm_unpackhi_epi8(samples, _mm_setzero_si128());
+}
+__m128i absolute_16(__m128i v) {
+    return _mm_max_epi16(v, _mm_sub_epi16(_mm_setzero_si128(), v));
+}
+__m128i absolute_32(__m128i v) {
+    const __m128i sign = _mm_srai_epi32(v, 31);
+    return _mm_sub_epi32(_mm_xor_si128(v, sign), sign);
+}
+
+// ---- Distortion of the motion search ----
+
+// Masks of the even and of the odd columns; the phases' rows and columns are those of Kernels.h.
+__m128i even_columns() {
+    return _mm_set1_epi16(0x00ff);
+}
+__m128i odd_columns() {
+    return _mm_set1_epi16(static_cast<short>(0xff00));
+}
+
+void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
+    for (int row = 0; row < 8; ++row) {
+        const __m128i even = load(src + 2 * row * stride);
+        const __m128i odd = load(src + (2 * row + 1) * stride);
+        store(phases + 16 * row, _mm_and_si128(even, even_columns()));
+        store(phases + 128 + 16 * row, _mm_and_si128(odd, odd_columns()));
+        store(phases + 256 + 16 * row, _mm_and_si128(odd, even_columns()));
+        store(phases + 384 + 16 * row, _mm_and_si128(even, odd_columns()));
+    }
+}
+
+// SAD of one phase; sample_row(y) gives 16 samples of row y of the block compared with.
+template <typename SampleRow>
+int phase_sad(const uint8_t* phase, int first_row, __m128i columns, SampleRow sample_row) {
+    __m128i sum = _mm_setzero_si128();
+    for (int row = 0; row < 8; ++row) {
+        const __m128i samples = _mm_and_si128(sample_row(2 * row + first_row), columns);
+        sum = _mm_add_epi32(sum, _mm_sad_epu8(samples, load_aligned(phase + 16 * row)));
+    }
+    return _mm_cvtsi128_si32(_mm_add_epi32(sum, _mm_srli_si128(sum, 8)));
+}
+
+template <typename SampleRow>
+bool sum_phases(const uint8_t* phases, const int* limits, int* sums, SampleRow sample_row) {
+    sums[0] = phase_sad(phases, 0, even_columns(), sample_row);
+    if (sums[0] >= limits[0]) {
+        return false;
+    }
+    sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), sample_row);
+    if (sums[1] >= limits[1]) {
+        return false;
+    }
+    sums[2] = sums[1] + phase_sad(phases + 256, 1, even_columns(), sample_row);
+    if (sums[2] >= limits[2]) {
+        return false;
+    }
+    sums[3] = sums[2] + phase_sad(phases + 384, 0, odd_columns(), sample_row);
+    return true;
+}
+
+bool sad_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, const int* limits,
+                int* sums) {
+    return sum_phases(phases, limits, sums, [=](int y) { return load(ref + y * stride); });
+}
+
+bool sad_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
+                        const int* limits, int* sums) {
+    return sum_phases(phases, limits, sums, [=](int y) {
+        return _mm_avg_epu8(load(a + y * stride), load(b + y * stride));
+    });
+}
+
+// ---- Reference planes ----
+
+// (E - 5F + 20G + 20H - 5I + J + 16) >> 5 in 16-bit lanes.
+__m128i half_sample(__m128i outer, __m128i middle, __m128i inner) {
+    const __m128i t = _mm_sub_epi16(_mm_slli_epi16(inner, 2), middle);  // 4 * inner - middle
+    const __m128i sum = _mm_add_epi16(_mm_add_epi16(outer, t), _mm_slli_epi16(t, 2));
+    return _mm_srai_epi16(_mm_add_epi16(sum, _mm_set1_epi16(16)), 5);
+}
+
+// 16 half samples between p[0] and p[step].
+__m128i half_samples(const uint8_t* p, ptrdiff_t step) {
+    const __m128i e = load(p - 2 * step), f = load(p - step), g = load(p);
+    const __m128i h = load(p + step), i = load(p + 2 * step), j = load(p + 3 * step);
+    const __m128i low = half_sample(_mm_add_epi16(widen_low(e), widen_low(j)),
+                                    _mm_add_epi16(widen_low(f), widen_low(i)),
+                                    _mm_add_epi16(widen_low(g), widen_low(h)));
+    const __m128i high = half_sample(_mm_add_epi16(widen_high(e), widen_high(j)),
+                                     _mm_add_epi16(widen_high(f), widen_high(i)),
+                                     _mm_add_epi16(widen_high(g), widen_high(h)));
+    return _mm_packus_epi16(low, high);
+}
+
+// A row of count >= 16 half samples; the last step overlaps the one before it.
+void half_row(const uint8_t* src, ptrdiff_t step, uint8_t* dst, int count) {
+    for (int x = 0; x < count - 16; x += 16) {
+        store(dst + x, half_samples(src + x, step));
+    }
+    store(dst + count - 16, half_samples(src + count - 16, step));
+}
+
+void half_vertical_row(const uint8_t* src, ptrdiff_t stride, uint8_t* dst, int count) {
+    if (count < 16) {
+        scalar_kernels().half_vertical_row(src, stride, dst, count);
+        return;
+    }
+    half_row(src, stride, dst, count);
+}
+
+void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
+    if (count < 16) {
+        scalar_kernels().half_horizontal_row(src, dst, count);
+        return;
+    }
+    half_row(src, 1, dst, count);
+}
+
+// ---- Inter prediction ----
+
+void copy_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
+    for (int y = 0; y < 16; ++y) {
+        store(pred + 16 * y, load(src + y * stride));
+    }
+}
+
+void average_16x16(uint8_t* pred, const uint8_t* a, ptrdiff_t a_stride, const uint8_t* b,
+                   ptrdiff_t b_stride) {
+    for (int y = 0; y < 16; ++y) {
+        store(pred + 16 * y, _mm_avg_epu8(load(a + y * a_stride), load(b + y * b_stride)));
+    }
+}
+
+// Unrounded vertical sums of 8 samples.
+__m128i vertical_sums(const uint8_t* p, ptrdiff_t stride) {
+    const __m128i outer =
+        _mm_add_epi16(widen_low(load_8(p - 2 * stride)), widen_low(load_8(p + 3 * stride)));
+    const __m128i middle =
+        _mm_add_epi16(widen_low(load_8(p - stride)), widen_low(load_8(p + 2 * stride)));
+    const __m128i inner = _mm_add_epi16(widen_low(load_8(p)), widen_low(load_8(p + stride)));
+    const __m128i t = _mm_sub_epi16(_mm_slli_epi16(inner, 2), middle);
+    return _mm_add_epi16(_mm_add_epi16(outer, t), _mm_slli_epi16(t, 2));
+}
+
+// (outer - 5 * middle + 20 * inner + 512) >> 10 with 32-bit sums.
+__m128i centre_samples(__m128i outer, __m128i middle, __m128i inner) {
+    const __m128i ones = _mm_set1_epi16(1);
+    const __m128i outer_middle = _mm_set1_epi32(static_cast<int>(0xfffb0001u));  // 1, -5
+    const __m128i inner_rounding = _mm_set1_epi32(512 << 16 | 20);
+    const __m128i low =
+        _mm_add_epi32(_mm_madd_epi16(_mm_unpacklo_epi16(outer, middle), outer_middle),
+                      _mm_madd_epi16(_mm_unpacklo_epi16(inner, ones), inner_rounding));
+    const __m128i high =
+        _mm_add_epi32(_mm_madd_epi16(_mm_unpackhi_epi16(outer, middle), outer_middle),
+                      _mm_madd_epi16(_mm_unpackhi_epi16(inner, ones), inner_rounding));
+    return _mm_packs_epi32(_mm_srai_epi32(low, 10), _mm_srai_epi32(high, 10));
+}
+
+void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
+    alignas(16) int16_t sums[24];  // columns -2..21, of which the last three are not used
+    for (int y = 0; y < 16; ++y) {
+        const uint8_t* row = src + y * stride - 2;
+        _mm_store_si128(reinterpret_cast<__m128i*>(sums), vertical_sums(row, stride));
+        _mm_store_si128(reinterpret_cast<__m128i*>(sums + 8), vertical_sums(row + 8, stride));
+        store(sums + 13, vertical_sums(row + 13, stride));
+        __m128i half[2];
+        for (int x = 0; x < 2; ++x) {
+            const int16_t* s = sums + 8 * x;
+            half[x] = centre_samples(_mm_add_epi16(load(s), load(s + 5)),
+                                     _mm_add_epi16(load(s + 1), load(s + 4)),
+                                     _mm_add_epi16(load(s + 2), load(s + 3)));
+        }
+        store(pred + 16 * y, _mm_packus_epi16(half[0], half[1]));
+    }
+}
+
+void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
+    const __m128i left = _mm_set1_epi16(static_cast<short>(8 - fx));
+    const __m128i right = _mm_set1_epi16(static_cast<short>(fx));
+    const __m128i upper_weight = _mm_set1_epi16(static_cast<short>(8 - fy));
+    const __m128i lower_weight = _mm_set1_epi16(static_cast<short>(fy));
+    // Column 8 is read only through the 8 samples that start at column 1.
+    const auto horizontal = [&](const uint8_t* row) {
+        return _mm_add_epi16(_mm_mullo_epi16(widen_low(load_8(row)), left),
+                             _mm_mullo_epi16(widen_low(load_8(row + 1)), right));
+    };
+    __m128i upper = horizontal(src);
+    for (int y = 0; y < 8; ++y) {
+        const __m128i lower = horizontal(src + (y + 1) * stride);
+        const __m128i sum = _mm_add_epi16(_mm_mullo_epi16(upper, upper_weight),
+                                          _mm_mullo_epi16(lower, lower_weight));
+        const __m128i rounded = _mm_srli_epi16(_mm_add_epi16(sum, _mm_set1_epi16(32)), 6);
+        store_8(pred + 8 * y, _mm_packus_epi16(rounded, rounded));
+        upper = lower;
+    }
+}
+
+// ---- Residual ----
+
+// Forward core transform across four vectors.
+void forward_butterfly(__m128i* v) {
+    const __m128i s = _mm_add_epi16(v[0], v[3]);
+    const __m128i d = _mm_sub_epi16(v[0], v[3]);
+    const __m128i t = _mm_add_epi16(v[1], v[2]);
+    const __m128i u = _mm_sub_epi16(v[1], v[2]);
+    v[0] = _mm_add_epi16(s, t);
+    v[1] = _mm_add_epi16(_mm_add_epi16(d, d), u);
+    v[2] = _mm_sub_epi16(s, t);
+    v[3] = _mm_sub_epi16(d, _mm_add_epi16(u, u));
+}
+
+// Inverse core transform across four vectors.
+void inverse_butterfly(__m128i* v) {
+    const __m128i e = _mm_add_epi16(v[0], v[2]);
+    const __m128i f = _mm_sub_epi16(v[0], v[2]);
+    const __m128i g = _mm_sub_epi16(_mm_srai_epi16(v[1], 1), v[3]);
+    const __m128i h = _mm_add_epi16(v[1], _mm_srai_epi16(v[3], 1));
+    v[0] = _mm_add_epi16(e, h);
+    v[1] = _mm_add_epi16(f, g);
+    v[2] = _mm_sub_epi16(f, g);
+    v[3] = _mm_sub_epi16(e, h);
+}
+
+// Transposes the two 4x4 blocks that stand side by side in four vectors.
+void transpose_two(__m128i* v) {
+    const __m128i a = _mm_unpacklo_epi16(v[0], v[1]);
+    const __m128i b = _mm_unpackhi_epi16(v[0], v[1]);
+    const __m128i c = _mm_unpacklo_epi16(v[2], v[3]);
+    const __m128i d = _mm_unpackhi_epi16(v[2], v[3]);
+    const __m128i first_01 = _mm_unpacklo_epi32(a, c);
+    const __m128i first_23 = _mm_unpackhi_epi32(a, c);
+    const __m128i second_01 = _mm_unpacklo_epi32(b, d);
+    const __m128i second_23 = _mm_unpackhi_epi32(b, d);
+    v[0] = _mm_unpacklo_epi64(first_01, second_01);
+    v[1] = _mm_unpackhi_epi64(first_01, second_01);
+    v[2] = _mm_unpacklo_epi64(first_23, second_23);
+    v[3] = _mm_unpackhi_epi64(first_23, second_23);
+}
+
+// Two blocks side by side, written one after the other.
+void transform_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptrdiff_t pred_stride,
+                   int16_t* coefs) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_8(src + y * stride)),
+                             widen_low(load_8(pred + y * pred_stride)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    store(coefs, _mm_unpacklo_epi64(v[0], v[1]));
+    store(coefs + 8, _mm_unpacklo_epi64(v[2], v[3]));
+    store(coefs + 16, _mm_unpackhi_epi64(v[0], v[1]));
+    store(coefs + 24, _mm_unpackhi_epi64(v[2], v[3]));
+}
+
+// Sample offsets of the pair of blocks 2n, 2n + 1 in decoding order (Figure 6-10).
+constexpr int pair_x(int n) {
+    return 8 * (n >> 1 & 1);
+}
+constexpr int pair_y(int n) {
+    return 4 * (n & 1) + 8 * (n >> 2);
+}
+
+void transform_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
+    for (int n = 0; n < 8; ++n) {
+        transform_two(src + pair_y(n) * stride + pair_x(n), stride,
+                      pred + pair_y(n) * 16 + pair_x(n), 16, coefs + 32 * n);
+    }
+}
+
+void transform_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
+    transform_two(src, stride, pred, 8, coefs);
+    transform_two(src + 4 * stride, stride, pred + 32, 8, coefs + 32);
+}
+
+void transform_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_4(src + y * stride)), widen_low(load_4(pred + 4 * y)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    store(coefs, _mm_unpacklo_epi64(v[0], v[1]));
+    store(coefs + 8, _mm_unpacklo_epi64(v[2], v[3]));
+}
+
+// Levels and scaled coefficients of eight coefficients.
+void quantize_eight(__m128i c, const int16_t* forward, const int16_t* dequant, __m128i rounding,
+                    __m128i shift, __m128i* levels, __m128i* scaled) {
+    const __m128i magnitude = absolute_16(c);
+    const __m128i factor = load_aligned(forward);
+    const __m128i low = _mm_mullo_epi16(magnitude, factor);
+    const __m128i high = _mm_mulhi_epu16(magnitude, factor);
+    const __m128i first =
+        _mm_srl_epi32(_mm_add_epi32(_mm_unpacklo_epi16(low, high), rounding), shift);
+    const __m128i second =
+        _mm_srl_epi32(_mm_add_epi32(_mm_unpackhi_epi16(low, high), rounding), shift);
+    const __m128i level = _mm_min_epi16(_mm_packs_epi32(first, second), _mm_set1_epi16(kMaxLevel));
+    const __m128i sign = _mm_srai_epi16(c, 15);
+    *levels = _mm_sub_epi16(_mm_xor_si128(level, sign), sign);
+    *scaled = _mm_mullo_epi16(*levels, load_aligned(dequant));
+}
+
+uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t* scan,
+                  uint16_t* nonzero) {
+    const __m128i rounding = _mm_set1_epi32(quantizer.rounding);
+    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
+    const __m128i zero = _mm_setzero_si128();
+    uint32_t mask = 0;
+    for (int block = 0; block < count; ++block, coefs += 16, scan += 16) {
+        const __m128i c0 = load_aligned(coefs);
+        const __m128i c1 = load_aligned(coefs + 8);
+        const __m128i coded =
+            _mm_or_si128(_mm_cmpgt_epi16(absolute_16(c0), load_aligned(quantizer.dead_zone)),
+                         _mm_cmpgt_epi16(absolute_16(c1), load_aligned(quantizer.dead_zone + 8)));
+        if (_mm_movemask_epi8(coded) == 0) {
+            store(coefs, zero);
+            store(coefs + 8, zero);
+            store(scan, zero);
+            store(scan + 8, zero);
+            nonzero[block] = 0;
+            continue;
+        }
+        alignas(16) int16_t levels[16];
+        __m128i level0, level1, scaled0, scaled1;
+        quantize_eight(c0, quantizer.forward, quantizer.dequant, rounding, shift, &level0,
+                       &scaled0);
+        quantize_eight(c1, quantizer.forward + 8, quantizer.dequant + 8, rounding, shift, &level1,
+                       &scaled1);
+        store(levels, level0);
+        store(levels + 8, level1);
+        store(coefs, scaled0);
+        store(coefs + 8, scaled1);
+        for (int n = 0; n < 16; ++n) {
+            scan[n] = levels[kZigzag[n]];
+        }
+        const __m128i zeros = _mm_cmpeq_epi8(_mm_packs_epi16(load(scan), load(scan + 8)), zero);
+        nonzero[block] = static_cast<uint16_t>(~_mm_movemask_epi8(zeros));
+        mask |= 1u << block;
+    }
+    return mask;
+}
+
+// Whether 16-bit sums are exact for a block: no sum of the inverse transform, rounding included,
+// exceeds the sum of the magnitudes.
+bool fits_16_bits(const int16_t* coefs) {
+    constexpr int kLargestSum = 32767 - 32;
+    const __m128i ones = _mm_set1_epi16(1);
+    __m128i sum = _mm_add_epi32(_mm_madd_epi16(absolute_16(load_aligned(coefs)), ones),
+                                _mm_madd_epi16(absolute_16(load_aligned(coefs + 8)), ones));
+    sum = _mm_add_epi32(sum, _mm_srli_si128(sum, 8));
+    sum = _mm_add_epi32(sum, _mm_srli_si128(sum, 4));
+    return _mm_cvtsi128_si32(sum) <= kLargestSum;
+}
+
+// Rows of the residual of two blocks side by side.
+void inverse_two(const int16_t* first, const int16_t* second, __m128i* rows) {
+    const __m128i first_01 = load_aligned(first), first_23 = load_aligned(first + 8);
+    const __m128i second_01 = load_aligned(second), second_23 = load_aligned(second + 8);
+    rows[0] = _mm_unpacklo_epi64(first_01, second_01);
+    rows[1] = _mm_unpackhi_epi64(first_01, second_01);
+    rows[2] = _mm_unpacklo_epi64(first_23, second_23);
+    rows[3] = _mm_unpackhi_epi64(first_23, second_23);
+    inverse_butterfly(rows);
+    transpose_two(rows);
+    inverse_butterfly(rows);
+    for (int y = 0; y < 4; ++y) {
+        rows[y] = _mm_srai_epi16(_mm_add_epi16(rows[y], _mm_set1_epi16(32)), 6);
+    }
+}
+
+alignas(16) constexpr int16_t kNoCoefs[16] = {};
+
+// Two blocks side by side; bits 0 and 1 of mask. Returns false when 16 bits are not enough.
+bool reconstruct_two(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
+                     ptrdiff_t pred_stride, uint8_t* dst, ptrdiff_t stride) {
+    if ((mask & 3) == 0) {
+        for (int y = 0; y < 4; ++y) {
+            store_8(dst + y * stride, load_8(pred + y * pred_stride));
+        }
+        return true;
+    }
+    const int16_t* first = mask & 1 ? coefs : kNoCoefs;
+    const int16_t* second = mask & 2 ? coefs + 16 : kNoCoefs;
+    if (!fits_16_bits(first) || !fits_16_bits(second)) {
+        return false;
+    }
+    __m128i rows[4];
+    inverse_two(first, second, rows);
+    for (int y = 0; y < 4; ++y) {
+        const __m128i sum = _mm_add_epi16(rows[y], widen_low(load_8(pred + y * pred_stride)));
+        store_8(dst + y * stride, _mm_packus_epi16(sum, sum));
+    }
+    return true;
+}
+
+void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                       ptrdiff_t stride) {
+    for (int n = 0; n < 8; ++n) {
+        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + pair_y(n) * 16 + pair_x(n), 16,
+                             dst + pair_y(n) * stride + pair_x(n), stride)) {
+            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
+            return;
+        }
+    }
+}
+
+void reconstruct_8x8(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                     ptrdiff_t stride) {
+    for (int n = 0; n < 2; ++n) {
+        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + 32 * n, 8,
+                             dst + 4 * n * stride, stride)) {
+            scalar_kernels().reconstruct_8x8(coefs, mask, pred, dst, stride);
+            return;
+        }
+    }
+}
+
+void reconstruct_4x4(const int16_t* coefs, const uint8_t* pred, uint8_t* dst, ptrdiff_t stride) {
+    if (!fits_16_bits(coefs)) {
+        scalar_kernels().reconstruct_4x4(coefs, pred, dst, stride);
+        return;
+    }
+    __m128i rows[4];
+    inverse_two(coefs, kNoCoefs, rows);
+    for (int y = 0; y < 4; ++y) {
+        const __m128i sum = _mm_add_epi16(rows[y], widen_low(load_4(pred + 4 * y)));
+        store_4(dst + y * stride, _mm_packus_epi16(sum, sum));
+    }
+}
+
+// ---- Features and distortions of the intra decisions ----
+
+void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
+    const __m128i zero = _mm_setzero_si128();
+    const __m128i ones = _mm_set1_epi16(1);
+    for (int block_row = 0; block_row < 4; ++block_row, src += 4 * stride) {
+        __m128i low = zero;
+        __m128i high = zero;
+        for (int y = 0; y < 4; ++y) {
+            const __m128i samples = load(src + y * stride);
+            low = _mm_add_epi16(low, widen_low(samples));
+            high = _mm_add_epi16(high, widen_high(samples));
+        }
+        // Sums of two columns each, then of four.
+        const __m128i pairs =
+            _mm_packs_epi32(_mm_madd_epi16(low, ones), _mm_madd_epi16(high, ones));
+        store(sums + 4 * block_row, _mm_madd_epi16(pairs, ones));
+    }
+}
+
+// 4-point Hadamard transform across four vectors.
+void hadamard(__m128i* v) {
+    const __m128i a = _mm_add_epi32(v[0], v[1]);
+    const __m128i b = _mm_sub_epi32(v[0], v[1]);
+    const __m128i c = _mm_add_epi32(v[2], v[3]);
+    const __m128i d = _mm_sub_epi32(v[2], v[3]);
+    v[0] = _mm_add_epi32(a, c);
+    v[1] = _mm_add_epi32(b, d);
+    v[2] = _mm_sub_epi32(a, c);
+    v[3] = _mm_sub_epi32(b, d);
+}
+
+void hadamard_energy(const int32_t* values, int32_t* energy) {
+    __m128i v[4];
+    for (int i = 0; i < 4; ++i) {
+        v[i] = load(values + 4 * i);
+    }
+    hadamard(v);
+    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
+    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
+    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
+    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
+    v[0] = _mm_unpacklo_epi64(a, c);
+    v[1] = _mm_unpackhi_epi64(a, c);
+    v[2] = _mm_unpacklo_epi64(b, d);
+    v[3] = _mm_unpackhi_epi64(b, d);
+    hadamard(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
+    for (__m128i& row : v) {
+        row = _mm_srli_epi32(_mm_add_epi32(absolute_32(row), _mm_set1_epi32(8)), 4);
+    }
+    alignas(16) int32_t constant[4];
+    alignas(16) int32_t others[4];
+    store(constant, v[0]);
+    store(others, _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]));
+    energy[0] = constant[0];
+    energy[1] = others[0];
+    energy[2] = constant[1] + constant[2] + constant[3];
+    energy[3] = others[1] + others[2] + others[3];
+}
+
+void phase_sad_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                     int32_t* distortion) {
+    const __m128i zero = _mm_setzero_si128();
+    for (int y = 0; y < 4; ++y) {
+        __m128i sum = zero;
+        for (int row = y; row < 16; row += 4) {
+            const __m128i a = load(src + row * stride);
+            const __m128i b = load(pred + 16 * row);
+            const __m128i difference = _mm_or_si128(_mm_subs_epu8(a, b), _mm_subs_epu8(b, a));
+            sum = _mm_add_epi16(sum, _mm_add_epi16(widen_low(difference), widen_high(difference)));
+        }
+        sum = _mm_add_epi16(sum, _mm_srli_si128(sum, 8));
+        store(distortion + 4 * y, _mm_unpacklo_epi16(sum, zero));
+    }
+}
+
+void phase_satd_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                    int32_t* distortion) {
+    const __m128i zero = _mm_setzero_si128();
+    const auto difference = [&](int y) {
+        return _mm_sub_epi16(widen_low(load_8(src + y * stride)), widen_low(load_8(pred + 8 * y)));
+    };
+    for (int y = 0; y < 4; ++y) {
+        const __m128i upper = difference(y);
+        const __m128i lower = difference(y + 4);
+        const __m128i sums = absolute_16(_mm_add_epi16(upper, lower));
+        const __m128i differences = absolute_16(_mm_sub_epi16(upper, lower));
+        // |a + b| + |a - b| = 2 max(|a|, |b|), a and b four columns apart.
+        const __m128i largest =
+            _mm_add_epi16(_mm_max_epi16(sums, _mm_srli_si128(sums, 8)),
+                          _mm_max_epi16(differences, _mm_srli_si128(differences, 8)));
+        store(distortion + 4 * y, _mm_unpacklo_epi16(_mm_add_epi16(largest, largest), zero));
+    }
+}
+
+void phase_satd_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                    int32_t* distortion) {
+    const __m128i src_01 = _mm_unpacklo_epi32(load_4(src), load_4(src + stride));
+    const __m128i src_23 = _mm_unpacklo_epi32(load_4(src + 2 * stride), load_4(src + 3 * stride));
+    const __m128i rows_01 = _mm_sub_epi16(widen_low(src_01), widen_low(load_8(pred)));
+    const __m128i rows_23 = _mm_sub_epi16(widen_low(src_23), widen_low(load_8(pred + 8)));
+    const __m128i sums = absolute_16(_mm_add_epi16(rows_01, rows_23));
+    const __m128i differences = absolute_16(_mm_sub_epi16(rows_01, rows_23));
+    // As above, two columns apart: each row is a group of four lanes.
+    const __m128i largest =
+        _mm_add_epi16(_mm_max_epi16(sums, _mm_srli_epi64(sums, 32)),
+                      _mm_max_epi16(differences, _mm_srli_epi64(differences, 32)));
+    const __m128i doubled = _mm_add_epi16(largest, largest);
+    const __m128i phases = _mm_shuffle_epi32(doubled, _MM_SHUFFLE(3, 1, 2, 0));
+    store(distortion, _mm_unpacklo_epi16(phases, _mm_setzero_si128()));
+}
+
+// ---- Deblocking ----
+
+// Eight lines of an edge.
+struct Lanes {
+    static constexpr int kLanes = 8;
+    __m128i v;
+
+    static Lanes load(const uint8_t* p) { return {widen_low(load_8(p))}; }
+    void store(uint8_t* p) const { store_8(p, _mm_packus_epi16(v, v)); }
+    static Lanes splat(int value) { return {_mm_set1_epi16(static_cast<short>(value))}; }
+
+    friend Lanes operator+(Lanes a, Lanes b) { return {_mm_add_epi16(a.v, b.v)}; }
+    friend Lanes operator-(Lanes a, Lanes b) { return {_mm_sub_epi16(a.v, b.v)}; }
+    friend Lanes operator*(Lanes a, Lanes b) { return {_mm_mullo_epi16(a.v, b.v)}; }
+    friend Lanes operator&(Lanes a, Lanes b) { return {_mm_and_si128(a.v, b.v)}; }
+    static Lanes andnot(Lanes a, Lanes b) { return {_mm_andnot_si128(a.v, b.v)}; }
+    static Lanes less(Lanes a, Lanes b) { return {_mm_cmplt_epi16(a.v, b.v)}; }
+    static Lanes min(Lanes a, Lanes b) { return {_mm_min_epi16(a.v, b.v)}; }
+    static Lanes max(Lanes a, Lanes b) { return {_mm_max_epi16(a.v, b.v)}; }
+    static Lanes average(Lanes a, Lanes b) { return {_mm_avg_epu16(a.v, b.v)}; }
+    static Lanes shift_right(Lanes a, int n) { return {_mm_srai_epi16(a.v, n)}; }
+    static Lanes absolute_difference(Lanes a, Lanes b) {
+        return {absolute_16(_mm_sub_epi16(a.v, b.v))};
+    }
+    static Lanes select(Lanes mask, Lanes a, Lanes b) {
+        return {_mm_or_si128(_mm_and_si128(mask.v, a.v), _mm_andnot_si128(mask.v, b.v))};
+    }
+    static bool any(Lanes a) { return _mm_movemask_epi8(a.v) != 0; }
+};
+
+// tC0 of two luma segments, four lines each; of four chroma segments, two lines each.
+Lanes luma_tc0(const int8_t* tc0) {
+    return {_mm_set_epi16(tc0[1], tc0[1], tc0[1], tc0[1], tc0[0], tc0[0], tc0[0], tc0[0])};
+}
+Lanes chroma_tc0(const int8_t* tc0) {
+    return {_mm_set_epi16(tc0[3], tc0[3], tc0[2], tc0[2], tc0[1], tc0[1], tc0[0], tc0[0])};
+}
+
+// Transposes an 8x8 block of samples.
+void transpose_8x8(const uint8_t* src, ptrdiff_t src_stride, uint8_t* dst, ptrdiff_t dst_stride) {
+    __m128i a[4];
+    for (int i = 0; i < 4; ++i) {
+        a[i] = _mm_unpacklo_epi8(load_8(src + i * src_stride), load_8(src + (i + 4) * src_stride));
+    }
+    const __m128i b0 = _mm_unpacklo_epi8(a[0], a[2]), b1 = _mm_unpackhi_epi8(a[0], a[2]);
+    const __m128i b2 = _mm_unpacklo_epi8(a[1], a[3]), b3 = _mm_unpackhi_epi8(a[1], a[3]);
+    const __m128i rows[4] = {_mm_unpacklo_epi8(b0, b2), _mm_unpackhi_epi8(b0, b2),
+                             _mm_unpacklo_epi8(b1, b3), _mm_unpackhi_epi8(b1, b3)};
+    for (int i = 0; i < 4; ++i) {
+        store_8(dst + 2 * i * dst_stride, rows[i]);
+        store_8(dst + (2 * i + 1) * dst_stride, _mm_srli_si128(rows[i], 8));
+    }
+}
+
+// Runs filter on the rows around a horizontal edge: samples each side, first q sample at pix.
+template <typename Filter>
+void filter_rows(uint8_t* pix, ptrdiff_t stride, int side, Filter filter) {
+    uint8_t* rows[8];
+    for (int i = 0; i < 2 * side; ++i) {
+        rows[i] = pix + (i - side) * stride;
+    }
+    filter(rows);
+}
+
+// Runs filter on the four columns on either side of a vertical edge of eight lines, which it sees
+// as rows.
+template <typename Filter>
+void filter_luma_columns(uint8_t* pix, ptrdiff_t stride, Filter filter) {
+    alignas(16) uint8_t block[64];
+    uint8_t* rows[8];
+    for (int i = 0; i < 8; ++i) {
+        rows[i] = block + 8 * i;
+    }
+    transpose_8x8(pix - 4, stride, block, 8);
+    filter(rows);
+    transpose_8x8(block, 8, pix - 4, stride);
+}
+
+// The same for the two columns on either side of a chroma edge, of which the inner ones change.
+template <typename Filter>
+void filter_chroma_columns(uint8_t* pix, ptrdiff_t stride, Filter filter) {
+    alignas(16) uint8_t block[32];
+    uint8_t* rows[4];
+    for (int i = 0; i < 4; ++i) {
+        rows[i] = block + 8 * i;
+    }
+    __m128i a[4];
+    for (int i = 0; i < 4; ++i) {
+        a[i] = _mm_unpacklo_epi8(load_4(pix - 2 + i * stride), load_4(pix - 2 + (i + 4) * stride));
+    }
+    const __m128i even = _mm_unpacklo_epi8(a[0], a[2]);
+    const __m128i odd = _mm_unpacklo_epi8(a[1], a[3]);
+    store(block, _mm_unpacklo_epi8(even, odd));
+    store(block + 16, _mm_unpackhi_epi8(even, odd));
+    filter(rows);
+    alignas(16) uint8_t pairs[16];
+    store(pairs, _mm_unpacklo_epi8(load_8(rows[1]), load_8(rows[2])));
+    for (int i = 0; i < 8; ++i) {
+        std::memcpy(pix - 1 + i * stride, pairs + 2 * i, 2);
+    }
+}
+
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+                             const int8_t* tc0) {
+    for (int half = 0; half < 2; ++half) {
+        filter_rows(pix + 8 * half, stride, 4, [&](uint8_t* const* rows) {
+            luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+        });
+    }
+}
+
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
+    for (int half = 0; half < 2; ++half) {
+        filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
+            luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+        });
+    }
+}
+
+void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    for (int half = 0; half < 2; ++half) {
+        filter_rows(pix + 8 * half, stride, 4,
+                    [&](uint8_t* const* rows) { luma_rows_strong<Lanes>(rows, alpha, beta); });
+    }
+}
+
+void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    for (int half = 0; half < 2; ++half) {
+        filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
+            luma_rows_strong<Lanes>(rows, alpha, beta);
+        });
+    }
+}
+
+void deblock_chroma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+                               const int8_t* tc0) {
+    filter_rows(pix, stride, 2,
+                [&](uint8_t* const* rows) { chroma_rows(rows, alpha, beta, chroma_tc0(tc0)); });
+}
+
+void deblock_chroma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+                             const int8_t* tc0) {
+    filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
+        chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+    });
+}
+
+void deblock_chroma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    filter_rows(pix, stride, 2,
+                [&](uint8_t* const* rows) { chroma_rows_strong<Lanes>(rows, alpha, beta); });
+}
+
+void deblock_chroma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+    filter_chroma_columns(
+        pix, stride, [&](uint8_t* const* rows) { chroma_rows_strong<Lanes>(rows, alpha, beta); });
+}
+
+}  // namespace
+
+Kernels with_sse2(const Kernels& base) {
+    Kernels k = base;
+    k.name = "sse2";
+    k.split_phases = split_phases;
+    k.sad_phases = sad_phases;
+    k.sad_phases_average = sad_phases_average;
+    k.half_vertical_row = half_vertical_row;
+    k.half_horizontal_row = half_horizontal_row;
+    k.copy_16x16 = copy_16x16;
+    k.average_16x16 = average_16x16;
+    k.centre_16x16 = centre_16x16;
+    k.chroma_8x8 = chroma_8x8;
+    k.transform_16x16 = transform_16x16;
+    k.transform_8x8 = transform_8x8;
+    k.transform_4x4 = transform_4x4;
+    k.quantize = quantize;
+    k.reconstruct_16x16 = reconstruct_16x16;
+    k.reconstruct_8x8 = reconstruct_8x8;
+    k.reconstruct_4x4 = reconstruct_4x4;
+    k.block_sums = block_sums;
+    k.hadamard_energy = hadamard_energy;
+    k.phase_sad_16x16 = phase_sad_16x16;
+    k.phase_satd_8x8 = phase_satd_8x8;
+    k.phase_satd_4x4 = phase_satd_4x4;
+    k.deblock_luma_vertical = deblock_luma_vertical;
+    k.deblock_luma_horizontal = deblock_luma_horizontal;
+    k.deblock_chroma_vertical = deblock_chroma_vertical;
+    k.deblock_chroma_horizontal = deblock_chroma_horizontal;
+    k.deblock_luma_vertical_strong = deblock_luma_vertical_strong;
+    k.deblock_luma_horizontal_strong = deblock_luma_horizontal_strong;
+    k.deblock_chroma_vertical_strong = deblock_chroma_vertical_strong;
+    k.deblock_chroma_horizontal_strong = deblock_chroma_horizontal_strong;
+    return k;
+}
+
+}  // namespace zolt

@@ -1,0 +1,11 @@
+#pragma once
+
+#include "encoder/kernels/Kernels.h"
+
+// The tables of x86 processors: each the one given with the entries replaced that are faster.
+namespace zolt {
+
+Kernels with_sse2(const Kernels& base);
+Kernels with_avx2(const Kernels& base);
+
+}  // namespace zolt
