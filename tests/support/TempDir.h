@@ -1,0 +1,30 @@
+#pragma once
+
+#include <unistd.h>
+
+#include <atomic>
+#include <filesystem>
+#include <string>
+
+// A directory of a test's own, removed with all that is in it at the end of the scope.
+class TempDir {
+public:
+    TempDir() {
+        static std::atomic<int> count{0};
+        root = std::filesystem::temp_directory_path() /
+               ("zolt-support-" + std::to_string(getpid()) + "-" + std::to_string(count++));
+        std::filesystem::create_directory(root);
+    }
+    ~TempDir() {
+        std::error_code ignored;
+        std::filesystem::remove_all(root, ignored);
+    }
+    TempDir(const TempDir&) = delete;
+    TempDir& operator=(const TempDir&) = delete;
+
+    std::string path() const { return root.string(); }
+    std::string path(const std::string& name) const { return (root / name).string(); }
+
+private:
+    std::filesystem::path root;
+};
