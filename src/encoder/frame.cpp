@@ -8,10 +8,14 @@ namespace {
 constexpr int kMaxQp = 51;
 constexpr int kOverflowQpStep = 4;
 
-// No macroblock takes more bits: 27 residual blocks (16 luma, luma DC, 2 chroma DC, 8 chroma AC) of
-// a 16-bit coeff_token and 16 levels of 28 bits, where a block with all its levels has no
-// total_zeros, and 128 bits for everything in front of them.
-constexpr unsigned kMaxMacroblockBits = 27 * (16 + 16 * 28) + 128;
+// The most bits that a macroblock can take, which is an intra 4x4 one in a P picture with 28-bit
+// levels only: blocks that have all their levels carry no total_zeros.
+constexpr unsigned kHeaderBits = 31 + 5 + 16 * 4 + 5 + 11 + 1;  // mb_skip_run to mb_qp_delta
+constexpr unsigned kLumaBlockBits = 16 + 16 * 28;               // coeff_token and levels
+constexpr unsigned kChromaDcBits = 6 + 4 * 28;
+constexpr unsigned kChromaAcBits = 16 + 15 * 28;
+constexpr unsigned kMaxMacroblockBits =
+    kHeaderBits + 16 * kLumaBlockBits + 2 * kChromaDcBits + 8 * kChromaAcBits;
 
 void copy_plane(std::uint8_t* dst, std::ptrdiff_t dst_stride, const std::uint8_t* src,
                 std::ptrdiff_t src_stride, int width, int height) {
