@@ -270,13 +270,6 @@ public:
     void framePredInitP();
     void make_half_pixel_sds();
     void generateMBPred();
-    void sd_search(_mv& result);
-    void estimate_half_pixel_sds(_mv& record);
-    void estimate_quarter_pixel_sds(_mv& record);
-    std::uint32_t find_sd_sad(const std::uint8_t* ref, std::uint32_t best_cost, int rate);
-    std::uint32_t find_qpix_sd_sad(const std::uint8_t* a, const std::uint8_t* b,
-                                   std::uint32_t best_cost, int rate);
-    int vector_rate(int x, int y) const;
 
     // ---- motioncomp ----
     // Vector prediction of clause 8.4.1.3 for the partition of w x h samples at block column bx and
@@ -451,10 +444,7 @@ public:
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
     zolt::AlignedBuffer<std::uint32_t> g_visit_store;
     std::uint32_t* g_visit_L0 = nullptr;
-    std::uint32_t g_visit_stamp = 0;    // stamp of the running search
-    std::uint32_t g_best_sad = 0;       // distortion of the running search's best candidate
-    std::uint32_t g_sd_thresh[3] = {};  // partial costs that reject a candidate
-    alignas(64) std::uint8_t g_cur_phases[512] = {};  // Kernels::split_phases of the macroblock
+    std::uint32_t g_visit_stamp = 0;  // stamp of the running search
 
     // ---- Deblocking: boundary strengths of the current macroblock ----
     std::uint8_t bs_ver[4][4] = {};  // [vertical edge, 0 the left one][segment, top to bottom]

@@ -6,13 +6,13 @@
 
 namespace {
 
-constexpr std::uint32_t kNoCost = 0xffffff;
+constexpr int kNoCost = 0xffffff;
 
 // A candidate whose distortion is lower ends the search it belongs to.
-constexpr std::uint32_t kGoodSad = 512;
+constexpr int kGoodSad = 512;
 
 // Lowest threshold of the distortion above which the spiral is walked.
-constexpr std::uint32_t kMinSpiralSad = 2048;
+constexpr int kMinSpiralSad = 2048;
 constexpr int kSpiralStep = 4;
 
 constexpr int kMaxRateIndex = 511;
@@ -46,6 +46,17 @@ T median(T a, T b, T c) {
     return std::max(std::min(a, b), std::min(std::max(a, b), c));
 }
 
+// Shares of a rate that are added to the SAD of the first phases.
+int first_share(int rate) {
+    return (rate + 2) >> 2;
+}
+int second_share(int rate) {
+    return (rate + 1) >> 1;
+}
+int third_share(int rate) {
+    return (3 * rate) >> 2;
+}
+
 // Interval of vector components.
 struct Range {
     int low, high;
@@ -60,20 +71,8 @@ Range vector_range(int position, int size, int centre, int range) {
             std::min(centre + range, size - position + 2)};
 }
 
-// The running integer search of one macroblock. The functions that evaluate candidates return true
-// when the search has ended.
-struct IntegerSearch {
-    CEncoder& encoder;
-    const std::uint8_t* ref;  // the macroblock's position in the reference
-    std::uint32_t* visited;   // stamp of the zero vector
-    int px, py;               // the macroblock's position, samples
-    std::uint32_t best_cost = kNoCost;
-    int best_x = 0, best_y = 0;
-
-    bool run(int mb_x, int mb_y);
-    bool evaluate(int x, int y);
-    bool walk_spiral();
-    bool walk_diamond();
+struct Vector {
+    int x, y;
 };
 
 // A half-sample candidate: fraction in quarter pels, plane and offset of its sample.
@@ -83,20 +82,17 @@ struct PlaneSample {
     int x, y;
 };
 struct HalfCandidate {
-    int dx, dy;
+    Vector fraction;
     PlaneSample sample;
 };
 constexpr HalfCandidate kHalfCandidates[8] = {
-    {0, 2, {kVertical, 0, 0}},     {0, -2, {kVertical, 0, -1}}, {2, 0, {kHorizontal, 0, 0}},
-    {-2, 0, {kHorizontal, -1, 0}}, {2, 2, {kCentre, 0, 0}},     {-2, 2, {kCentre, -1, 0}},
-    {2, -2, {kCentre, 0, -1}},     {-2, -2, {kCentre, -1, -1}}};
+    {{0, 2}, {kVertical, 0, 0}},     {{0, -2}, {kVertical, 0, -1}}, {{2, 0}, {kHorizontal, 0, 0}},
+    {{-2, 0}, {kHorizontal, -1, 0}}, {{2, 2}, {kCentre, 0, 0}},     {{-2, 2}, {kCentre, -1, 0}},
+    {{2, -2}, {kCentre, 0, -1}},     {{-2, -2}, {kCentre, -1, -1}}};
 
 // Quarter-sample candidates around the half-sample result, in the order of their evaluation.
-struct Fraction {
-    int dx, dy;
-};
-constexpr Fraction kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
-                                            {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
+constexpr Vector kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
+                                          {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
 
 // The two samples whose average is each of them (clause 8.4.2.2.1), for a result at an integer
 // sample G, at b, at h and at j. Offsets are relative to the result's sample in its own plane.
@@ -133,6 +129,51 @@ constexpr PlaneSample kQuarterSamples[4][8][2] = {{{{kFull, 0, 0}, {kHorizontal,
                                                    {{kVertical, 1, 0}, {kHorizontal, 0, 0}},
                                                    {{kVertical, 0, 0}, {kHorizontal, 0, 0}}}};
 
+// Number of candidates whose first phase is measured in one go.
+constexpr int kGroup = 4;
+
+// The motion search of one macroblock. Its stages share the thresholds, which reject a candidate by
+// its cost after a part of its samples, and the best distortion. A stage ends early when a new best
+// candidate has a distortion below kGoodSad.
+class MotionSearch {
+public:
+    explicit MotionSearch(CEncoder& encoder);
+    void integer_stage(_mv& result);
+    void half_stage(_mv& result);
+    void quarter_stage(_mv& result);
+
+private:
+    void search_integer_vectors();
+    bool try_vector(Vector v);
+    bool try_vectors(const Vector* vectors, int count);
+    bool walk_spiral();
+    bool walk_diamond();
+    bool first_visit(Vector v);
+    bool improve_integer(Vector v, int first_sad);
+
+    int vector_rate(int x, int y) const;
+    bool passes_first_phase(int first_sad, int rate) const;
+    void set_limits(int rate, int* limits) const;
+    bool accept(const int* sums, int rate, int first_threshold);
+    void set_planes(std::ptrdiff_t position);
+    const std::uint8_t* sample(const PlaneSample& s) const {
+        return m_planes[s.plane] + s.y * m_stride + s.x;
+    }
+
+    CEncoder& m_encoder;
+    const zolt::Kernels& m_kernels;
+    const std::ptrdiff_t m_stride;
+    const int m_px, m_py;       // the macroblock's position, samples
+    const std::uint8_t* m_ref;  // its samples in the reference
+    std::uint32_t* m_visited;   // stamp of the zero vector
+    int m_thresholds[3] = {kNoCost, kNoCost, kNoCost};
+    int m_best_cost = kNoCost;
+    int m_best_sad = 0;
+    Vector m_best = {0, 0};
+    const std::uint8_t* m_planes[4] = {};    // samples by Plane around the candidates of a stage
+    alignas(64) std::uint8_t m_phases[512];  // the macroblock's samples by sampling phase
+};
+
 }  // namespace
 
 void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel) {
@@ -147,7 +188,7 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
     g_origin_chroma = g_pad_chroma * (g_stride_chroma + 1);
     g_size_Y = (g_height16 + 2 * g_pad_luma) * g_stride_luma;
     g_size_U = (g_cheight + 2 * g_pad_chroma) * g_stride_chroma;
-    g_visit_dim = 16 * range;
+    g_visit_dim = 8 * range;
 }
 
 // Prepares the reference for the macroblocks of a P picture.
@@ -178,262 +219,306 @@ void CEncoder::make_half_pixel_sds() {
 // Motion search of the current macroblock: integer, half and quarter pels.
 void CEncoder::generateMBPred() {
     form_mv_prediction(&g_pmv_x, &g_pmv_y, 0, 0, 0, 16, 16);
-    g_kernels->split_phases(g_mb_src_y, g_stride_luma, g_cur_phases);
-    _mv& result = g_mv_array[g_mapMBNumber];
-    sd_search(result);
-    if (g_subpel_enable) {
-        estimate_half_pixel_sds(result);
-        estimate_quarter_pixel_sds(result);
-    }
-}
-
-// Subsampled diamond search at integer pels. Its result is also what later macroblocks of the
-// picture see of this one.
-void CEncoder::sd_search(_mv& result) {
     if (++g_visit_stamp == 0) {
         std::memset(g_visit_L0, 0,
                     sizeof *g_visit_L0 * static_cast<std::size_t>(g_visit_dim) *
                         static_cast<std::size_t>(g_visit_dim));
         g_visit_stamp = 1;
     }
-    std::fill(g_sd_thresh, g_sd_thresh + 3, kNoCost);
-
-    const int px = 16 * g_mb_x;
-    const int py = 16 * g_mb_y;
-    IntegerSearch search{*this, g_ref_y + static_cast<std::ptrdiff_t>(py) * g_stride_luma + px,
-                         g_visit_L0 + g_visit_dim / 2 * (g_visit_dim + 1), px, py};
-    search.run(g_mb_x, g_mb_y);
-
-    result.x = static_cast<std::int16_t>(search.best_x);
-    result.y = static_cast<std::int16_t>(search.best_y);
-    result.dx = 0;
-    result.dy = 0;
-    result.sad = g_best_sad;
-    result.cost = search.best_cost;
+    MotionSearch search(*this);
+    _mv& result = g_mv_array[g_mapMBNumber];
+    search.integer_stage(result);
     g_me_mb_L0[g_mapMBNumber] = result;
+    if (g_subpel_enable) {
+        search.half_stage(result);
+        search.quarter_stage(result);
+    }
 }
 
 namespace {
 
-bool IntegerSearch::run(int mb_x, int mb_y) {
-    const int mb_width = encoder.g_mb_width;
-    const int range = encoder.g_search_range;
+MotionSearch::MotionSearch(CEncoder& encoder)
+    : m_encoder(encoder),
+      m_kernels(*encoder.g_kernels),
+      m_stride(encoder.g_stride_luma),
+      m_px(16 * encoder.g_mb_x),
+      m_py(16 * encoder.g_mb_y),
+      m_ref(encoder.g_ref_y + m_py * m_stride + m_px),
+      m_visited(encoder.g_visit_L0 + encoder.g_visit_dim / 2 * (encoder.g_visit_dim + 1)) {
+    m_kernels.split_phases(encoder.g_mb_src_y, m_stride, m_phases);
+}
+
+// Subsampled diamond search at integer pels.
+void MotionSearch::integer_stage(_mv& result) {
+    search_integer_vectors();
+    result.x = static_cast<std::int16_t>(m_best.x);
+    result.y = static_cast<std::int16_t>(m_best.y);
+    result.dx = 0;
+    result.dy = 0;
+    result.sad = static_cast<std::uint32_t>(m_best_sad);
+    result.cost = static_cast<std::uint32_t>(m_best_cost);
+}
+
+void MotionSearch::search_integer_vectors() {
+    const int mb_width = m_encoder.g_mb_width;
+    const int range = m_encoder.g_search_range;
+    const int mb_x = m_encoder.g_mb_x;
+    const int mb_y = m_encoder.g_mb_y;
     const _mv none = {};
-    const _mv* record = encoder.g_me_mb_L0 + mb_y * mb_width + mb_x;
+    const _mv* record = m_encoder.g_me_mb_L0 + m_encoder.g_mapMBNumber;
     const _mv& top = mb_y > 0 ? record[-mb_width] : none;
     const _mv& left = mb_x > 0 ? record[-1] : none;
     const _mv& top_right = mb_y > 0 && mb_x < mb_width - 1 ? record[1 - mb_width] : none;
 
-    const int cx = std::clamp((encoder.g_pmv_x + 2) >> 2, -range, range);
-    const int cy = std::clamp((encoder.g_pmv_y + 2) >> 2, -range, range);
-    const Range window_x = vector_range(px, encoder.g_width16, cx, range);
-    const Range window_y = vector_range(py, encoder.g_height16, cy, range);
-    const auto try_vector = [&](int x, int y) {
-        return window_x.between(x) && window_y.between(y) && evaluate(x, y);
+    const Vector predictor = {std::clamp((m_encoder.g_pmv_x + 2) >> 2, -range, range),
+                              std::clamp((m_encoder.g_pmv_y + 2) >> 2, -range, range)};
+    const Range window_x = vector_range(m_px, m_encoder.g_width16, predictor.x, range);
+    const Range window_y = vector_range(m_py, m_encoder.g_height16, predictor.y, range);
+    const auto try_inside = [&](Vector v) {
+        return window_x.between(v.x) && window_y.between(v.y) && try_vector(v);
     };
 
-    if (try_vector(0, 0) ||
-        try_vector(median(top.x, left.x, top_right.x), median(top.y, left.y, top_right.y)) ||
-        try_vector(cx, cy)) {
-        return true;
+    if (try_inside({0, 0}) ||
+        try_inside(
+            {median<int>(top.x, left.x, top_right.x), median<int>(top.y, left.y, top_right.y)}) ||
+        try_inside(predictor)) {
+        return;
     }
     const auto norm = [](const _mv& v) { return std::abs(v.x) + std::abs(v.y); };
     if (std::max({norm(top), norm(left), norm(top_right)}) > 3 &&
-        (try_vector(top.x, top.y) || try_vector(left.x, left.y) ||
-         try_vector(top_right.x, top_right.y))) {
-        return true;
+        (try_inside({top.x, top.y}) || try_inside({left.x, left.y}) ||
+         try_inside({top_right.x, top_right.y}))) {
+        return;
     }
 
-    std::uint32_t spiral_sad = 0;
+    int spiral_sad = 0;
     if (mb_x > 0 || mb_y > 0) {
-        spiral_sad = std::max(
-            2 * median(top.sad & 0xffff, left.sad & 0xffff, top_right.sad & 0xffff), kMinSpiralSad);
+        const auto low_bits = [](const _mv& v) { return static_cast<int>(v.sad & 0xffff); };
+        spiral_sad =
+            std::max(2 * median(low_bits(top), low_bits(left), low_bits(top_right)), kMinSpiralSad);
     }
-    if (encoder.g_best_sad > spiral_sad && walk_spiral()) {
-        return true;
+    if (m_best_sad > spiral_sad && walk_spiral()) {
+        return;
     }
-    return walk_diamond();
+    walk_diamond();
 }
 
-// Square spiral around the zero vector, not clipped to the window.
-bool IntegerSearch::walk_spiral() {
-    int x = 0;
-    int y = 0;
+// Square spiral around the zero vector, not clipped to the window. Returns true at an early end.
+bool MotionSearch::walk_spiral() {
+    const int range = m_encoder.g_search_range;
+    Vector v = {0, 0};
     int step = kSpiralStep;
-    for (int n = 1; n < encoder.g_search_range / 2; ++n) {
+    Vector group[kGroup];
+    int grouped = 0;
+    for (int n = 1; n < range / 2; ++n) {
         for (int i = 0; i < 2 * n; ++i) {
-            (i < n ? x : y) += step;
-            if (std::max(std::abs(x), std::abs(y)) > encoder.g_search_range) {
-                return false;
+            (i < n ? v.x : v.y) += step;
+            if (std::max(std::abs(v.x), std::abs(v.y)) > range) {
+                return try_vectors(group, grouped);
             }
-            if (evaluate(x, y)) {
-                return true;
+            group[grouped++] = v;
+            if (grouped == kGroup) {
+                if (try_vectors(group, grouped)) {
+                    return true;
+                }
+                grouped = 0;
             }
         }
         step = -step;
     }
-    return false;
+    return try_vectors(group, grouped);
 }
 
-// Small diamonds around the best vector until it stays or leaves the bounds.
-bool IntegerSearch::walk_diamond() {
-    const int range = encoder.g_search_range;
-    const Range bounds_x = vector_range(px, encoder.g_width16, best_x, range);
-    const Range bounds_y = vector_range(py, encoder.g_height16, best_y, range);
-    int x, y;
+// Small diamonds around the best vector until it stays or leaves the bounds. Returns true at an
+// early end.
+bool MotionSearch::walk_diamond() {
+    const int range = m_encoder.g_search_range;
+    const Range bounds_x = vector_range(m_px, m_encoder.g_width16, m_best.x, range);
+    const Range bounds_y = vector_range(m_py, m_encoder.g_height16, m_best.y, range);
+    Vector centre;
     do {
-        x = best_x;
-        y = best_y;
-        if (evaluate(x - 1, y) || evaluate(x + 1, y) || evaluate(x, y - 1) || evaluate(x, y + 1)) {
+        centre = m_best;
+        const Vector diamond[4] = {{centre.x - 1, centre.y},
+                                   {centre.x + 1, centre.y},
+                                   {centre.x, centre.y - 1},
+                                   {centre.x, centre.y + 1}};
+        if (try_vectors(diamond, 4)) {
             return true;
         }
-    } while ((best_x != x || best_y != y) && bounds_x.contains(best_x) &&
-             bounds_y.contains(best_y));
+    } while ((m_best.x != centre.x || m_best.y != centre.y) && bounds_x.contains(m_best.x) &&
+             bounds_y.contains(m_best.y));
     return false;
 }
 
-// Evaluates the vector (x, y) unless this search has already done so.
-bool IntegerSearch::evaluate(int x, int y) {
-    std::uint32_t& stamp = visited[x * encoder.g_visit_dim + y];
-    if (stamp == encoder.g_visit_stamp) {
-        return false;
-    }
-    stamp = encoder.g_visit_stamp;
-    const std::uint32_t cost =
-        encoder.find_sd_sad(ref + x + static_cast<std::ptrdiff_t>(y) * encoder.g_stride_luma,
-                            best_cost, encoder.vector_rate(4 * x, 4 * y));
-    if (cost >= best_cost) {
-        return false;
-    }
-    best_cost = cost;
-    best_x = x;
-    best_y = y;
-    return encoder.g_best_sad < kGoodSad;
+// Marks a vector as visited; returns false when it already was.
+bool MotionSearch::first_visit(Vector v) {
+    std::uint32_t& stamp = m_visited[v.x * m_encoder.g_visit_dim + v.y];
+    const bool first = stamp != m_encoder.g_visit_stamp;
+    stamp = m_encoder.g_visit_stamp;
+    return first;
 }
 
-}  // namespace
+// Evaluates a vector unless this search has already done so. Returns true at an early end.
+bool MotionSearch::try_vector(Vector v) {
+    return first_visit(v) &&
+           improve_integer(
+               v, m_kernels.sad_first_phase(m_phases, m_ref + v.y * m_stride + v.x, m_stride));
+}
 
-// Cost of a vector's difference from its prediction; x, y in quarter pels.
-int CEncoder::vector_rate(int x, int y) const {
-    return (component_rate(x - g_pmv_x) + component_rate(y - g_pmv_y)) * g_sad_lambda;
+// The same for up to kGroup different vectors in order.
+bool MotionSearch::try_vectors(const Vector* vectors, int count) {
+    Vector fresh[kGroup];
+    const std::uint8_t* refs[kGroup];
+    int n = 0;
+    for (int i = 0; i < count; ++i) {
+        if (first_visit(vectors[i])) {
+            fresh[n] = vectors[i];
+            refs[n++] = m_ref + vectors[i].y * m_stride + vectors[i].x;
+        }
+    }
+    if (n == 0) {
+        return false;
+    }
+    std::fill(refs + n, refs + kGroup, refs[0]);
+    int first_sads[kGroup];
+    m_kernels.sad_first_phase_x4(m_phases, refs, m_stride, first_sads);
+    for (int i = 0; i < n; ++i) {
+        if (improve_integer(fresh[i], first_sads[i])) {
+            return true;
+        }
+    }
+    return false;
+}
+
+// Completes a candidate of the integer stage. Returns true at an early end.
+bool MotionSearch::improve_integer(Vector v, int first_sad) {
+    const int rate = vector_rate(4 * v.x, 4 * v.y);
+    if (!passes_first_phase(first_sad, rate)) {
+        return false;
+    }
+    int limits[3];
+    set_limits(rate, limits);
+    int sums[4] = {first_sad};
+    if (!m_kernels.sad_later_phases(m_phases, m_ref + v.y * m_stride + v.x, m_stride, limits,
+                                    sums) ||
+        !accept(sums, rate, 2 * (first_sad + first_share(rate)))) {
+        return false;
+    }
+    m_best = v;
+    return m_best_sad < kGoodSad;
 }
 
 // Half-pel step around the integer result.
-void CEncoder::estimate_half_pixel_sds(_mv& record) {
-    const std::ptrdiff_t position =
-        static_cast<std::ptrdiff_t>(16 * g_mb_y + record.y) * g_stride_luma + 16 * g_mb_x +
-        record.x;
-    const std::uint8_t* const planes[4] = {g_ref_y, g_half_v_L0, g_half_h_L0, g_half_hv_L0};
-    const std::uint8_t* centre[4];
-    for (int plane = 0; plane < 4; ++plane) {
-        centre[plane] = planes[plane] + position;
-    }
-    const int x = 4 * record.x;
-    const int y = 4 * record.y;
-    for (const HalfCandidate& candidate : kHalfCandidates) {
-        const PlaneSample& s = candidate.sample;
-        const std::uint32_t cost =
-            find_sd_sad(centre[s.plane] + s.y * static_cast<std::ptrdiff_t>(g_stride_luma) + s.x,
-                        record.cost, vector_rate(x + candidate.dx, y + candidate.dy));
-        if (cost < record.cost) {
-            record.dx = static_cast<std::int8_t>(candidate.dx);
-            record.dy = static_cast<std::int8_t>(candidate.dy);
-            record.cost = cost;
-            if (g_best_sad < kGoodSad) {
-                break;
+void MotionSearch::half_stage(_mv& result) {
+    set_planes(m_best.y * m_stride + m_best.x);
+    bool done = false;
+    for (int first = 0; first < 8 && !done; first += kGroup) {
+        const std::uint8_t* refs[kGroup];
+        int first_sads[kGroup];
+        for (int i = 0; i < kGroup; ++i) {
+            refs[i] = sample(kHalfCandidates[first + i].sample);
+        }
+        m_kernels.sad_first_phase_x4(m_phases, refs, m_stride, first_sads);
+        for (int i = 0; i < kGroup && !done; ++i) {
+            const Vector fraction = kHalfCandidates[first + i].fraction;
+            const int rate = vector_rate(4 * m_best.x + fraction.x, 4 * m_best.y + fraction.y);
+            if (!passes_first_phase(first_sads[i], rate)) {
+                continue;
+            }
+            int limits[3];
+            set_limits(rate, limits);
+            int sums[4] = {first_sads[i]};
+            if (m_kernels.sad_later_phases(m_phases, refs[i], m_stride, limits, sums) &&
+                accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
+                result.dx = static_cast<std::int8_t>(fraction.x);
+                result.dy = static_cast<std::int8_t>(fraction.y);
+                done = m_best_sad < kGoodSad;
             }
         }
     }
-    record.sad = g_best_sad;
+    result.sad = static_cast<std::uint32_t>(m_best_sad);
+    result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
 
-// Quarter-pel step around the half-pel result.
-void CEncoder::estimate_quarter_pixel_sds(_mv& record) {
-    const int half_dx = record.dx;
-    const int half_dy = record.dy;
-    const int kind = std::abs(half_dx) / 2 + std::abs(half_dy);
+// Quarter-pel step around the half-pel result; its first threshold is tighter.
+void MotionSearch::quarter_stage(_mv& result) {
+    const Vector half = {result.dx, result.dy};
+    const int kind = std::abs(half.x) / 2 + std::abs(half.y);
     if (kind > 3) {
-        exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
+        CEncoder::exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
     }
-    const std::ptrdiff_t stride = g_stride_luma;
-    const std::ptrdiff_t position = (16 * g_mb_y + record.y - (half_dy < 0 ? 1 : 0)) * stride +
-                                    16 * g_mb_x + record.x - (half_dx < 0 ? 1 : 0);
-    const std::uint8_t* const planes[4] = {g_ref_y, g_half_v_L0, g_half_h_L0, g_half_hv_L0};
-    const std::uint8_t* centre[4];
-    for (int plane = 0; plane < 4; ++plane) {
-        centre[plane] = planes[plane] + position;
-    }
-    const int x = 4 * record.x + half_dx;
-    const int y = 4 * record.y + half_dy;
-    for (int n = 0; n < 8; ++n) {
-        const Fraction& candidate = kQuarterCandidates[n];
-        const PlaneSample& a = kQuarterSamples[kind][n][0];
-        const PlaneSample& b = kQuarterSamples[kind][n][1];
-        const std::uint32_t cost = find_qpix_sd_sad(
-            centre[a.plane] + a.y * stride + a.x, centre[b.plane] + b.y * stride + b.x, record.cost,
-            vector_rate(x + candidate.dx, y + candidate.dy));
-        if (cost < record.cost) {
-            record.dx = static_cast<std::int8_t>(half_dx + candidate.dx);
-            record.dy = static_cast<std::int8_t>(half_dy + candidate.dy);
-            record.cost = cost;
-            if (g_best_sad < kGoodSad) {
-                break;
+    set_planes((m_best.y - (half.y < 0 ? 1 : 0)) * m_stride + m_best.x - (half.x < 0 ? 1 : 0));
+    bool done = false;
+    for (int first = 0; first < 8 && !done; first += kGroup) {
+        const std::uint8_t* a[kGroup];
+        const std::uint8_t* b[kGroup];
+        int first_sads[kGroup];
+        for (int i = 0; i < kGroup; ++i) {
+            a[i] = sample(kQuarterSamples[kind][first + i][0]);
+            b[i] = sample(kQuarterSamples[kind][first + i][1]);
+        }
+        m_kernels.sad_first_phase_average_x4(m_phases, a, b, m_stride, first_sads);
+        for (int i = 0; i < kGroup && !done; ++i) {
+            const Vector fraction = {half.x + kQuarterCandidates[first + i].x,
+                                     half.y + kQuarterCandidates[first + i].y};
+            const int rate = vector_rate(4 * m_best.x + fraction.x, 4 * m_best.y + fraction.y);
+            if (!passes_first_phase(first_sads[i], rate)) {
+                continue;
+            }
+            int limits[3];
+            set_limits(rate, limits);
+            int sums[4] = {first_sads[i]};
+            if (m_kernels.sad_later_phases_average(m_phases, a[i], b[i], m_stride, limits, sums) &&
+                accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
+                result.dx = static_cast<std::int8_t>(fraction.x);
+                result.dy = static_cast<std::int8_t>(fraction.y);
+                done = m_best_sad < kGoodSad;
             }
         }
     }
-    record.sad = g_best_sad;
+    result.sad = static_cast<std::uint32_t>(m_best_sad);
+    result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
 
-namespace {
+// Points the planes at the macroblock moved by `position` samples.
+void MotionSearch::set_planes(std::ptrdiff_t position) {
+    position += m_py * m_stride + m_px;
+    m_planes[kFull] = m_encoder.g_ref_y + position;
+    m_planes[kVertical] = m_encoder.g_half_v_L0 + position;
+    m_planes[kHorizontal] = m_encoder.g_half_h_L0 + position;
+    m_planes[kCentre] = m_encoder.g_half_hv_L0 + position;
+}
 
-// The limits of Kernels::sad_phases: a phase's sum plus its share of the rate reaches the
-// threshold.
-struct PhaseCosts {
-    int share[3];
-    int limits[3];
+// Cost of a vector's difference from its prediction; x, y in quarter pels.
+int MotionSearch::vector_rate(int x, int y) const {
+    return (component_rate(x - m_encoder.g_pmv_x) + component_rate(y - m_encoder.g_pmv_y)) *
+           m_encoder.g_sad_lambda;
+}
 
-    PhaseCosts(const std::uint32_t* thresholds, int rate)
-        : share{(rate + 2) >> 2, (rate + 1) >> 1, (3 * rate) >> 2} {
-        for (int p = 0; p < 3; ++p) {
-            limits[p] = static_cast<int>(thresholds[p]) - share[p];
-        }
+// Whether a candidate is still in the race after a quarter of its samples.
+bool MotionSearch::passes_first_phase(int first_sad, int rate) const {
+    return m_thresholds[0] > first_sad + first_share(rate);
+}
+
+// SADs at which a candidate is out of the race after phases 1 and 2.
+void MotionSearch::set_limits(int rate, int* limits) const {
+    limits[1] = m_thresholds[1] - second_share(rate);
+    limits[2] = m_thresholds[2] - third_share(rate);
+}
+
+// Makes a candidate the best one if its cost is the lowest; first_threshold is the threshold that
+// it then sets for the first phase.
+bool MotionSearch::accept(const int* sums, int rate, int first_threshold) {
+    const int cost = sums[3] + rate;
+    if (cost >= m_best_cost) {
+        return false;
     }
-};
+    m_thresholds[0] = first_threshold;
+    m_thresholds[1] = sums[1] + second_share(rate);
+    m_thresholds[2] = sums[2] + third_share(rate);
+    m_best_sad = sums[3];
+    m_best_cost = cost;
+    return true;
+}
 
 }  // namespace
-
-// Cost of the block at ref; kNoCost when a partial cost has reached its threshold. A cost below
-// best_cost moves the thresholds and g_best_sad.
-std::uint32_t CEncoder::find_sd_sad(const std::uint8_t* ref, std::uint32_t best_cost, int rate) {
-    const PhaseCosts costs(g_sd_thresh, rate);
-    int sums[4];
-    if (!g_kernels->sad_phases(g_cur_phases, ref, g_stride_luma, costs.limits, sums)) {
-        return kNoCost;
-    }
-    const std::uint32_t total = static_cast<std::uint32_t>(sums[3] + rate);
-    if (total < best_cost) {
-        g_sd_thresh[0] = static_cast<std::uint32_t>(2 * (sums[0] + costs.share[0]));
-        g_sd_thresh[1] = static_cast<std::uint32_t>(sums[1] + costs.share[1]);
-        g_sd_thresh[2] = static_cast<std::uint32_t>(sums[2] + costs.share[2]);
-        g_best_sad = static_cast<std::uint32_t>(sums[3]);
-    }
-    return total;
-}
-
-// The same for the average of two blocks, with a tighter first threshold.
-std::uint32_t CEncoder::find_qpix_sd_sad(const std::uint8_t* a, const std::uint8_t* b,
-                                         std::uint32_t best_cost, int rate) {
-    const PhaseCosts costs(g_sd_thresh, rate);
-    int sums[4];
-    if (!g_kernels->sad_phases_average(g_cur_phases, a, b, g_stride_luma, costs.limits, sums)) {
-        return kNoCost;
-    }
-    const std::uint32_t total = static_cast<std::uint32_t>(sums[3] + rate);
-    if (total < best_cost) {
-        g_sd_thresh[0] = static_cast<std::uint32_t>((5 * (sums[0] + costs.share[0])) >> 2);
-        g_sd_thresh[1] = static_cast<std::uint32_t>(sums[1] + costs.share[1]);
-        g_sd_thresh[2] = static_cast<std::uint32_t>(sums[2] + costs.share[2]);
-        g_best_sad = static_cast<std::uint32_t>(sums[3]);
-    }
-    return total;
-}

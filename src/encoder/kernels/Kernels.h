@@ -37,16 +37,24 @@ struct Kernels {
     // 3 even rows and odd columns. A sample of another column parity is stored as 0.
     void (*split_phases)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* phases);
 
-    // Sums of absolute differences between the phases of a 16x16 block and the block at ref:
-    // sums[p] = the sum over phases 0..p. Stops after phase p (0..2) when sums[p] >= limits[p] and
-    // returns false; returns true when all four sums are there.
-    bool (*sad_phases)(const std::uint8_t* phases, const std::uint8_t* ref, std::ptrdiff_t stride,
-                       const int* limits, int* sums);
+    // SAD of phase 0 between the block that split_phases was given and the block at ref; the same
+    // for four blocks, and for four rounded averages (a + b + 1) >> 1 of two blocks each.
+    int (*sad_first_phase)(const std::uint8_t* phases, const std::uint8_t* ref,
+                           std::ptrdiff_t stride);
+    void (*sad_first_phase_x4)(const std::uint8_t* phases, const std::uint8_t* const* refs,
+                               std::ptrdiff_t stride, int* sads);
+    void (*sad_first_phase_average_x4)(const std::uint8_t* phases, const std::uint8_t* const* a,
+                                       const std::uint8_t* const* b, std::ptrdiff_t stride,
+                                       int* sads);
 
-    // The same against the rounded average (a + b + 1) >> 1 of the blocks at a and b.
-    bool (*sad_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
-                               const std::uint8_t* b, std::ptrdiff_t stride, const int* limits,
-                               int* sums);
+    // Continues from sums[0], the SAD of phase 0: sums[p] = the SAD of phases 0..p. Stops after
+    // phase 1 or 2 when sums[p] >= limits[p] and returns false; returns true when sums[3], the SAD
+    // of the whole block, is there.
+    bool (*sad_later_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
+                             std::ptrdiff_t stride, const int* limits, int* sums);
+    bool (*sad_later_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
+                                     const std::uint8_t* b, std::ptrdiff_t stride,
+                                     const int* limits, int* sums);
 
     // ---- Reference planes ----
 

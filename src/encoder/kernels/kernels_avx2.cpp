@@ -58,24 +58,41 @@ __m256i odd_columns() {
     return _mm256_set1_epi16(static_cast<short>(0xff00));
 }
 
-// SAD of one phase, two of its rows at a time.
+// SAD of one phase in four parts, two of its rows at a time.
 template <typename TwoRows>
-int phase_sad(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
+__m256i phase_sad_parts(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
     __m256i sum = _mm256_setzero_si256();
     for (int row = 0; row < 8; row += 2) {
         const __m256i samples = _mm256_and_si256(two_rows(2 * row + first_row), columns);
         sum = _mm256_add_epi32(sum, _mm256_sad_epu8(samples, load_aligned(phase + 16 * row)));
     }
-    const __m128i lanes = _mm_add_epi32(low_lane(sum), high_lane(sum));
-    return _mm_cvtsi128_si32(_mm_add_epi32(lanes, _mm_srli_si128(lanes, 8)));
+    return sum;
 }
 
 template <typename TwoRows>
-bool sum_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two_rows) {
-    sums[0] = phase_sad(phases, 0, even_columns(), two_rows);
-    if (sums[0] >= limits[0]) {
-        return false;
+int phase_sad(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
+    const __m256i parts = phase_sad_parts(phase, first_row, columns, two_rows);
+    const __m128i lanes = _mm_add_epi32(low_lane(parts), high_lane(parts));
+    return _mm_cvtsi128_si32(_mm_add_epi32(lanes, _mm_srli_si128(lanes, 8)));
+}
+
+// SADs of the first phase of four blocks; two_rows(n) is the row source of block n.
+template <typename TwoRowsOf>
+void first_phase_x4(const uint8_t* phases, int* sads, TwoRowsOf two_rows_of) {
+    __m256i parts[4];
+    for (int n = 0; n < 4; ++n) {
+        parts[n] = phase_sad_parts(phases, 0, even_columns(), two_rows_of(n));
     }
+    // The parts fill the even 32-bit elements only.
+    const __m256i first = _mm256_or_si256(parts[0], _mm256_slli_epi64(parts[1], 32));
+    const __m256i second = _mm256_or_si256(parts[2], _mm256_slli_epi64(parts[3], 32));
+    const __m256i sums = _mm256_add_epi32(_mm256_unpacklo_epi64(first, second),
+                                          _mm256_unpackhi_epi64(first, second));
+    store_16(sads, _mm_add_epi32(low_lane(sums), high_lane(sums)));
+}
+
+template <typename TwoRows>
+bool later_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two_rows) {
     sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), two_rows);
     if (sums[1] >= limits[1]) {
         return false;
@@ -88,22 +105,44 @@ bool sum_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two
     return true;
 }
 
-bool sad_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, const int* limits,
-                int* sums) {
-    return sum_phases(phases, limits, sums, [=](int y) {
+auto two_rows_at(const uint8_t* ref, ptrdiff_t stride) {
+    return [=](int y) {
         const uint8_t* row = ref + y * stride;
         return join(load_16(row), load_16(row + 2 * stride));
-    });
+    };
 }
 
-bool sad_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
-                        const int* limits, int* sums) {
-    return sum_phases(phases, limits, sums, [=](int y) {
+auto average_two_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
+    return [=](int y) {
         const ptrdiff_t first = y * stride;
         const ptrdiff_t second = first + 2 * stride;
         return _mm256_avg_epu8(join(load_16(a + first), load_16(a + second)),
                                join(load_16(b + first), load_16(b + second)));
-    });
+    };
+}
+
+int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
+    return phase_sad(phases, 0, even_columns(), two_rows_at(ref, stride));
+}
+
+void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                        int* sads) {
+    first_phase_x4(phases, sads, [=](int n) { return two_rows_at(refs[n], stride); });
+}
+
+void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
+    first_phase_x4(phases, sads, [=](int n) { return average_two_rows_at(a[n], b[n], stride); });
+}
+
+bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
+                      const int* limits, int* sums) {
+    return later_phases(phases, limits, sums, two_rows_at(ref, stride));
+}
+
+bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                              ptrdiff_t stride, const int* limits, int* sums) {
+    return later_phases(phases, limits, sums, average_two_rows_at(a, b, stride));
 }
 
 // ---- Reference planes ----
@@ -594,8 +633,11 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
 Kernels with_avx2(const Kernels& base) {
     Kernels k = base;
     k.name = "avx2";
-    k.sad_phases = sad_phases;
-    k.sad_phases_average = sad_phases_average;
+    k.sad_first_phase = sad_first_phase;
+    k.sad_first_phase_x4 = sad_first_phase_x4;
+    k.sad_first_phase_average_x4 = sad_first_phase_average_x4;
+    k.sad_later_phases = sad_later_phases;
+    k.sad_later_phases_average = sad_later_phases_average;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;

@@ -37,35 +37,65 @@ void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
     }
 }
 
-// Shared by both forms of the subsampled SAD; sample(offset) is the sample to compare with.
+// SAD of one phase; sample(offset) is the sample to compare with.
 template <typename Sample>
-bool sum_phases(const uint8_t* phases, ptrdiff_t stride, const int* limits, int* sums,
-                Sample sample) {
+int phase_sad(const uint8_t* phases, int p, ptrdiff_t stride, Sample sample) {
     int sum = 0;
-    for (int p = 0; p < 4; ++p) {
-        for (int row = 0; row < 8; ++row) {
-            for (int x = kPhaseColumn[p]; x < 16; x += 2) {
-                sum += std::abs(phases[128 * p + 16 * row + x] -
-                                sample((2 * row + kPhaseRow[p]) * stride + x));
-            }
+    for (int row = 0; row < 8; ++row) {
+        for (int x = kPhaseColumn[p]; x < 16; x += 2) {
+            sum += std::abs(phases[128 * p + 16 * row + x] -
+                            sample((2 * row + kPhaseRow[p]) * stride + x));
         }
-        sums[p] = sum;
-        if (p < 3 && sum >= limits[p]) {
+    }
+    return sum;
+}
+
+template <typename Sample>
+bool later_phases(const uint8_t* phases, ptrdiff_t stride, const int* limits, int* sums,
+                  Sample sample) {
+    for (int p = 1; p < 4; ++p) {
+        sums[p] = sums[p - 1] + phase_sad(phases, p, stride, sample);
+        if (p < 3 && sums[p] >= limits[p]) {
             return false;
         }
     }
     return true;
 }
 
-bool sad_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, const int* limits,
-                int* sums) {
-    return sum_phases(phases, stride, limits, sums, [=](ptrdiff_t i) { return int{ref[i]}; });
+auto samples_at(const uint8_t* ref) {
+    return [ref](ptrdiff_t i) { return int{ref[i]}; };
 }
 
-bool sad_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
-                        const int* limits, int* sums) {
-    return sum_phases(phases, stride, limits, sums,
-                      [=](ptrdiff_t i) { return (a[i] + b[i] + 1) >> 1; });
+auto averages_at(const uint8_t* a, const uint8_t* b) {
+    return [a, b](ptrdiff_t i) { return (a[i] + b[i] + 1) >> 1; };
+}
+
+int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
+    return phase_sad(phases, 0, stride, samples_at(ref));
+}
+
+void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                        int* sads) {
+    for (int n = 0; n < 4; ++n) {
+        sads[n] = phase_sad(phases, 0, stride, samples_at(refs[n]));
+    }
+}
+
+void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
+    for (int n = 0; n < 4; ++n) {
+        sads[n] = phase_sad(phases, 0, stride, averages_at(a[n], b[n]));
+    }
+}
+
+bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
+                      const int* limits, int* sums) {
+    return later_phases(phases, stride, limits, sums, samples_at(ref));
+}
+
+bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                              ptrdiff_t stride, const int* limits, int* sums) {
+    return later_phases(phases, stride, limits, sums, averages_at(a, b));
 }
 
 // ---- Reference planes ----
@@ -507,8 +537,11 @@ const Kernels& scalar_kernels() {
     static const Kernels table = {
         "scalar",
         split_phases,
-        sad_phases,
-        sad_phases_average,
+        sad_first_phase,
+        sad_first_phase_x4,
+        sad_first_phase_average_x4,
+        sad_later_phases,
+        sad_later_phases_average,
         extend_edges,
         half_vertical_row,
         half_horizontal_row,

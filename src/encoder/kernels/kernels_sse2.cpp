@@ -89,11 +89,7 @@ int phase_sad(const uint8_t* phase, int first_row, __m128i columns, SampleRow sa
 }
 
 template <typename SampleRow>
-bool sum_phases(const uint8_t* phases, const int* limits, int* sums, SampleRow sample_row) {
-    sums[0] = phase_sad(phases, 0, even_columns(), sample_row);
-    if (sums[0] >= limits[0]) {
-        return false;
-    }
+bool later_phases(const uint8_t* phases, const int* limits, int* sums, SampleRow sample_row) {
     sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), sample_row);
     if (sums[1] >= limits[1]) {
         return false;
@@ -106,16 +102,40 @@ bool sum_phases(const uint8_t* phases, const int* limits, int* sums, SampleRow s
     return true;
 }
 
-bool sad_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, const int* limits,
-                int* sums) {
-    return sum_phases(phases, limits, sums, [=](int y) { return load(ref + y * stride); });
+auto rows_at(const uint8_t* ref, ptrdiff_t stride) {
+    return [=](int y) { return load(ref + y * stride); };
 }
 
-bool sad_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
-                        const int* limits, int* sums) {
-    return sum_phases(phases, limits, sums, [=](int y) {
-        return _mm_avg_epu8(load(a + y * stride), load(b + y * stride));
-    });
+auto average_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
+    return [=](int y) { return _mm_avg_epu8(load(a + y * stride), load(b + y * stride)); };
+}
+
+int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
+    return phase_sad(phases, 0, even_columns(), rows_at(ref, stride));
+}
+
+void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                        int* sads) {
+    for (int n = 0; n < 4; ++n) {
+        sads[n] = phase_sad(phases, 0, even_columns(), rows_at(refs[n], stride));
+    }
+}
+
+void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
+    for (int n = 0; n < 4; ++n) {
+        sads[n] = phase_sad(phases, 0, even_columns(), average_rows_at(a[n], b[n], stride));
+    }
+}
+
+bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
+                      const int* limits, int* sums) {
+    return later_phases(phases, limits, sums, rows_at(ref, stride));
+}
+
+bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                              ptrdiff_t stride, const int* limits, int* sums) {
+    return later_phases(phases, limits, sums, average_rows_at(a, b, stride));
 }
 
 // ---- Reference planes ----
@@ -754,8 +774,11 @@ Kernels with_sse2(const Kernels& base) {
     Kernels k = base;
     k.name = "sse2";
     k.split_phases = split_phases;
-    k.sad_phases = sad_phases;
-    k.sad_phases_average = sad_phases_average;
+    k.sad_first_phase = sad_first_phase;
+    k.sad_first_phase_x4 = sad_first_phase_x4;
+    k.sad_first_phase_average_x4 = sad_first_phase_average_x4;
+    k.sad_later_phases = sad_later_phases;
+    k.sad_later_phases_average = sad_later_phases_average;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;
