@@ -226,6 +226,8 @@ public:
     void quantTransform_luma_16x16();
     void quantTransform_luma_16x16P();
     void quantTransform_chroma();
+    std::uint32_t quantize_chroma_dc(int component, const int* c, const zolt::Quantizer& quantizer,
+                                     std::int16_t* coefs);
 
     // ---- intrapredict: clause 8.3 ----
     // The 13 neighbours of the 4x4 block at src: L, K, J, I, M, A..H. Where A..D or I..L or M are
@@ -285,15 +287,12 @@ public:
     // ---- lfilter: deblocking filter ----
     void filter_frame();
     void filter_mb(int mb_x, int mb_y);
-    void filter_external_edge(int mb, bool vertical, std::uint8_t* y, std::ptrdiff_t chroma);
-    void filter_internal_edges(int mb, bool vertical, const std::uint8_t (&strengths)[4][4],
+    void filter_external_edge(int mb, bool vertical, std::uint32_t strengths, std::uint8_t* y,
+                              std::ptrdiff_t chroma);
+    void filter_internal_edges(int mb, bool vertical, const std::uint32_t* strengths,
                                std::uint8_t* y, std::ptrdiff_t chroma);
-    void filter_luma_edge(bool vertical, std::uint8_t* pix, int alpha, int beta,
-                          const std::int8_t* tc0, const std::uint8_t* strengths);
-    void filter_chroma_edge(bool vertical, std::ptrdiff_t offset, int alpha, int beta,
-                            const std::int8_t* tc0, const std::uint8_t* strengths);
-    void find_internal_edge_strength(int mb_x, int mb_y);
-    void find_external_edge_strength(int mb_x, int mb_y, bool vertical);
+    void find_edge_strengths(int mb_x, int mb_y);
+    bool vectors_differ(int mb, int other) const;
 
     // Writes msg and a line break to standard error and ends the process with status.
     [[noreturn]] static void exitOnError(const char* msg, int status);
@@ -373,7 +372,9 @@ public:
     std::uint8_t* g_mb_mode = nullptr;  // MbMode
     std::uint8_t* g_mb_qp = nullptr;    // luma QP
     lfdata* g_lf_data = nullptr;
-    _mv* g_mv_array = nullptr;  // 16x16 search results
+    zolt::AlignedBuffer<std::uint16_t> g_coded_blocks_store;
+    std::uint16_t* g_coded_blocks = nullptr;  // inter: 4x4 luma blocks with levels, raster order
+    _mv* g_mv_array = nullptr;                // 16x16 search results
     _mv* g_me_mb_L0 = nullptr;  // their integer stage: the neighbours of later searches
 
     // ---- Per-4x4-block maps of the picture, g_blk_width entries per row ----
@@ -447,8 +448,9 @@ public:
     std::uint32_t g_visit_stamp = 0;  // stamp of the running search
 
     // ---- Deblocking: boundary strengths of the current macroblock ----
-    std::uint8_t bs_ver[4][4] = {};  // [vertical edge, 0 the left one][segment, top to bottom]
-    std::uint8_t bs_hor[4][4] = {};  // [horizontal edge, 0 the top one][segment, left to right]
+    // Four segments of 8 bits each, the first lowest; edge 0 is the left or the top one.
+    std::uint32_t bs_ver[4] = {};
+    std::uint32_t bs_hor[4] = {};
 
     // ---- Rate control ----
     bool g_rc_initialized = false;            // InitRateControl has run since initialize_encoder

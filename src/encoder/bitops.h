@@ -17,6 +17,15 @@ inline int bit_length(std::uint32_t value) {
 #endif
 }
 
+// Position of the lowest set bit of value, which is not 0.
+inline int lowest_bit(std::uint32_t value) {
+#if defined(__GNUC__)
+    return __builtin_ctz(value);
+#else
+    return bit_length(value & (0u - value)) - 1;
+#endif
+}
+
 // Number of set bits.
 inline int bit_count(std::uint32_t value) {
 #if defined(__GNUC__)

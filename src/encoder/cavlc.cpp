@@ -299,8 +299,9 @@ void CEncoder::encodeBlock() {
     const int chroma = g_coded_block_pattern >> 4;
     if (chroma != 0) {
         for (int component = 0; component < 2; ++component) {
-            encodeCAVLCBlock4x4(g_chroma_dc[component], nonzero_mask(g_chroma_dc[component], 4), 4,
-                                kChromaDcTable);
+            const std::int16_t* dc = g_chroma_dc[component];
+            const bool coded = (g_chroma_dc_mask >> component & 1) != 0;
+            encodeCAVLCBlock4x4(dc, coded ? nonzero_mask(dc, 4) : 0u, 4, kChromaDcTable);
         }
     }
     if (chroma == 2) {

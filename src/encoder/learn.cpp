@@ -55,7 +55,7 @@ struct Thresholds16_4 {
     int t[7];
 };
 
-Thresholds16_4 compute16_4_thresh(int qp) {
+constexpr Thresholds16_4 compute16_4_thresh(int qp) {
     const double q = qp < kFittedQp ? kFittedQp : qp;
     const bool large = q > kLargeQp;
     Thresholds16_4 thresholds = {{
@@ -88,10 +88,10 @@ struct ThresholdsPI {
     int t[12];
 };
 
-ThresholdsPI compute_PI_thresh(int qp) {
+constexpr ThresholdsPI compute_PI_thresh(int qp) {
     const float* table = qp < kHighQp ? _treepoly_p_l35 : _treepoly_p_g35;
     const double q = qp;
-    ThresholdsPI thresholds;
+    ThresholdsPI thresholds = {};
     for (int k = 0; k < 12; ++k) {
         const float* c = table + 16 * (k / 4) + k % 4;
         const double cubic = c[0], quadratic = c[4], linear = c[8], constant = c[12];
@@ -100,6 +100,23 @@ ThresholdsPI compute_PI_thresh(int qp) {
     }
     return thresholds;
 }
+
+// The thresholds of every QP.
+struct ThresholdTables {
+    Thresholds16_4 intra16_4[52];
+    ThresholdsPI inter_intra[52];
+};
+
+constexpr ThresholdTables make_threshold_tables() {
+    ThresholdTables tables = {};
+    for (int qp = 0; qp < 52; ++qp) {
+        tables.intra16_4[qp] = compute16_4_thresh(qp);
+        tables.inter_intra[qp] = compute_PI_thresh(qp);
+    }
+    return tables;
+}
+
+constexpr ThresholdTables kThresholds = make_threshold_tables();
 
 // True: inter. x: mixed texture of the source, y: energy of the inter prediction error.
 bool decision_treePI(int qp, const ThresholdsPI& thresholds, int x, int y) {
@@ -174,7 +191,7 @@ int CEncoder::setLearnPIMode() {
     std::int32_t energy[4];
     g_kernels->hadamard_energy(residual, energy);
     const int y = energy[0] + energy[1] + energy[2] + energy[3];
-    return decision_treePI(g_mbQp, compute_PI_thresh(g_mbQp), g_block_energy[3], y) ? 1 : 0;
+    return decision_treePI(g_mbQp, kThresholds.inter_intra[g_mbQp], g_block_energy[3], y) ? 1 : 0;
 }
 
 // Intra 16x16 (16) or intra 4x4 (4). In P pictures the features are those of setLearnPIMode.
@@ -182,7 +199,7 @@ int CEncoder::learn16_4() {
     if (g_slp->sliceType == I_SLICE) {
         compute_block_features();
     }
-    return decision_tree16_4(compute16_4_thresh(g_mbQp), g_block_energy[1], g_block_energy[2],
+    return decision_tree16_4(kThresholds.intra16_4[g_mbQp], g_block_energy[1], g_block_energy[2],
                              g_block_energy[3])
                ? 16
                : 4;

@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <cstdlib>
-#include <cstring>
 
 #include "encoder/CEncoder.h"
 #include "encoder/tables.h"
@@ -30,9 +29,42 @@ constexpr std::int8_t C0_big_tab[52][4] = {
     {-1, 6, 8, 13},   {-1, 7, 10, 14}, {-1, 8, 11, 16}, {-1, 9, 12, 18}, {-1, 10, 13, 20},
     {-1, 11, 15, 23}, {-1, 13, 17, 25}};
 
-constexpr int kLineBytes = 4;  // strengths of one edge
+// Boundary strengths of an edge's four segments, one byte each, by the mask of the segments that
+// have levels on either side: those get 2, the others the base strength, 0 or 1.
+struct StrengthTable {
+    std::uint32_t packed[2][16];
+};
 
-// Parameters of one edge (clause 8.7.2.2).
+constexpr StrengthTable make_strengths() {
+    StrengthTable table{};
+    for (unsigned base = 0; base < 2; ++base) {
+        for (unsigned coded = 0; coded < 16; ++coded) {
+            for (unsigned segment = 0; segment < 4; ++segment) {
+                const std::uint32_t strength = (coded >> segment & 1) ? 2 : base;
+                table.packed[base][coded] |= strength << (8 * segment);
+            }
+        }
+    }
+    return table;
+}
+
+constexpr StrengthTable kStrengths = make_strengths();
+constexpr std::uint32_t kAllStrong = 0x04040404;
+constexpr std::uint32_t kAllIntra = 0x03030303;
+
+bool is_intra(std::uint8_t mode) {
+    return mode == MB_INTRA4x4 || mode == MB_INTRA16x16;
+}
+
+// Exchanges rows and columns of a 4x4 bit matrix.
+unsigned transpose_mask(unsigned m) {
+    unsigned t = (m ^ m >> 3) & 0x0a0a;
+    m ^= t ^ t << 3;
+    t = (m ^ m >> 6) & 0x00cc;
+    return m ^ t ^ t << 6;
+}
+
+// Parameters of the edges with one QP (clause 8.7.2.2).
 struct EdgeParameters {
     int alpha, beta;
     const std::int8_t* tc0;  // by bS
@@ -46,15 +78,16 @@ struct EdgeParameters {
     }
 };
 
-bool is_intra(std::uint8_t mode) {
-    return mode == MB_INTRA4x4 || mode == MB_INTRA16x16;
-}
+// tC0 of the four segments of an edge.
+struct SegmentTc0 {
+    std::int8_t values[4];
 
-bool any(const std::uint8_t* strengths) {
-    std::uint32_t all;
-    std::memcpy(&all, strengths, sizeof all);
-    return all != 0;
-}
+    SegmentTc0(std::uint32_t strengths, const std::int8_t* tc0) {
+        for (int segment = 0; segment < 4; ++segment) {
+            values[segment] = tc0[strengths >> (8 * segment) & 0xff];
+        }
+    }
+};
 
 }  // namespace
 
@@ -73,122 +106,104 @@ void CEncoder::filter_mb(int mb_x, int mb_y) {
     if (g_lf_data[mb].disable_flag) {
         return;
     }
-    find_internal_edge_strength(mb_x, mb_y);
+    find_edge_strengths(mb_x, mb_y);
     std::uint8_t* y = g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * g_stride_luma + 16 * mb_x;
     const std::ptrdiff_t chroma =
         static_cast<std::ptrdiff_t>(8 * mb_y) * g_stride_chroma + 8 * mb_x;
     for (const bool vertical : {true, false}) {
-        const std::uint8_t(&strengths)[4][4] = vertical ? bs_ver : bs_hor;
-        if (vertical ? mb_x > 0 : mb_y > 0) {
-            find_external_edge_strength(mb_x, mb_y, vertical);
-            filter_external_edge(mb, vertical, y, chroma);
+        const std::uint32_t* strengths = vertical ? bs_ver : bs_hor;
+        if (strengths[0] != 0) {
+            filter_external_edge(mb, vertical, strengths[0], y, chroma);
         }
-        filter_internal_edges(mb, vertical, strengths, y, chroma);
+        if ((strengths[1] | strengths[2] | strengths[3]) != 0) {
+            filter_internal_edges(mb, vertical, strengths, y, chroma);
+        }
     }
 }
 
-void CEncoder::filter_external_edge(int mb, bool vertical, std::uint8_t* y, std::ptrdiff_t chroma) {
-    const std::uint8_t* strengths = vertical ? bs_ver[0] : bs_hor[0];
-    if (!any(strengths)) {
-        return;
-    }
-    const int neighbour = vertical ? mb - 1 : mb - g_mb_width;
+void CEncoder::filter_external_edge(int mb, bool vertical, std::uint32_t strengths, std::uint8_t* y,
+                                    std::ptrdiff_t chroma) {
     const int qp_q = g_mb_qp[mb];
-    const int qp_p = g_mb_qp[neighbour];
+    const int qp_p = g_mb_qp[vertical ? mb - 1 : mb - g_mb_width];
     const EdgeParameters luma((qp_q + qp_p + 1) >> 1, g_lf_data[mb]);
     const EdgeParameters chroma_edge((zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1,
                                      g_lf_data[mb]);
     const zolt::Kernels& k = *g_kernels;
-    if (strengths[0] == 4) {
+    if (strengths == kAllStrong) {
         (vertical ? k.deblock_luma_vertical_strong : k.deblock_luma_horizontal_strong)(
             y, g_stride_luma, luma.alpha, luma.beta);
         const auto filter =
             vertical ? k.deblock_chroma_vertical_strong : k.deblock_chroma_horizontal_strong;
         filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta);
         filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta);
-    } else {
-        filter_luma_edge(vertical, y, luma.alpha, luma.beta, luma.tc0, strengths);
-        filter_chroma_edge(vertical, chroma, chroma_edge.alpha, chroma_edge.beta, chroma_edge.tc0,
-                           strengths);
+        return;
     }
+    (vertical ? k.deblock_luma_vertical : k.deblock_luma_horizontal)(
+        y, g_stride_luma, luma.alpha, luma.beta, SegmentTc0(strengths, luma.tc0).values);
+    const auto filter = vertical ? k.deblock_chroma_vertical : k.deblock_chroma_horizontal;
+    const SegmentTc0 tc0(strengths, chroma_edge.tc0);
+    filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
+    filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
 }
 
-void CEncoder::filter_internal_edges(int mb, bool vertical, const std::uint8_t (&strengths)[4][4],
+void CEncoder::filter_internal_edges(int mb, bool vertical, const std::uint32_t* strengths,
                                      std::uint8_t* y, std::ptrdiff_t chroma) {
+    const zolt::Kernels& k = *g_kernels;
     const EdgeParameters luma(g_mb_qp[mb], g_lf_data[mb]);
+    const auto filter_luma = vertical ? k.deblock_luma_vertical : k.deblock_luma_horizontal;
+    const std::ptrdiff_t luma_step = 4 * (vertical ? 1 : g_stride_luma);
     for (int edge = 1; edge < 4; ++edge) {
-        if (any(strengths[edge])) {
-            filter_luma_edge(vertical, y + 4 * edge * (vertical ? 1 : g_stride_luma), luma.alpha,
-                             luma.beta, luma.tc0, strengths[edge]);
+        if (strengths[edge] != 0) {
+            filter_luma(y + edge * luma_step, g_stride_luma, luma.alpha, luma.beta,
+                        SegmentTc0(strengths[edge], luma.tc0).values);
         }
     }
-    if (any(strengths[2])) {
+    if (strengths[2] != 0) {
         const EdgeParameters chroma_edge(zolt::QP_SCALE_CR[g_mb_qp[mb]], g_lf_data[mb]);
-        filter_chroma_edge(vertical, chroma + 4 * (vertical ? 1 : g_stride_chroma),
-                           chroma_edge.alpha, chroma_edge.beta, chroma_edge.tc0, strengths[2]);
+        const auto filter = vertical ? k.deblock_chroma_vertical : k.deblock_chroma_horizontal;
+        const SegmentTc0 tc0(strengths[2], chroma_edge.tc0);
+        chroma += 4 * (vertical ? 1 : g_stride_chroma);
+        filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
+        filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
     }
 }
 
-void CEncoder::filter_luma_edge(bool vertical, std::uint8_t* pix, int alpha, int beta,
-                                const std::int8_t* tc0, const std::uint8_t* strengths) {
-    const std::int8_t segments[4] = {tc0[strengths[0]], tc0[strengths[1]], tc0[strengths[2]],
-                                     tc0[strengths[3]]};
-    (vertical ? g_kernels->deblock_luma_vertical : g_kernels->deblock_luma_horizontal)(
-        pix, g_stride_luma, alpha, beta, segments);
-}
-
-void CEncoder::filter_chroma_edge(bool vertical, std::ptrdiff_t offset, int alpha, int beta,
-                                  const std::int8_t* tc0, const std::uint8_t* strengths) {
-    const std::int8_t segments[4] = {tc0[strengths[0]], tc0[strengths[1]], tc0[strengths[2]],
-                                     tc0[strengths[3]]};
-    const auto filter =
-        vertical ? g_kernels->deblock_chroma_vertical : g_kernels->deblock_chroma_horizontal;
-    filter(g_cur_u + offset, g_stride_chroma, alpha, beta, segments);
-    filter(g_cur_v + offset, g_stride_chroma, alpha, beta, segments);
-}
-
-// Boundary strengths of the edges inside a macroblock (clause 8.7.2.1).
-void CEncoder::find_internal_edge_strength(int mb_x, int mb_y) {
-    const std::uint8_t mode = g_mb_mode[mb_y * g_mb_width + mb_x];
-    if (mode == MB_SKIP || is_intra(mode)) {
-        const int strength = mode == MB_SKIP ? 0 : 3;
-        std::memset(bs_ver[1], strength, 3 * kLineBytes);
-        std::memset(bs_hor[1], strength, 3 * kLineBytes);
-        return;
-    }
-    const std::uint8_t* counts =
-        g_cnum_l + static_cast<std::ptrdiff_t>(4 * mb_y) * g_blk_width + 4 * mb_x;
-    for (int edge = 1; edge < 4; ++edge) {
-        for (int segment = 0; segment < 4; ++segment) {
-            const std::uint8_t* v = counts + segment * g_blk_width + edge;
-            const std::uint8_t* h = counts + edge * g_blk_width + segment;
-            bs_ver[edge][segment] = v[0] || v[-1] ? 2 : 0;
-            bs_hor[edge][segment] = h[0] || h[-g_blk_width] ? 2 : 0;
-        }
-    }
-}
-
-// Boundary strengths of the left (vertical) or top edge.
-void CEncoder::find_external_edge_strength(int mb_x, int mb_y, bool vertical) {
-    std::uint8_t* strengths = vertical ? bs_ver[0] : bs_hor[0];
+// Boundary strengths of all edges of a macroblock (clause 8.7.2.1). Every inter macroblock has one
+// vector, so that only its outer edges can have strength 1.
+void CEncoder::find_edge_strengths(int mb_x, int mb_y) {
     const int mb = mb_y * g_mb_width + mb_x;
-    const std::uint8_t mode_q = g_mb_mode[mb];
-    const std::uint8_t mode_p = g_mb_mode[vertical ? mb - 1 : mb - g_mb_width];
-    if (is_intra(mode_q) || is_intra(mode_p)) {
-        std::memset(strengths, 4, kLineBytes);
-        return;
+    const bool intra = is_intra(g_mb_mode[mb]);
+    const unsigned coded = g_coded_blocks[mb];
+    const unsigned coded_columns = transpose_mask(coded);
+    const unsigned inside_ver = coded_columns | coded_columns << 4;
+    const unsigned inside_hor = coded | coded << 4;
+    for (int edge = 1; edge < 4; ++edge) {
+        bs_ver[edge] = intra ? kAllIntra : kStrengths.packed[0][inside_ver >> (4 * edge) & 0xf];
+        bs_hor[edge] = intra ? kAllIntra : kStrengths.packed[0][inside_hor >> (4 * edge) & 0xf];
     }
-    const std::ptrdiff_t along = vertical ? g_blk_width : 1;
-    const std::ptrdiff_t across = vertical ? 1 : g_blk_width;
-    std::ptrdiff_t q = static_cast<std::ptrdiff_t>(4 * mb_y) * g_blk_width + 4 * mb_x;
-    for (int segment = 0; segment < 4; ++segment, q += along) {
-        const std::ptrdiff_t p = q - across;
-        if (g_cnum_l[p] || g_cnum_l[q]) {
-            strengths[segment] = 2;
-        } else {
-            strengths[segment] = g_blk_ref[p] != g_blk_ref[q] ||
-                                 std::abs(g_blk_mvx[p] - g_blk_mvx[q]) >= 4 ||
-                                 std::abs(g_blk_mvy[p] - g_blk_mvy[q]) >= 4;
-        }
+
+    bs_ver[0] = 0;
+    if (mb_x > 0) {
+        const unsigned left = transpose_mask(g_coded_blocks[mb - 1]) >> 12;
+        bs_ver[0] =
+            intra || is_intra(g_mb_mode[mb - 1])
+                ? kAllStrong
+                : kStrengths.packed[vectors_differ(mb, mb - 1)][(coded_columns | left) & 0xf];
     }
+    bs_hor[0] = 0;
+    if (mb_y > 0) {
+        const int above = mb - g_mb_width;
+        bs_hor[0] = intra || is_intra(g_mb_mode[above])
+                        ? kAllStrong
+                        : kStrengths.packed[vectors_differ(mb, above)]
+                                           [(coded | g_coded_blocks[above] >> 12) & 0xf];
+    }
+}
+
+// Whether the vectors of two inter macroblocks differ by a sample or more; both have reference 0.
+bool CEncoder::vectors_differ(int mb, int other) const {
+    const _mv& a = g_mv_array[mb];
+    const _mv& b = g_mv_array[other];
+    return std::abs(4 * (a.x - b.x) + a.dx - b.dx) >= 4 ||
+           std::abs(4 * (a.y - b.y) + a.dy - b.dy) >= 4;
 }

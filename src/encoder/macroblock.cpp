@@ -14,6 +14,13 @@ void fill_blocks(T* p, std::ptrdiff_t stride, T value) {
     }
 }
 
+// A mask of luma blocks in decoding order, in raster order: the two exchange the middle pairs of
+// every two block rows.
+std::uint16_t raster_mask(unsigned mask) {
+    return static_cast<std::uint16_t>((mask & 0xc3c3) | (mask & 0x0c0c) << 2 |
+                                      (mask & 0x3030) >> 2);
+}
+
 }  // namespace
 
 // A macroblock of an I picture: decisions, levels, reconstruction, maps.
@@ -37,6 +44,7 @@ void CEncoder::processCurrentMB_P() {
     g_cur_mb_mode = MB_P16x16;
     g_mb_mode[g_mapMBNumber] = MB_P16x16;
     quantTransform_luma_16x16P();
+    g_coded_blocks[g_mapMBNumber] = raster_mask(g_luma_mask);
     predict_inter_chroma();
     quantTransform_chroma();
     setMBValues_P();

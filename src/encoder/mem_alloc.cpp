@@ -112,6 +112,7 @@ void CEncoder::allocGlobal2() {
     g_blk_mvx = allocate(g_blk_mvx_store, blocks, "allocGlobal2: g_blk_mvx");
     g_blk_mvy = allocate(g_blk_mvy_store, blocks, "allocGlobal2: g_blk_mvy");
     g_lf_data = allocate(g_lf_data_store, mbs, "allocGlobals2: g_lf_data");
+    g_coded_blocks = allocate(g_coded_blocks_store, mbs, "allocGlobal2: g_coded_blocks");
     g_cnum_l = allocate(g_cnum_l_store, blocks, "allocGlobal2:g_cnum_l");
     g_cnum_u = allocate(g_cnum_u_store, blocks / 4, "allocGlobal2:g_cnum_u");
     g_cnum_v = allocate(g_cnum_v_store, blocks / 4, "allocGlobal2:g_cnum_v");
@@ -125,12 +126,14 @@ void CEncoder::freeGlobal2() {
     g_blk_mvx_store.release();
     g_blk_mvy_store.release();
     g_lf_data_store.release();
+    g_coded_blocks_store.release();
     g_cnum_l_store.release();
     g_cnum_u_store.release();
     g_cnum_v_store.release();
     g_i4mode = g_blk_ref = nullptr;
     g_mb_mode = g_mb_qp = g_cnum_l = g_cnum_u = g_cnum_v = nullptr;
     g_blk_mvx = g_blk_mvy = nullptr;
+    g_coded_blocks = nullptr;
     g_lf_data = nullptr;
 }
 

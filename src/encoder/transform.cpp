@@ -32,6 +32,7 @@ constexpr QuantizerTable make_quantizers(int divisor) {
         Quantizer& q = table.by_qp[qp];
         q.shift = 15 + qp / 6;
         q.rounding = (1 << q.shift) / divisor;
+        q.dc_dead_zone = ((2 << q.shift) - 1 - 2 * q.rounding) / quant_coef[qp % 6][0];
         for (int position = 0; position < 16; ++position) {
             const int odd = (position & 1) + (position >> 2 & 1);
             const int position_class = odd == 0 ? 0 : odd == 2 ? 1 : 2;
@@ -61,16 +62,11 @@ constexpr int kMinMacroblockCost = 6;
 // Cost of an inter block's levels; counting stops above 5, which keeps any 8x8 block.
 int coefficient_cost(const std::int16_t* scan, unsigned nonzero) {
     int cost = 0;
-    int run = 0;
-    for (int n = 0; nonzero >> n != 0 && cost <= 5; ++n) {
-        if ((nonzero >> n & 1) == 0) {
-            ++run;
-        } else if (std::abs(scan[n]) > 1) {
-            cost += kLargeLevelCost;
-        } else {
-            cost += COEFF_COST[run];
-            run = 0;
-        }
+    int next = 0;  // position after the last level
+    for (; nonzero != 0 && cost <= 5; nonzero &= nonzero - 1) {
+        const int position = zolt::lowest_bit(nonzero);
+        cost += std::abs(scan[position]) > 1 ? kLargeLevelCost : COEFF_COST[position - next];
+        next = position + 1;
     }
     return cost;
 }
@@ -171,12 +167,14 @@ void CEncoder::quantTransform_luma_16x16P() {
                                       g_nonzero);
     int macroblock_cost = 0;
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
+        const unsigned blocks = 0xfu << (4 * block8x8);
         int cost = 0;
-        for (int k = 4 * block8x8; k < 4 * block8x8 + 4; ++k) {
+        for (unsigned rest = g_luma_mask & blocks; rest != 0; rest &= rest - 1) {
+            const int k = zolt::lowest_bit(rest);
             cost += coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k]);
         }
         if (cost < kMin8x8Cost) {
-            g_luma_mask &= ~(0xfu << (4 * block8x8));
+            g_luma_mask &= ~blocks;
         } else {
             macroblock_cost += cost;
         }
@@ -187,8 +185,7 @@ void CEncoder::quantTransform_luma_16x16P() {
     g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y, g_stride_luma);
 }
 
-// Chroma of any macroblock (clause 8.5.4): the four DC coefficients of a component have a 2x2
-// transform of their own.
+// Chroma of any macroblock (clause 8.5.4).
 void CEncoder::quantTransform_chroma() {
     const int qp = zolt::QP_SCALE_CR[g_mbQp];
     const Quantizer& q =
@@ -200,33 +197,43 @@ void CEncoder::quantTransform_chroma() {
         std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
         std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
         g_kernels->transform_8x8(samples, g_stride_chroma, pred, coefs);
-
-        int c[4];
+        int dc[4];
         for (int b = 0; b < 4; ++b) {
-            c[b] = coefs[16 * b];
+            dc[b] = coefs[16 * b];
             coefs[16 * b] = 0;
         }
         const std::uint32_t ac_mask = g_kernels->quantize(
             coefs, 4, q, g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
-
-        const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
-                          c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
-        int d[4];
-        for (int b = 0; b < 4; ++b) {
-            const int level = quantize_dc(f[b], q);
-            g_chroma_dc[component][b] = static_cast<std::int16_t>(level);
-            g_chroma_dc_mask |= (level != 0 ? 1u : 0u) << component;
-            d[b] = level * q.dequant[0];
-        }
-        const int dc[4] = {d[0] + d[1] + d[2] + d[3], d[0] - d[1] + d[2] - d[3],
-                           d[0] + d[1] - d[2] - d[3], d[0] - d[1] - d[2] + d[3]};
-        std::uint32_t reconstructed = ac_mask;
-        for (int b = 0; b < 4; ++b) {
-            const int value = dc[b] >> 1;
-            coefs[16 * b] = static_cast<std::int16_t>(value);
-            reconstructed |= (value != 0 ? 1u : 0u) << b;
-        }
-        g_kernels->reconstruct_8x8(coefs, reconstructed, pred, samples, g_stride_chroma);
+        const std::uint32_t dc_mask = quantize_chroma_dc(component, dc, q, coefs);
+        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples, g_stride_chroma);
         g_chroma_ac_mask |= ac_mask << (4 * component);
     }
+}
+
+// The DC coefficients c of a component's four blocks have a 2x2 transform of their own. Writes
+// their levels, and their scaled values to coefs; returns the mask of the blocks that have one.
+std::uint32_t CEncoder::quantize_chroma_dc(int component, const int* c, const Quantizer& quantizer,
+                                           std::int16_t* coefs) {
+    const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
+                      c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
+    const int largest = std::max({std::abs(f[0]), std::abs(f[1]), std::abs(f[2]), std::abs(f[3])});
+    if (largest <= quantizer.dc_dead_zone) {
+        return 0;
+    }
+    g_chroma_dc_mask |= 1u << component;
+    int d[4];
+    for (int b = 0; b < 4; ++b) {
+        const int level = quantize_dc(f[b], quantizer);
+        g_chroma_dc[component][b] = static_cast<std::int16_t>(level);
+        d[b] = level * quantizer.dequant[0];
+    }
+    const int dc[4] = {d[0] + d[1] + d[2] + d[3], d[0] - d[1] + d[2] - d[3],
+                       d[0] + d[1] - d[2] - d[3], d[0] - d[1] - d[2] + d[3]};
+    std::uint32_t mask = 0;
+    for (int b = 0; b < 4; ++b) {
+        const int value = dc[b] >> 1;
+        coefs[16 * b] = static_cast<std::int16_t>(value);
+        mask |= (value != 0 ? 1u : 0u) << b;
+    }
+    return mask;
 }

@@ -14,6 +14,8 @@ struct Quantizer {
     alignas(32) std::int16_t dead_zone[16];  // largest coefficient magnitude whose level is 0
     std::int32_t rounding;                   // added before the shift
     std::int32_t shift;                      // 15 + QP / 6
+    std::int32_t dc_dead_zone;  // largest magnitude whose level is 0 with twice the rounding offset
+                                // and a shift larger by 1, as DC values have it
 };
 
 // Levels are limited to this magnitude, the largest that the 28-bit escape code of clause 9.2.2.1
