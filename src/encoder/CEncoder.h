@@ -149,7 +149,7 @@ public:
     void doFrameP();
     void code_picture();
     bool code_slice_data();
-    void load_frame();
+    void load_row(int mb_y);
     void setSliceHeader();
     void writeSliceHeader();
     void initFrameParams();
@@ -270,7 +270,7 @@ public:
     // ---- diamond: motion search ----
     void initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel);
     void framePredInitP();
-    void make_half_pixel_sds();
+    void make_half_pixel_sds(int mb_y);
     void generateMBPred();
 
     // ---- motioncomp ----
@@ -285,7 +285,7 @@ public:
     void qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy, int plane) const;
 
     // ---- lfilter: deblocking filter ----
-    void filter_frame();
+    void filter_mb_row(int mb_y);
     void filter_mb(int mb_x, int mb_y);
     void filter_external_edge(int mb, bool vertical, std::uint32_t strengths, std::uint8_t* y,
                               std::ptrdiff_t chroma);
@@ -445,6 +445,7 @@ public:
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
     zolt::AlignedBuffer<std::uint32_t> g_visit_store;
     std::uint32_t* g_visit_L0 = nullptr;
+    int g_half_rows = 0;              // rows of the half-sample planes that are there, from the top
     std::uint32_t g_visit_stamp = 0;  // stamp of the running search
 
     // ---- Deblocking: boundary strengths of the current macroblock ----

@@ -196,18 +196,23 @@ void CEncoder::framePredInitP() {
     g_kernels->extend_edges(g_ref_y, g_width16, g_height16, g_stride_luma, g_pad_luma);
     g_kernels->extend_edges(g_ref_u, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
     g_kernels->extend_edges(g_ref_v, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
-    if (g_subpel_enable) {
-        make_half_pixel_sds();
-    }
+    g_half_rows = 0;
 }
 
-// Half-sample planes of the reference. The centre plane is filtered from the rounded samples of the
-// vertical one: an approximation that only the search reads.
-void CEncoder::make_half_pixel_sds() {
+// Half-sample planes of the reference, as far down as the macroblocks of row mb_y can reach. The
+// centre plane is filtered from the rounded samples of the vertical one: an approximation that only
+// the search reads.
+void CEncoder::make_half_pixel_sds(int mb_y) {
     constexpr int kMargin = 3;  // outermost rows and columns, which lack a filter tap
+    // A search ends at most this far below the macroblock: a vector that starts within twice the
+    // range, a diamond walk of one range and a step, and a row for the fractions.
+    const int reach = 3 * g_search_range + 2;
     const int count = g_stride_luma - 2 * kMargin;
-    for (int y = kMargin - g_pad_luma; y < g_height16 + g_pad_luma - kMargin; ++y) {
-        const std::ptrdiff_t row = static_cast<std::ptrdiff_t>(y) * g_stride_luma - g_pad_luma;
+    const int last =
+        std::min(16 * (mb_y + 1) + reach + g_pad_luma, g_height16 + 2 * g_pad_luma - kMargin);
+    for (g_half_rows = std::max(g_half_rows, kMargin); g_half_rows < last; ++g_half_rows) {
+        const std::ptrdiff_t row =
+            static_cast<std::ptrdiff_t>(g_half_rows - g_pad_luma) * g_stride_luma - g_pad_luma;
         const std::ptrdiff_t inner = row + kMargin;
         g_kernels->half_vertical_row(g_ref_y + row, g_stride_luma, g_half_v_L0 + row,
                                      g_stride_luma);

@@ -95,7 +95,6 @@ void CEncoder::encode_frame(const void* frame) {
     g_pic_type = g_frame.type;
     g_idr_flag = g_frame.idr;
     g_gop_pos = g_frame.gop_pos;
-    load_frame();
     if (g_pic_type == I_SLICE) {
         g_frame_num = 0;
         g_poc = 0;
@@ -109,15 +108,20 @@ void CEncoder::encode_frame(const void* frame) {
     ++g_frame_counter;
 }
 
-// Copies the part of the frame that is coded into the current picture.
-void CEncoder::load_frame() {
-    const std::uint8_t* y = g_frame.data;
+// Copies a macroblock row of the frame into the current picture.
+void CEncoder::load_row(int mb_y) {
+    const std::ptrdiff_t width = g_width;
     const std::ptrdiff_t chroma_width = g_width / 2;
-    const std::uint8_t* u = y + static_cast<std::ptrdiff_t>(g_width) * g_height;
+    const std::uint8_t* y = g_frame.data;
+    const std::uint8_t* u = y + width * g_height;
     const std::uint8_t* v = u + chroma_width * (g_height / 2);
-    copy_plane(g_cur_y, g_stride_luma, y, g_width, g_width16, g_height16);
-    copy_plane(g_cur_u, g_stride_chroma, u, chroma_width, g_cwidth, g_cheight);
-    copy_plane(g_cur_v, g_stride_chroma, v, chroma_width, g_cwidth, g_cheight);
+    const std::ptrdiff_t row = 16 * mb_y;
+    const std::ptrdiff_t chroma_row = 8 * mb_y;
+    copy_plane(g_cur_y + row * g_stride_luma, g_stride_luma, y + row * width, width, g_width16, 16);
+    copy_plane(g_cur_u + chroma_row * g_stride_chroma, g_stride_chroma,
+               u + chroma_row * chroma_width, chroma_width, g_cwidth, 8);
+    copy_plane(g_cur_v + chroma_row * g_stride_chroma, g_stride_chroma,
+               v + chroma_row * chroma_width, chroma_width, g_cwidth, 8);
 }
 
 void CEncoder::copy_reconstruction(unsigned char* dst) const {
@@ -159,7 +163,6 @@ void CEncoder::code_picture() {
             exitOnError("Coded picture exceeds the NAL buffer at QP 51", -1);
         }
         ResetNALUnit();
-        load_frame();
         g_mbQp = std::min(g_mbQp + kOverflowQpStep, kMaxQp);
     }
     if (g_rc_enable) {
@@ -167,26 +170,40 @@ void CEncoder::code_picture() {
     } else {
         g_mbQp = picture_qp;
     }
-    filter_frame();
     manageRefBuffers();
     ++g_coded_frames;
 }
 
-// slice_data(), clause 7.3.4. Returns false when the NAL buffer might not hold the next macroblock.
+// slice_data(), clause 7.3.4, and deblocking. Works in macroblock rows so that what a row needs is
+// still in the cache: its input is loaded and its part of the search planes built just before it is
+// coded, and the row above is deblocked just after, when nothing predicts from it any more. Returns
+// false when the NAL buffer might not hold the next macroblock.
 bool CEncoder::code_slice_data() {
+    const bool inter = g_slp->sliceType == P_SLICE;
     const unsigned capacity = static_cast<unsigned>(g_nal_buf_size) * 8;
-    for (g_mapMBNumber = 0; g_mapMBNumber < g_num_mbs; ++g_mapMBNumber) {
-        if (g_nal_bitpos + kMaxMacroblockBits > capacity) {
-            return false;
+    for (int mb_y = 0; mb_y < g_mb_height; ++mb_y) {
+        load_row(mb_y);
+        if (inter) {
+            make_half_pixel_sds(mb_y);
         }
-        if (g_slp->sliceType == I_SLICE) {
-            processCurrentMB_I();
-            writeMBSyntax();
-        } else {
-            processCurrentMB_P();
-            writeMBSyntax_P();
+        for (int mb_x = 0; mb_x < g_mb_width; ++mb_x) {
+            if (g_nal_bitpos + kMaxMacroblockBits > capacity) {
+                return false;
+            }
+            g_mapMBNumber = mb_y * g_mb_width + mb_x;
+            if (inter) {
+                processCurrentMB_P();
+                writeMBSyntax_P();
+            } else {
+                processCurrentMB_I();
+                writeMBSyntax();
+            }
+        }
+        if (mb_y > 0) {
+            filter_mb_row(mb_y - 1);
         }
     }
+    filter_mb_row(g_mb_height - 1);
     g_slice_bits = g_nal_bitpos;
     return true;
 }

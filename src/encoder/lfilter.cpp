@@ -91,12 +91,10 @@ struct SegmentTc0 {
 
 }  // namespace
 
-// Deblocks the current picture in place, macroblock by macroblock (clause 8.7).
-void CEncoder::filter_frame() {
-    for (int mb_y = 0; mb_y < g_mb_height; ++mb_y) {
-        for (int mb_x = 0; mb_x < g_mb_width; ++mb_x) {
-            filter_mb(mb_x, mb_y);
-        }
+// Deblocks one macroblock row of the current picture in place (clause 8.7); rows go from the top.
+void CEncoder::filter_mb_row(int mb_y) {
+    for (int mb_x = 0; mb_x < g_mb_width; ++mb_x) {
+        filter_mb(mb_x, mb_y);
     }
 }
 
