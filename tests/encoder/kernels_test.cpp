@@ -1,0 +1,361 @@
+// Every kernel of every table against the scalar one, on random and extreme input. The buffers are
+// compared whole, margins included, so that a stray write shows as a difference.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "common/Random.h"
+#include "encoder/kernels/Kernels.h"
+#include "encoder/tables.h"
+
+namespace {
+
+using zolt::Kernels;
+using zolt_test::Random;
+
+// The tables to compare with the scalar one.
+std::vector<const Kernels*> tables() {
+    std::vector<const Kernels*> list;
+    for (const Kernels& table : zolt::kernel_tables()) {
+        list.push_back(&table);
+    }
+    list.erase(list.begin());
+    return list;
+}
+
+constexpr int kPlaneWidth = 160;
+constexpr int kPlaneSize = kPlaneWidth * 160;
+constexpr int kMargin = 64;  // before and after what a kernel may write
+
+// All that kernels read and write.
+struct Arena {
+    alignas(64) std::uint8_t plane[2][kPlaneSize];
+    alignas(64) std::uint8_t samples[kMargin + 512 + kMargin];
+    alignas(64) std::int16_t coefs[kMargin + 16 * 16 + kMargin];
+    alignas(64) std::int16_t scan[kMargin + 16 * 16 + kMargin];
+    alignas(64) std::uint16_t nonzero[kMargin + 16 + kMargin];
+    alignas(64) std::int32_t values[kMargin + 16 + kMargin];
+    alignas(64) std::int32_t numbers[kMargin + 16 + kMargin];
+    std::uint32_t result;
+
+    std::uint8_t* pred() { return samples + kMargin; }
+    std::int16_t* coef() { return coefs + kMargin; }
+    std::int32_t* out() { return numbers + kMargin; }
+};
+
+enum Pattern { kNoise, kExtremes, kColumns, kChecker, kBlackAndWhite, kGentle, kPatternCount };
+
+// Fills samples; `which` tells two planes of a pattern apart.
+void fill(std::uint8_t* p, int count, int pattern, int which, Random& random) {
+    const int base = random.between(0, 255);
+    for (int i = 0; i < count; ++i) {
+        const int x = i % kPlaneWidth, y = i / kPlaneWidth;
+        const std::uint32_t r = random.next();
+        const int values[kPatternCount] = {static_cast<int>(r >> 24),
+                                           static_cast<int>(r >> 31) * 255,
+                                           (x + which) % 2 * 255,
+                                           (x + y + which) % 2 * 255,
+                                           which * 255,
+                                           std::clamp(base + static_cast<int>(r % 13) - 6, 0, 255)};
+        p[i] = static_cast<std::uint8_t>(values[pattern]);
+    }
+}
+
+void fill(Arena& arena, int pattern, Random& random) {
+    std::memset(static_cast<void*>(&arena), 0, sizeof arena);
+    fill(arena.plane[0], kPlaneSize, pattern, 0, random);
+    fill(arena.plane[1], kPlaneSize, pattern, 1, random);
+    fill(arena.samples, sizeof arena.samples, pattern, 1, random);
+    for (auto& c : arena.coefs) {
+        // Up to the largest magnitude that reconstruct takes, so that sums leave 16 bits.
+        const int values[kPatternCount] = {random.between(-32767, 32767),
+                                           random.between(0, 1) ? 32767 : -32767,
+                                           32767,
+                                           random.between(-2000, 2000),
+                                           -32767,
+                                           random.between(-40, 40)};
+        c = static_cast<std::int16_t>(values[pattern]);
+    }
+    for (auto& v : arena.values) {
+        const int values[kPatternCount] = {random.between(-65535, 65535),
+                                           random.between(0, 1) ? 65535 : -65535,
+                                           65535,
+                                           random.between(-4080, 4080),
+                                           -65535,
+                                           random.between(-20, 20)};
+        v = values[pattern];
+    }
+}
+
+// Samples somewhere in a plane, far enough from its ends for any kernel. References of the motion
+// search have any alignment, blocks of the current picture that of their size.
+struct Place {
+    std::ptrdiff_t stride;
+    std::uint8_t* p;
+
+    Place(std::uint8_t* plane, Random& random, int alignment = 1) {
+        stride = random.between(72 / alignment, kPlaneWidth / alignment) * alignment;
+        p = plane + 40 * kPlaneWidth + random.between(0, 63 / alignment) * alignment;
+    }
+};
+
+// A case runs one kernel on the arena; what else it needs it draws, equally for every table.
+struct Case {
+    const char* name;
+    void (*run)(const Kernels& k, Arena& a, Random random);
+};
+
+// Puts the phases of a block into the arena's samples.
+void split_current(Arena& a, Random& random) {
+    const Place current(a.plane[0], random, 16);
+    zolt::scalar_kernels().split_phases(current.p, current.stride, a.pred());
+}
+
+// Four pairs of blocks with one stride, as the stages of the motion search give them.
+struct References {
+    const std::uint8_t* a[4];
+    const std::uint8_t* b[4];
+    std::ptrdiff_t stride;
+
+    References(Arena& arena, Random& random) {
+        const Place centre(arena.plane[1], random);
+        stride = centre.stride;
+        for (int i = 0; i < 4; ++i) {
+            a[i] = centre.p + random.between(-8, 8) * stride + random.between(-8, 8);
+            b[i] = a[i] + random.between(-1, 1) * stride + random.between(-1, 1);
+        }
+    }
+};
+
+void run_later_phases(const Kernels& k, Arena& a, Random random, bool average) {
+    split_current(a, random);
+    const References refs(a, random);
+    int limits[3];
+    for (int p = 0; p < 3; ++p) {
+        limits[p] = random.between(0, 3) ? 0xffffff : random.between(-40, 70 * 64 * (p + 1));
+    }
+    int* sums = a.out();
+    sums[0] = random.between(0, 64 * 255);
+    a.result = average ? k.sad_later_phases_average(a.pred(), refs.a[0], refs.b[0], refs.stride,
+                                                    limits, sums)
+                       : k.sad_later_phases(a.pred(), refs.a[0], refs.stride, limits, sums);
+    // After an early end the sums that follow are anything.
+    const int last = sums[1] >= limits[1] ? 1 : sums[2] >= limits[2] ? 2 : 3;
+    std::fill(sums + last + 1, sums + 4, 0);
+}
+
+void run_quantize(const Kernels& k, Arena& a, Random random) {
+    const int qp = random.between(0, 51);
+    const zolt::Quantizer& q =
+        random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+    constexpr int kCounts[] = {1, 4, 16};
+    const int count = kCounts[random.between(0, 2)];
+    // No residual transforms to more than 36 * 255; beyond, the scaled coefficients need not fit.
+    const bool beyond = random.between(0, 3) == 0;
+    for (int i = 0; i < 16 * count; ++i) {
+        std::int16_t& c = a.coef()[i];
+        const int edge = q.dead_zone[i % 16] + random.between(0, 1);
+        const int limited = beyond ? c : c % 9181;
+        c = static_cast<std::int16_t>(random.between(0, 3) ? limited : c < 0 ? -edge : edge);
+    }
+    a.result = k.quantize(a.coef(), count, q, a.scan + kMargin, a.nonzero + kMargin);
+    if (beyond) {
+        std::fill(a.coef(), a.coef() + 16 * count, std::int16_t{0});
+    }
+}
+
+using Normal = Kernels::NormalFilter Kernels::*;
+using Strong = Kernels::StrongFilter Kernels::*;
+
+template <Normal filter>
+void run_normal(const Kernels& k, Arena& a, Random random) {
+    const Place edge(a.plane[0], random, 4);
+    const int alpha = random.between(0, 255), beta = random.between(0, 18);
+    std::int8_t tc0[4];
+    for (auto& t : tc0) {
+        t = static_cast<std::int8_t>(random.between(-1, 25));
+    }
+    (k.*filter)(edge.p, edge.stride, alpha, beta, tc0);
+}
+
+template <Strong filter>
+void run_strong(const Kernels& k, Arena& a, Random random) {
+    const Place edge(a.plane[0], random, 4);
+    const int alpha = random.between(0, 255), beta = random.between(0, 18);
+    (k.*filter)(edge.p, edge.stride, alpha, beta);
+}
+
+constexpr Case kCases[] = {
+    {"split_phases",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 16);
+         k.split_phases(src.p, src.stride, a.pred());
+     }},
+    {"sad_first_phase",
+     [](const Kernels& k, Arena& a, Random random) {
+         split_current(a, random);
+         const References refs(a, random);
+         a.out()[0] = k.sad_first_phase(a.pred(), refs.a[0], refs.stride);
+     }},
+    {"sad_first_phase_x4",
+     [](const Kernels& k, Arena& a, Random random) {
+         split_current(a, random);
+         const References refs(a, random);
+         k.sad_first_phase_x4(a.pred(), refs.a, refs.stride, a.out());
+     }},
+    {"sad_first_phase_average_x4",
+     [](const Kernels& k, Arena& a, Random random) {
+         split_current(a, random);
+         const References refs(a, random);
+         k.sad_first_phase_average_x4(a.pred(), refs.a, refs.b, refs.stride, a.out());
+     }},
+    {"sad_later_phases",
+     [](const Kernels& k, Arena& a, Random random) { run_later_phases(k, a, random, false); }},
+    {"sad_later_phases_average",
+     [](const Kernels& k, Arena& a, Random random) { run_later_phases(k, a, random, true); }},
+    {"extend_edges",
+     [](const Kernels& k, Arena& a, Random random) {
+         const bool luma = random.between(0, 1);
+         const int unit = luma ? 16 : 8, border = luma ? 32 : 16;
+         const int width = unit * random.between(1, 5), height = unit * random.between(1, 5);
+         const std::ptrdiff_t stride = width + 2 * border;
+         k.extend_edges(a.plane[0] + border * (stride + 1), width, height, stride, border);
+     }},
+    {"half_vertical_row",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random);
+         k.half_vertical_row(src.p, src.stride, a.plane[1] + random.between(64, 128),
+                             random.between(1, 150));
+     }},
+    {"half_horizontal_row",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random);
+         k.half_horizontal_row(src.p, a.plane[1] + random.between(64, 128), random.between(1, 150));
+     }},
+    {"copy_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random);
+         k.copy_16x16(a.pred(), src.p, src.stride);
+     }},
+    {"average_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place first(a.plane[0], random);
+         const Place second(a.plane[1], random);
+         const bool in_place = random.between(0, 1);  // with what the prediction holds
+         k.average_16x16(a.pred(), first.p, first.stride, in_place ? a.pred() : second.p,
+                         in_place ? 16 : second.stride);
+     }},
+    {"centre_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random);
+         k.centre_16x16(a.pred(), src.p, src.stride);
+     }},
+    {"chroma_8x8",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random);
+         const int fx = random.between(0, 7), fy = random.between(0, 7);
+         k.chroma_8x8(a.pred(), src.p, src.stride, fx, fy);
+     }},
+    {"transform_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 16);
+         k.transform_16x16(src.p, src.stride, a.pred(), a.coef());
+     }},
+    {"transform_8x8",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 8);
+         k.transform_8x8(src.p, src.stride, a.pred(), a.coef());
+     }},
+    {"transform_4x4",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 4);
+         k.transform_4x4(src.p, src.stride, a.pred(), a.coef());
+     }},
+    {"quantize", run_quantize},
+    {"reconstruct_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place dst(a.plane[0], random, 16);
+         k.reconstruct_16x16(a.coef(), random.next() & random.next() & 0xffff, a.pred(), dst.p,
+                             dst.stride);
+     }},
+    {"reconstruct_8x8",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place dst(a.plane[0], random, 8);
+         k.reconstruct_8x8(a.coef(), random.next() & 15, a.pred(), dst.p, dst.stride);
+     }},
+    {"reconstruct_4x4",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place dst(a.plane[0], random, 4);
+         k.reconstruct_4x4(a.coef(), a.pred(), dst.p, dst.stride);
+     }},
+    {"block_sums",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 16);
+         k.block_sums(src.p, src.stride, a.out());
+     }},
+    {"hadamard_energy",
+     [](const Kernels& k, Arena& a, Random) { k.hadamard_energy(a.values + kMargin, a.out()); }},
+    {"phase_sad_16x16",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 16);
+         k.phase_sad_16x16(src.p, src.stride, a.pred(), a.out());
+     }},
+    {"phase_satd_8x8",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 8);
+         k.phase_satd_8x8(src.p, src.stride, a.pred(), a.out());
+     }},
+    {"phase_satd_4x4",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 4);
+         // The engine keeps the predictions of the nine modes one after the other.
+         k.phase_satd_4x4(src.p, src.stride, a.pred() + 16 * random.between(0, 8), a.out());
+     }},
+    {"deblock_luma_vertical", run_normal<&Kernels::deblock_luma_vertical>},
+    {"deblock_luma_horizontal", run_normal<&Kernels::deblock_luma_horizontal>},
+    {"deblock_chroma_vertical", run_normal<&Kernels::deblock_chroma_vertical>},
+    {"deblock_chroma_horizontal", run_normal<&Kernels::deblock_chroma_horizontal>},
+    {"deblock_luma_vertical_strong", run_strong<&Kernels::deblock_luma_vertical_strong>},
+    {"deblock_luma_horizontal_strong", run_strong<&Kernels::deblock_luma_horizontal_strong>},
+    {"deblock_chroma_vertical_strong", run_strong<&Kernels::deblock_chroma_vertical_strong>},
+    {"deblock_chroma_horizontal_strong", run_strong<&Kernels::deblock_chroma_horizontal_strong>},
+};
+// All function pointers of a table have a case.
+static_assert(sizeof(Kernels) ==
+                  sizeof(const char*) + sizeof kCases / sizeof *kCases * sizeof(void (*)()),
+              "a kernel without a case");
+
+class KernelTable : public testing::TestWithParam<std::tuple<const Kernels*, Case>> {};
+
+TEST_P(KernelTable, EqualsScalar) {
+    const auto [table, c] = GetParam();
+    // Not on the stack, whose surroundings would take a stray write without a word.
+    const auto scalar = std::make_unique<Arena>();
+    const auto other = std::make_unique<Arena>();
+    for (int iteration = 0; iteration < 300; ++iteration) {
+        Random random(static_cast<std::uint64_t>(iteration));
+        const int pattern = iteration % kPatternCount;
+        fill(*scalar, pattern, random);
+        std::memcpy(other.get(), scalar.get(), sizeof(Arena));
+        c.run(zolt::scalar_kernels(), *scalar, random);
+        c.run(*table, *other, random);
+        ASSERT_EQ(std::memcmp(scalar.get(), other.get(), sizeof(Arena)), 0)
+            << "iteration " << iteration << ", pattern " << pattern;
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Tables, KernelTable,
+                         testing::Combine(testing::ValuesIn(tables()), testing::ValuesIn(kCases)),
+                         [](const auto& test) {
+                             return std::string(std::get<0>(test.param)->name) + "_" +
+                                    std::get<1>(test.param).name;
+                         });
+// A processor may have the scalar table only.
+GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(KernelTable);
+
+}  // namespace
