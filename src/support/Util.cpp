@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <cerrno>
 #include <chrono>
 #include <climits>
 #include <cmath>
@@ -127,7 +128,8 @@ int Util::StandardDevShort(const short* a, int n) {
         sum_of_squares += static_cast<long long>(a[i]) * a[i];
     }
     const long long mean = sum / n;
-    return static_cast<int>(std::sqrt(static_cast<double>(sum_of_squares / n - mean * mean)));
+    const long long mean_square = sum_of_squares / n;
+    return static_cast<int>(std::sqrt(static_cast<double>(mean_square - mean * mean)));
 }
 
 char* Util::FourccToString(long code, char* out) {
@@ -236,6 +238,7 @@ void Util::CmdLineInterpreter(const char* prompt, int n, const char* const* comm
             std::printf("%s", prompt);
             std::fflush(stdout);
         }
+        errno = 0;  // the end of the input sets none, and an older one would mislead
         if (std::fgets(line, sizeof line, stdin) == nullptr) {
             std::perror("\nError reading command line - exiting");
             return;

@@ -114,10 +114,13 @@ TEST_F(DllUtilsTest, LoadsALibraryOnlyWithAllItsFunctions) {
     EXPECT_EQ(nullptr, functions[0]);
     EXPECT_FALSE(is_loaded(partial));
 
+    functions[0] = functions[1] = this;
     testing::internal::CaptureStdout();
     EXPECT_EQ(nullptr, DllUtils::LoadDll(dir.path("none.so").c_str(), 2, kNames, functions));
     EXPECT_NE(std::string::npos,
               testing::internal::GetCapturedStdout().find("\nLOAD_DLLS> Error in dlopen: "));
+    EXPECT_EQ(nullptr, functions[0]);
+    EXPECT_EQ(nullptr, functions[1]);
 }
 
 TEST_F(DllUtilsTest, LoadsAllFittingLibrariesOfADirectory) {

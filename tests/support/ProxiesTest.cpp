@@ -47,6 +47,8 @@ using Lines = std::vector<std::string>;
 void expect_nothing_there() {
     logged.clear();
     errno = 77;
+    EXPECT_EQ(nullptr, ErrMgr::GetError());
+    EXPECT_EQ(77, errno);
     ErrMgr::AddErr("Class", "Method", nullptr, "message %d", 1);
     ErrMgr::AddErr(kEngine, 2, "Class", "Method", nullptr, "message");
     ErrMgr::SeErr("type", "Class", "Method", nullptr, "message");
@@ -55,7 +57,6 @@ void expect_nothing_there() {
     ErrMgr::SetEventListener(nullptr);
     ErrMgr::ClearErrorTrace();
     ErrMgr::ClearErrorTrace(1);
-    EXPECT_EQ(nullptr, ErrMgr::GetError());
     EXPECT_EQ(nullptr, ErrMgr::GetErrorTraceRoot());
     EXPECT_EQ(nullptr, ErrMgr::GetErrorTraceRoot(1));
     IErrData** trace = nullptr;
@@ -335,10 +336,10 @@ TEST_F(ProxiesWithHost, TheHostProgramReadsWhatWasReported) {
     ASSERT_NE(nullptr, host->GetError());
     EXPECT_STREQ("shared", host->GetError()->Message());
     give_back();
-    give_back();  // one too many does nothing
-    host = get();
+    host = get();  // both had given it back, so this is a new one
     EXPECT_EQ(nullptr, host->GetError());
     give_back();
+    give_back();  // one too many does nothing
     dlclose(library);
 }
 

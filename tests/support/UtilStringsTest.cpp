@@ -199,10 +199,12 @@ TEST(CmdLineInterpreter, StopsAtTheEndOfTheInput) {
     in_own_process(
         [] {
             ASSERT_NE(nullptr, std::freopen("/dev/null", "r", stdin));
+            errno = EIO;
             Util::CmdLineInterpreter(nullptr, 0, nullptr, handle);
+            EXPECT_EQ(EIO, errno);
             EXPECT_TRUE(handled.empty());
         },
-        "\nError reading command line - exiting: ");
+        "\nError reading command line - exiting: Success");
 }
 
 }  // namespace

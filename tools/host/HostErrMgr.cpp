@@ -111,7 +111,7 @@ void HostErrMgr::ClearErrorTrace(long thread_id) {
     traces.erase(thread_id);
 }
 
-void HostErrMgr::add(std::shared_ptr<ErrData> error) {
+void HostErrMgr::add(const std::shared_ptr<ErrData>& error) {
     {
         const std::lock_guard<std::mutex> lock(mutex);
         Trace& trace = traces[current_thread_id()];

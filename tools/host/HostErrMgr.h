@@ -43,7 +43,7 @@ private:
     // Oldest first, never empty.
     using Trace = std::deque<std::shared_ptr<ErrData>>;
 
-    void add(std::shared_ptr<ErrData> error);
+    void add(const std::shared_ptr<ErrData>& error);
 
     // Null when the thread has no errors. Called with the mutex held.
     const Trace* find(long thread_id) const;
