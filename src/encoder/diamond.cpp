@@ -75,20 +75,20 @@ struct Vector {
     int x, y;
 };
 
-// A half-sample candidate: fraction in quarter pels, plane and offset of its sample.
+// A half-sample candidate: direction, plane and offset of its sample.
 enum Plane { kFull, kVertical, kHorizontal, kCentre };
 struct PlaneSample {
     Plane plane;
     int x, y;
 };
 struct HalfCandidate {
-    Vector fraction;
+    Vector direction;
     PlaneSample sample;
 };
 constexpr HalfCandidate kHalfCandidates[8] = {
-    {{0, 2}, {kVertical, 0, 0}},     {{0, -2}, {kVertical, 0, -1}}, {{2, 0}, {kHorizontal, 0, 0}},
-    {{-2, 0}, {kHorizontal, -1, 0}}, {{2, 2}, {kCentre, 0, 0}},     {{-2, 2}, {kCentre, -1, 0}},
-    {{2, -2}, {kCentre, 0, -1}},     {{-2, -2}, {kCentre, -1, -1}}};
+    {{0, 1}, {kVertical, 0, 0}},     {{0, -1}, {kVertical, 0, -1}}, {{1, 0}, {kHorizontal, 0, 0}},
+    {{-1, 0}, {kHorizontal, -1, 0}}, {{1, 1}, {kCentre, 0, 0}},     {{-1, 1}, {kCentre, -1, 0}},
+    {{1, -1}, {kCentre, 0, -1}},     {{-1, -1}, {kCentre, -1, -1}}};
 
 // Quarter-sample candidates around the half-sample result, in the order of their evaluation.
 constexpr Vector kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
@@ -151,11 +151,29 @@ private:
     bool first_visit(Vector v);
     bool improve_integer(Vector v, int first_sad);
 
-    int vector_rate(int x, int y) const;
+    int rate_x(int x) const { return m_lambda * component_rate(x - m_pmv.x); }
+    int rate_y(int y) const { return m_lambda * component_rate(y - m_pmv.y); }
     bool passes_first_phase(int first_sad, int rate) const;
     void set_limits(int rate, int* limits) const;
     bool accept(const int* sums, int rate, int first_threshold);
     void set_planes(std::ptrdiff_t position);
+    void record_fraction(_mv& result, Vector fraction) const;
+
+    // Rates of the vectors around (x, y), `step` quarter pels apart.
+    struct FractionRates {
+        int horizontal[3], vertical[3];
+
+        FractionRates(const MotionSearch& search, int x, int y, int step) {
+            for (int i = -1; i <= 1; ++i) {
+                horizontal[i + 1] = search.rate_x(x + step * i);
+                vertical[i + 1] = search.rate_y(y + step * i);
+            }
+        }
+        int of(Vector direction) const {
+            return horizontal[direction.x + 1] + vertical[direction.y + 1];
+        }
+    };
+
     const std::uint8_t* sample(const PlaneSample& s) const {
         return m_planes[s.plane] + s.y * m_stride + s.x;
     }
@@ -164,6 +182,8 @@ private:
     const zolt::Kernels& m_kernels;
     const std::ptrdiff_t m_stride;
     const int m_px, m_py;       // the macroblock's position, samples
+    const Vector m_pmv;         // predicted vector, quarter pels
+    const int m_lambda;         // rate weight
     const std::uint8_t* m_ref;  // its samples in the reference
     std::uint32_t* m_visited;   // stamp of the zero vector
     int m_thresholds[3] = {kNoCost, kNoCost, kNoCost};
@@ -248,6 +268,8 @@ MotionSearch::MotionSearch(CEncoder& encoder)
       m_stride(encoder.g_stride_luma),
       m_px(16 * encoder.g_mb_x),
       m_py(16 * encoder.g_mb_y),
+      m_pmv{encoder.g_pmv_x, encoder.g_pmv_y},
+      m_lambda(encoder.g_sad_lambda),
       m_ref(encoder.g_ref_y + m_py * m_stride + m_px),
       m_visited(encoder.g_visit_L0 + encoder.g_visit_dim / 2 * (encoder.g_visit_dim + 1)) {
     m_kernels.split_phases(encoder.g_mb_src_y, m_stride, m_phases);
@@ -397,7 +419,7 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
 
 // Completes a candidate of the integer stage. Returns true at an early end.
 bool MotionSearch::improve_integer(Vector v, int first_sad) {
-    const int rate = vector_rate(4 * v.x, 4 * v.y);
+    const int rate = rate_x(4 * v.x) + rate_y(4 * v.y);
     if (!passes_first_phase(first_sad, rate)) {
         return false;
     }
@@ -416,17 +438,17 @@ bool MotionSearch::improve_integer(Vector v, int first_sad) {
 // Half-pel step around the integer result.
 void MotionSearch::half_stage(_mv& result) {
     set_planes(m_best.y * m_stride + m_best.x);
-    bool done = false;
-    for (int first = 0; first < 8 && !done; first += kGroup) {
+    const FractionRates rates(*this, 4 * m_best.x, 4 * m_best.y, 2);
+    for (int first = 0; first < 8; first += kGroup) {
         const std::uint8_t* refs[kGroup];
         int first_sads[kGroup];
         for (int i = 0; i < kGroup; ++i) {
             refs[i] = sample(kHalfCandidates[first + i].sample);
         }
         m_kernels.sad_first_phase_x4(m_phases, refs, m_stride, first_sads);
-        for (int i = 0; i < kGroup && !done; ++i) {
-            const Vector fraction = kHalfCandidates[first + i].fraction;
-            const int rate = vector_rate(4 * m_best.x + fraction.x, 4 * m_best.y + fraction.y);
+        for (int i = 0; i < kGroup; ++i) {
+            const Vector direction = kHalfCandidates[first + i].direction;
+            const int rate = rates.of(direction);
             if (!passes_first_phase(first_sads[i], rate)) {
                 continue;
             }
@@ -435,14 +457,13 @@ void MotionSearch::half_stage(_mv& result) {
             int sums[4] = {first_sads[i]};
             if (m_kernels.sad_later_phases(m_phases, refs[i], m_stride, limits, sums) &&
                 accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
-                result.dx = static_cast<std::int8_t>(fraction.x);
-                result.dy = static_cast<std::int8_t>(fraction.y);
-                done = m_best_sad < kGoodSad;
+                record_fraction(result, {2 * direction.x, 2 * direction.y});
+                if (m_best_sad < kGoodSad) {
+                    return;
+                }
             }
         }
     }
-    result.sad = static_cast<std::uint32_t>(m_best_sad);
-    result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
 
 // Quarter-pel step around the half-pel result; its first threshold is tighter.
@@ -453,8 +474,8 @@ void MotionSearch::quarter_stage(_mv& result) {
         CEncoder::exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
     }
     set_planes((m_best.y - (half.y < 0 ? 1 : 0)) * m_stride + m_best.x - (half.x < 0 ? 1 : 0));
-    bool done = false;
-    for (int first = 0; first < 8 && !done; first += kGroup) {
+    const FractionRates rates(*this, 4 * m_best.x + half.x, 4 * m_best.y + half.y, 1);
+    for (int first = 0; first < 8; first += kGroup) {
         const std::uint8_t* a[kGroup];
         const std::uint8_t* b[kGroup];
         int first_sads[kGroup];
@@ -463,10 +484,9 @@ void MotionSearch::quarter_stage(_mv& result) {
             b[i] = sample(kQuarterSamples[kind][first + i][1]);
         }
         m_kernels.sad_first_phase_average_x4(m_phases, a, b, m_stride, first_sads);
-        for (int i = 0; i < kGroup && !done; ++i) {
-            const Vector fraction = {half.x + kQuarterCandidates[first + i].x,
-                                     half.y + kQuarterCandidates[first + i].y};
-            const int rate = vector_rate(4 * m_best.x + fraction.x, 4 * m_best.y + fraction.y);
+        for (int i = 0; i < kGroup; ++i) {
+            const Vector direction = kQuarterCandidates[first + i];
+            const int rate = rates.of(direction);
             if (!passes_first_phase(first_sads[i], rate)) {
                 continue;
             }
@@ -475,12 +495,18 @@ void MotionSearch::quarter_stage(_mv& result) {
             int sums[4] = {first_sads[i]};
             if (m_kernels.sad_later_phases_average(m_phases, a[i], b[i], m_stride, limits, sums) &&
                 accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
-                result.dx = static_cast<std::int8_t>(fraction.x);
-                result.dy = static_cast<std::int8_t>(fraction.y);
-                done = m_best_sad < kGoodSad;
+                record_fraction(result, {half.x + direction.x, half.y + direction.y});
+                if (m_best_sad < kGoodSad) {
+                    return;
+                }
             }
         }
     }
+}
+
+void MotionSearch::record_fraction(_mv& result, Vector fraction) const {
+    result.dx = static_cast<std::int8_t>(fraction.x);
+    result.dy = static_cast<std::int8_t>(fraction.y);
     result.sad = static_cast<std::uint32_t>(m_best_sad);
     result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
@@ -492,12 +518,6 @@ void MotionSearch::set_planes(std::ptrdiff_t position) {
     m_planes[kVertical] = m_encoder.g_half_v_L0 + position;
     m_planes[kHorizontal] = m_encoder.g_half_h_L0 + position;
     m_planes[kCentre] = m_encoder.g_half_hv_L0 + position;
-}
-
-// Cost of a vector's difference from its prediction; x, y in quarter pels.
-int MotionSearch::vector_rate(int x, int y) const {
-    return (component_rate(x - m_encoder.g_pmv_x) + component_rate(y - m_encoder.g_pmv_y)) *
-           m_encoder.g_sad_lambda;
 }
 
 // Whether a candidate is still in the race after a quarter of its samples.

@@ -49,9 +49,9 @@ struct Kernels {
                                        const std::uint8_t* const* b, std::ptrdiff_t stride,
                                        int* sads);
 
-    // Continues from sums[0], the SAD of phase 0: sums[p] = the SAD of phases 0..p. Stops after
-    // phase 1 or 2 when sums[p] >= limits[p] and returns false; returns true when sums[3], the SAD
-    // of the whole block, is there.
+    // Continues from sums[0], the SAD of phase 0: sums[p] = the SAD of phases 0..p, sums[3] that of
+    // the whole block. Returns false when sums[1] >= limits[1] or sums[2] >= limits[2]; sums[1..3]
+    // are then not defined.
     bool (*sad_later_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
                              std::ptrdiff_t stride, const int* limits, int* sums);
     bool (*sad_later_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,

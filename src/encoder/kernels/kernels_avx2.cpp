@@ -91,18 +91,22 @@ void first_phase_x4(const uint8_t* phases, int* sads, TwoRowsOf two_rows_of) {
     store_16(sads, _mm_add_epi32(low_lane(sums), high_lane(sums)));
 }
 
+// All three remaining phases, whether the limits are reached or not: telling that after each of
+// them would take longer.
 template <typename TwoRows>
 bool later_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two_rows) {
-    sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), two_rows);
-    if (sums[1] >= limits[1]) {
-        return false;
-    }
-    sums[2] = sums[1] + phase_sad(phases + 256, 1, even_columns(), two_rows);
-    if (sums[2] >= limits[2]) {
-        return false;
-    }
-    sums[3] = sums[2] + phase_sad(phases + 384, 0, odd_columns(), two_rows);
-    return true;
+    const __m256i second = phase_sad_parts(phases + 128, 1, odd_columns(), two_rows);
+    const __m256i third = phase_sad_parts(phases + 256, 1, even_columns(), two_rows);
+    const __m256i fourth = phase_sad_parts(phases + 384, 0, odd_columns(), two_rows);
+    // The parts fill the even 32-bit elements only.
+    const __m256i pair = _mm256_or_si256(second, _mm256_slli_epi64(third, 32));
+    const __m256i parts =
+        _mm256_add_epi32(_mm256_unpacklo_epi64(pair, fourth), _mm256_unpackhi_epi64(pair, fourth));
+    const __m128i sads = _mm_add_epi32(low_lane(parts), high_lane(parts));
+    sums[1] = sums[0] + _mm_cvtsi128_si32(sads);
+    sums[2] = sums[1] + _mm_extract_epi32(sads, 1);
+    sums[3] = sums[2] + _mm_extract_epi32(sads, 2);
+    return sums[1] < limits[1] && sums[2] < limits[2];
 }
 
 auto two_rows_at(const uint8_t* ref, ptrdiff_t stride) {
@@ -205,15 +209,6 @@ void average_16x16(uint8_t* pred, const uint8_t* a, ptrdiff_t a_stride, const ui
     }
 }
 
-// Unrounded vertical sums of 16 samples.
-__m256i vertical_sums(const uint8_t* p, ptrdiff_t stride) {
-    const auto row = [=](int y) { return _mm256_cvtepu8_epi16(load_16(p + y * stride)); };
-    const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(row(0), row(1)), 2),
-                                       _mm256_add_epi16(row(-1), row(2)));
-    return _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(row(-2), row(3)), t),
-                            _mm256_slli_epi16(t, 2));
-}
-
 // (outer - 5 * middle + 20 * inner + 512) >> 10 with 32-bit sums.
 __m256i centre_samples(__m256i outer, __m256i middle, __m256i inner) {
     const __m256i ones = _mm256_set1_epi16(1);
@@ -229,11 +224,30 @@ __m256i centre_samples(__m256i outer, __m256i middle, __m256i inner) {
 }
 
 void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
-    alignas(32) int16_t sums[32];  // columns -2..18
+    // Unrounded vertical sums of columns -2..13 and 3..18, from six rows that move down.
+    const auto row = [=](int y, int half) {
+        return _mm256_cvtepu8_epi16(load_16(src + y * stride - 2 + 5 * half));
+    };
+    __m256i rows[2][6];
+    for (int half = 0; half < 2; ++half) {
+        for (int i = 0; i < 5; ++i) {
+            rows[half][i] = row(i - 2, half);
+        }
+    }
+    alignas(32) int16_t sums[32];
     for (int y = 0; y < 16; ++y) {
-        const uint8_t* row = src + y * stride - 2;
-        store_32(sums, vertical_sums(row, stride));
-        store_32(sums + 5, vertical_sums(row + 5, stride));
+        for (int half = 0; half < 2; ++half) {
+            __m256i* r = rows[half];
+            r[5] = row(y + 3, half);
+            const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(r[2], r[3]), 2),
+                                               _mm256_add_epi16(r[1], r[4]));
+            store_32(sums + 5 * half,
+                     _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(r[0], r[5]), t),
+                                      _mm256_slli_epi16(t, 2)));
+            for (int i = 0; i < 5; ++i) {
+                r[i] = r[i + 1];
+            }
+        }
         const __m256i samples =
             centre_samples(_mm256_add_epi16(load_32(sums), load_32(sums + 5)),
                            _mm256_add_epi16(load_32(sums + 1), load_32(sums + 4)),
@@ -617,15 +631,17 @@ void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, i
 void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
     alignas(32) uint8_t block[128];
     transpose_16x8(pix - 4, stride, block);
-    luma_rows(Rows(block, 16).row, alpha, beta, luma_tc0(tc0));
-    transpose_8x16(block, pix - 4, stride);
+    if (luma_rows(Rows(block, 16).row, alpha, beta, luma_tc0(tc0))) {
+        transpose_8x16(block, pix - 4, stride);
+    }
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     alignas(32) uint8_t block[128];
     transpose_16x8(pix - 4, stride, block);
-    luma_rows_strong<Lanes>(Rows(block, 16).row, alpha, beta);
-    transpose_8x16(block, pix - 4, stride);
+    if (luma_rows_strong<Lanes>(Rows(block, 16).row, alpha, beta)) {
+        transpose_8x16(block, pix - 4, stride);
+    }
 }
 
 }  // namespace

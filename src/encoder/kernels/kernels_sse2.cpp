@@ -685,8 +685,9 @@ void filter_luma_columns(uint8_t* pix, ptrdiff_t stride, Filter filter) {
         rows[i] = block + 8 * i;
     }
     transpose_8x8(pix - 4, stride, block, 8);
-    filter(rows);
-    transpose_8x8(block, 8, pix - 4, stride);
+    if (filter(rows)) {
+        transpose_8x8(block, 8, pix - 4, stride);
+    }
 }
 
 // The same for the two columns on either side of a chroma edge, of which the inner ones change.
@@ -705,7 +706,9 @@ void filter_chroma_columns(uint8_t* pix, ptrdiff_t stride, Filter filter) {
     const __m128i odd = _mm_unpacklo_epi8(a[1], a[3]);
     store(block, _mm_unpacklo_epi8(even, odd));
     store(block + 16, _mm_unpackhi_epi8(even, odd));
-    filter(rows);
+    if (!filter(rows)) {
+        return;
+    }
     alignas(16) uint8_t pairs[16];
     store(pairs, _mm_unpacklo_epi8(load_8(rows[1]), load_8(rows[2])));
     for (int i = 0; i < 8; ++i) {
@@ -717,7 +720,7 @@ void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta
                              const int8_t* tc0) {
     for (int half = 0; half < 2; ++half) {
         filter_rows(pix + 8 * half, stride, 4, [&](uint8_t* const* rows) {
-            luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+            return luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
         });
     }
 }
@@ -725,47 +728,50 @@ void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta
 void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
     for (int half = 0; half < 2; ++half) {
         filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
-            luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+            return luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
         });
     }
 }
 
 void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     for (int half = 0; half < 2; ++half) {
-        filter_rows(pix + 8 * half, stride, 4,
-                    [&](uint8_t* const* rows) { luma_rows_strong<Lanes>(rows, alpha, beta); });
+        filter_rows(pix + 8 * half, stride, 4, [&](uint8_t* const* rows) {
+            return luma_rows_strong<Lanes>(rows, alpha, beta);
+        });
     }
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     for (int half = 0; half < 2; ++half) {
         filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
-            luma_rows_strong<Lanes>(rows, alpha, beta);
+            return luma_rows_strong<Lanes>(rows, alpha, beta);
         });
     }
 }
 
 void deblock_chroma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
                                const int8_t* tc0) {
-    filter_rows(pix, stride, 2,
-                [&](uint8_t* const* rows) { chroma_rows(rows, alpha, beta, chroma_tc0(tc0)); });
+    filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
+        return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+    });
 }
 
 void deblock_chroma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
                              const int8_t* tc0) {
     filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
-        chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+        return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
     });
 }
 
 void deblock_chroma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     filter_rows(pix, stride, 2,
-                [&](uint8_t* const* rows) { chroma_rows_strong<Lanes>(rows, alpha, beta); });
+                [&](uint8_t* const* rows) { return chroma_rows_strong<Lanes>(rows, alpha, beta); });
 }
 
 void deblock_chroma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    filter_chroma_columns(
-        pix, stride, [&](uint8_t* const* rows) { chroma_rows_strong<Lanes>(rows, alpha, beta); });
+    filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
+        return chroma_rows_strong<Lanes>(rows, alpha, beta);
+    });
 }
 
 }  // namespace
