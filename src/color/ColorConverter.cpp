@@ -489,7 +489,8 @@ void ColorConverter::CopyRows(const unsigned char* source, int pixelBytes) {
         return;
     }
     ForEachRow(source, pixelBytes, pixelBytes, [&](const std::uint8_t* from, std::uint8_t* to) {
-        std::memcpy(to, from, static_cast<std::size_t>(outputWidth * pixelBytes));
+        std::memcpy(to, from,
+                    static_cast<std::size_t>(outputWidth) * static_cast<std::size_t>(pixelBytes));
     });
 }
 
