@@ -270,7 +270,7 @@ public:
     // ---- diamond: motion search ----
     void initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel);
     void framePredInitP();
-    void make_half_pixel_sds(int mb_y);
+    void make_half_pixel_sds(int end);
     void generateMBPred();
 
     // ---- motioncomp ----
@@ -445,7 +445,7 @@ public:
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
     zolt::AlignedBuffer<std::uint32_t> g_visit_store;
     std::uint32_t* g_visit_L0 = nullptr;
-    int g_half_rows = 0;              // rows of the half-sample planes that are there, from the top
+    int g_half_rows_end = 0;          // picture row where the half-sample planes end that are built
     std::uint32_t g_visit_stamp = 0;  // stamp of the running search
 
     // ---- Deblocking: boundary strengths of the current macroblock ----

@@ -216,23 +216,20 @@ void CEncoder::framePredInitP() {
     g_kernels->extend_edges(g_ref_y, g_width16, g_height16, g_stride_luma, g_pad_luma);
     g_kernels->extend_edges(g_ref_u, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
     g_kernels->extend_edges(g_ref_v, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
-    g_half_rows = 0;
+    g_half_rows_end = -g_pad_luma;
 }
 
-// Half-sample planes of the reference, as far down as the macroblocks of row mb_y can reach. The
-// centre plane is filtered from the rounded samples of the vertical one: an approximation that only
-// the search reads.
-void CEncoder::make_half_pixel_sds(int mb_y) {
+// Builds the rows of the half-sample planes above picture row `end`, as far as they are not there
+// yet: refinement asks for them when it needs them, so that they are still in the cache when it
+// reads them. The centre plane is filtered from the rounded samples of the vertical one: an
+// approximation that only the search reads.
+void CEncoder::make_half_pixel_sds(int end) {
     constexpr int kMargin = 3;  // outermost rows and columns, which lack a filter tap
-    // A search ends at most this far below the macroblock: a vector that starts within twice the
-    // range, a diamond walk of one range and a step, and a row for the fractions.
-    const int reach = 3 * g_search_range + 2;
     const int count = g_stride_luma - 2 * kMargin;
-    const int last =
-        std::min(16 * (mb_y + 1) + reach + g_pad_luma, g_height16 + 2 * g_pad_luma - kMargin);
-    for (g_half_rows = std::max(g_half_rows, kMargin); g_half_rows < last; ++g_half_rows) {
+    g_half_rows_end = std::max(g_half_rows_end, kMargin - g_pad_luma);
+    for (; g_half_rows_end < end; ++g_half_rows_end) {
         const std::ptrdiff_t row =
-            static_cast<std::ptrdiff_t>(g_half_rows - g_pad_luma) * g_stride_luma - g_pad_luma;
+            static_cast<std::ptrdiff_t>(g_half_rows_end) * g_stride_luma - g_pad_luma;
         const std::ptrdiff_t inner = row + kMargin;
         g_kernels->half_vertical_row(g_ref_y + row, g_stride_luma, g_half_v_L0 + row,
                                      g_stride_luma);
@@ -255,6 +252,8 @@ void CEncoder::generateMBPred() {
     search.integer_stage(result);
     g_me_mb_L0[g_mapMBNumber] = result;
     if (g_subpel_enable) {
+        // The block, and the row below it that fractions reach.
+        make_half_pixel_sds(16 * g_mb_y + result.y + 17);
         search.half_stage(result);
         search.quarter_stage(result);
     }

@@ -175,17 +175,14 @@ void CEncoder::code_picture() {
 }
 
 // slice_data(), clause 7.3.4, and deblocking. Works in macroblock rows so that what a row needs is
-// still in the cache: its input is loaded and its part of the search planes built just before it is
-// coded, and the row above is deblocked just after, when nothing predicts from it any more. Returns
-// false when the NAL buffer might not hold the next macroblock.
+// still in the cache: its input is loaded just before it is coded, and the row above is deblocked
+// just after, when nothing predicts from it any more. Returns false when the NAL buffer might not
+// hold the next macroblock.
 bool CEncoder::code_slice_data() {
     const bool inter = g_slp->sliceType == P_SLICE;
     const unsigned capacity = static_cast<unsigned>(g_nal_buf_size) * 8;
     for (int mb_y = 0; mb_y < g_mb_height; ++mb_y) {
         load_row(mb_y);
-        if (inter) {
-            make_half_pixel_sds(mb_y);
-        }
         for (int mb_x = 0; mb_x < g_mb_width; ++mb_x) {
             if (g_nal_bitpos + kMaxMacroblockBits > capacity) {
                 return false;
