@@ -211,6 +211,7 @@ public:
     void processCurrentMB_I();
     void processCurrentMB_P();
     void setMBOffsets();
+    void prefetch_reference() const;
     std::ptrdiff_t first_block() const;
     void code_intra();
     void code_intra4x4();

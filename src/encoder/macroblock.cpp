@@ -2,6 +2,7 @@
 #include <cstring>
 
 #include "encoder/CEncoder.h"
+#include "encoder/prefetch.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -32,6 +33,7 @@ void CEncoder::processCurrentMB_I() {
 // A macroblock of a P picture.
 void CEncoder::processCurrentMB_P() {
     setMBOffsets();
+    prefetch_reference();
     generatePredError16x16();
     g_skip_flag = 0;
     if (!setLearnPIMode()) {
@@ -71,6 +73,20 @@ void CEncoder::setMBOffsets() {
 
     g_sad_lambda = zolt::QP2QUANT[std::max(0, g_mbQp - 12)];
     g_intra_lambda = g_sad_lambda;
+}
+
+// Asks for samples of the reference that macroblocks further right will read, a row of each plane
+// at a time: 64 bytes are 4 macroblocks of luma and 8 of chroma.
+void CEncoder::prefetch_reference() const {
+    const std::ptrdiff_t luma_row = 16 * g_mb_y + 16 + 4 * (g_mb_x & 3);
+    const std::uint8_t* luma = g_ref_y + luma_row * g_stride_luma + 16 * g_mb_x + 64;
+    for (int row = 0; row < 4; ++row) {
+        zolt::prefetch(luma + row * static_cast<std::ptrdiff_t>(g_stride_luma));
+    }
+    const std::ptrdiff_t chroma =
+        static_cast<std::ptrdiff_t>(8 * g_mb_y + (g_mb_x & 7)) * g_stride_chroma + 8 * g_mb_x + 64;
+    zolt::prefetch(g_ref_u + chroma);
+    zolt::prefetch(g_ref_v + chroma);
 }
 
 // Entry of the macroblock's top left block in the per-4x4-block maps.

@@ -223,36 +223,40 @@ __m256i centre_samples(__m256i outer, __m256i middle, __m256i inner) {
     return _mm256_packs_epi32(_mm256_srai_epi32(low, 10), _mm256_srai_epi32(high, 10));
 }
 
+// Unrounded vertical sums from six rows, as 16-bit lanes.
+__m256i vertical_sums(const __m256i* r) {
+    const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(r[2], r[3]), 2),
+                                       _mm256_add_epi16(r[1], r[4]));
+    return _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(r[0], r[5]), t),
+                            _mm256_slli_epi16(t, 2));
+}
+
 void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
-    // Unrounded vertical sums of columns -2..13 and 3..18, from six rows that move down.
-    const auto row = [=](int y, int half) {
-        return _mm256_cvtepu8_epi16(load_16(src + y * stride - 2 + 5 * half));
+    // Columns -2..13, and columns 6..21, from six rows that move down.
+    __m256i left[6], right[6];
+    const auto load_row = [&](int slot, int y) {
+        const uint8_t* row = src + y * stride;
+        left[slot] = _mm256_cvtepu8_epi16(load_16(row - 2));
+        right[slot] = join(high_lane(left[slot]), _mm_cvtepu8_epi16(load_8(row + 14)));
     };
-    __m256i rows[2][6];
-    for (int half = 0; half < 2; ++half) {
-        for (int i = 0; i < 5; ++i) {
-            rows[half][i] = row(i - 2, half);
-        }
+    for (int i = 0; i < 5; ++i) {
+        load_row(i, i - 2);
     }
-    alignas(32) int16_t sums[32];
     for (int y = 0; y < 16; ++y) {
-        for (int half = 0; half < 2; ++half) {
-            __m256i* r = rows[half];
-            r[5] = row(y + 3, half);
-            const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(r[2], r[3]), 2),
-                                               _mm256_add_epi16(r[1], r[4]));
-            store_32(sums + 5 * half,
-                     _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(r[0], r[5]), t),
-                                      _mm256_slli_epi16(t, 2)));
-            for (int i = 0; i < 5; ++i) {
-                r[i] = r[i + 1];
-            }
-        }
-        const __m256i samples =
-            centre_samples(_mm256_add_epi16(load_32(sums), load_32(sums + 5)),
-                           _mm256_add_epi16(load_32(sums + 1), load_32(sums + 4)),
-                           _mm256_add_epi16(load_32(sums + 2), load_32(sums + 3)));
+        load_row(5, y + 3);
+        const __m256i a = vertical_sums(left);
+        const __m256i b = vertical_sums(right);
+        // Sums that start n columns later.
+        const __m256i a1 = _mm256_alignr_epi8(b, a, 2), a2 = _mm256_alignr_epi8(b, a, 4);
+        const __m256i a3 = _mm256_alignr_epi8(b, a, 6), a4 = _mm256_alignr_epi8(b, a, 8);
+        const __m256i a5 = _mm256_alignr_epi8(b, a, 10);
+        const __m256i samples = centre_samples(_mm256_add_epi16(a, a5), _mm256_add_epi16(a1, a4),
+                                               _mm256_add_epi16(a2, a3));
         store_16(pred + 16 * y, _mm_packus_epi16(low_lane(samples), high_lane(samples)));
+        for (int i = 0; i < 5; ++i) {
+            left[i] = left[i + 1];
+            right[i] = right[i + 1];
+        }
     }
 }
 
@@ -317,7 +321,7 @@ void transpose_four(__m256i* v) {
 }
 
 // Coefficients of four blocks from the rows of their residual; blocks[0], [1] in the low lane.
-void transform_four(__m256i* v, int16_t* const* blocks) {
+[[gnu::always_inline]] inline void transform_four(__m256i* v, int16_t* const* blocks) {
     forward_butterfly(v);
     transpose_four(v);
     forward_butterfly(v);
@@ -428,7 +432,7 @@ __m256i magnitudes(__m256i coefs) {
 // Rows of the residual of four blocks, blocks 0 and 1 in the low lane. Returns false when 16-bit
 // sums might not be exact: no sum of the inverse transform, rounding included, exceeds the sum of
 // a block's magnitudes.
-bool inverse_four(const __m256i* b, __m256i* rows) {
+[[gnu::always_inline]] inline bool inverse_four(const __m256i* b, __m256i* rows) {
     constexpr int kLargestSum = 32767 - 32;
     const __m256i parts = _mm256_hadd_epi32(_mm256_hadd_epi32(magnitudes(b[0]), magnitudes(b[1])),
                                             _mm256_hadd_epi32(magnitudes(b[2]), magnitudes(b[3])));
@@ -527,7 +531,6 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
 
 // Sixteen lines of an edge.
 struct Lanes {
-    static constexpr int kLanes = 16;
     __m256i v;
 
     static Lanes load(const uint8_t* p) { return {_mm256_cvtepu8_epi16(load_16(p))}; }

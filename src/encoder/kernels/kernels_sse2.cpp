@@ -615,7 +615,6 @@ void phase_satd_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
 
 // Eight lines of an edge.
 struct Lanes {
-    static constexpr int kLanes = 8;
     __m128i v;
 
     static Lanes load(const uint8_t* p) { return {widen_low(load_8(p))}; }
