@@ -288,10 +288,6 @@ public:
     // ---- lfilter: deblocking filter ----
     void filter_mb_row(int mb_y);
     void filter_mb(int mb_x, int mb_y);
-    void filter_external_edge(int mb, bool vertical, std::uint32_t strengths, std::uint8_t* y,
-                              std::ptrdiff_t chroma);
-    void filter_internal_edges(int mb, bool vertical, const std::uint32_t* strengths,
-                               std::uint8_t* y, std::ptrdiff_t chroma);
     void find_edge_strengths(int mb_x, int mb_y);
     bool vectors_differ(int mb, int other) const;
 

@@ -89,6 +89,84 @@ struct SegmentTc0 {
     }
 };
 
+// The filters of the vertical or of the horizontal edges, and the steps across an edge, in samples.
+struct EdgeFilters {
+    zolt::Kernels::NormalFilter luma;
+    zolt::Kernels::StrongFilter luma_strong;
+    zolt::Kernels::NormalFilter chroma;
+    zolt::Kernels::StrongFilter chroma_strong;
+    std::ptrdiff_t luma_step, chroma_step;
+};
+
+// The samples of a macroblock that is being filtered.
+struct Macroblock {
+    const CEncoder& encoder;
+    const int mb;
+    std::uint8_t* const y;
+    std::uint8_t* const u;
+    std::uint8_t* const v;
+
+    Macroblock(const CEncoder& e, int address, int mb_x, int mb_y)
+        : encoder(e),
+          mb(address),
+          y(e.g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * e.g_stride_luma + 16 * mb_x),
+          u(e.g_cur_u + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x),
+          v(e.g_cur_v + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x) {}
+
+    // One direction's edges by their strengths; neighbour: the macroblock beyond edge 0.
+    void filter_edges(const std::uint32_t* strengths, int neighbour,
+                      const EdgeFilters& filters) const {
+        if (strengths[0] != 0) {
+            filter_external_edge(strengths[0], neighbour, filters);
+        }
+        if ((strengths[1] | strengths[2] | strengths[3]) != 0) {
+            filter_internal_edges(strengths, filters);
+        }
+    }
+
+    void filter_external_edge(std::uint32_t strengths, int neighbour,
+                              const EdgeFilters& filters) const {
+        const lfdata& lf = encoder.g_lf_data[mb];
+        const int qp_q = encoder.g_mb_qp[mb];
+        const int qp_p = encoder.g_mb_qp[neighbour];
+        const EdgeParameters luma((qp_q + qp_p + 1) >> 1, lf);
+        const EdgeParameters chroma((zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1,
+                                    lf);
+        if (strengths == kAllStrong) {
+            filters.luma_strong(y, encoder.g_stride_luma, luma.alpha, luma.beta);
+            filters.chroma_strong(u, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
+            filters.chroma_strong(v, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
+            return;
+        }
+        filters.luma(y, encoder.g_stride_luma, luma.alpha, luma.beta,
+                     SegmentTc0(strengths, luma.tc0).values);
+        const SegmentTc0 tc0(strengths, chroma.tc0);
+        filters.chroma(u, encoder.g_stride_chroma, chroma.alpha, chroma.beta, tc0.values);
+        filters.chroma(v, encoder.g_stride_chroma, chroma.alpha, chroma.beta, tc0.values);
+    }
+
+    void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
+        const lfdata& lf = encoder.g_lf_data[mb];
+        const int qp = encoder.g_mb_qp[mb];
+        const EdgeParameters luma(qp, lf);
+        for (int edge = 1; edge < 4; ++edge) {
+            if (strengths[edge] != 0) {
+                filters.luma(y + 4 * edge * filters.luma_step, encoder.g_stride_luma, luma.alpha,
+                             luma.beta, SegmentTc0(strengths[edge], luma.tc0).values);
+            }
+        }
+        if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
+            const EdgeParameters chroma(zolt::QP_SCALE_CR[qp], lf);
+            const SegmentTc0 tc0(strengths[2], chroma.tc0);
+            const std::ptrdiff_t offset = 4 * filters.chroma_step;
+            filters.chroma(u + offset, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
+                           tc0.values);
+            filters.chroma(v + offset, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
+                           tc0.values);
+        }
+    }
+};
+
 }  // namespace
 
 // Deblocks one macroblock row of the current picture in place (clause 8.7); rows go from the top.
@@ -105,65 +183,15 @@ void CEncoder::filter_mb(int mb_x, int mb_y) {
         return;
     }
     find_edge_strengths(mb_x, mb_y);
-    std::uint8_t* y = g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * g_stride_luma + 16 * mb_x;
-    const std::ptrdiff_t chroma =
-        static_cast<std::ptrdiff_t>(8 * mb_y) * g_stride_chroma + 8 * mb_x;
-    for (const bool vertical : {true, false}) {
-        const std::uint32_t* strengths = vertical ? bs_ver : bs_hor;
-        if (strengths[0] != 0) {
-            filter_external_edge(mb, vertical, strengths[0], y, chroma);
-        }
-        if ((strengths[1] | strengths[2] | strengths[3]) != 0) {
-            filter_internal_edges(mb, vertical, strengths, y, chroma);
-        }
-    }
-}
-
-void CEncoder::filter_external_edge(int mb, bool vertical, std::uint32_t strengths, std::uint8_t* y,
-                                    std::ptrdiff_t chroma) {
-    const int qp_q = g_mb_qp[mb];
-    const int qp_p = g_mb_qp[vertical ? mb - 1 : mb - g_mb_width];
-    const EdgeParameters luma((qp_q + qp_p + 1) >> 1, g_lf_data[mb]);
-    const EdgeParameters chroma_edge((zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1,
-                                     g_lf_data[mb]);
     const zolt::Kernels& k = *g_kernels;
-    if (strengths == kAllStrong) {
-        (vertical ? k.deblock_luma_vertical_strong : k.deblock_luma_horizontal_strong)(
-            y, g_stride_luma, luma.alpha, luma.beta);
-        const auto filter =
-            vertical ? k.deblock_chroma_vertical_strong : k.deblock_chroma_horizontal_strong;
-        filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta);
-        filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta);
-        return;
-    }
-    (vertical ? k.deblock_luma_vertical : k.deblock_luma_horizontal)(
-        y, g_stride_luma, luma.alpha, luma.beta, SegmentTc0(strengths, luma.tc0).values);
-    const auto filter = vertical ? k.deblock_chroma_vertical : k.deblock_chroma_horizontal;
-    const SegmentTc0 tc0(strengths, chroma_edge.tc0);
-    filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
-    filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
-}
-
-void CEncoder::filter_internal_edges(int mb, bool vertical, const std::uint32_t* strengths,
-                                     std::uint8_t* y, std::ptrdiff_t chroma) {
-    const zolt::Kernels& k = *g_kernels;
-    const EdgeParameters luma(g_mb_qp[mb], g_lf_data[mb]);
-    const auto filter_luma = vertical ? k.deblock_luma_vertical : k.deblock_luma_horizontal;
-    const std::ptrdiff_t luma_step = 4 * (vertical ? 1 : g_stride_luma);
-    for (int edge = 1; edge < 4; ++edge) {
-        if (strengths[edge] != 0) {
-            filter_luma(y + edge * luma_step, g_stride_luma, luma.alpha, luma.beta,
-                        SegmentTc0(strengths[edge], luma.tc0).values);
-        }
-    }
-    if (strengths[2] != 0) {
-        const EdgeParameters chroma_edge(zolt::QP_SCALE_CR[g_mb_qp[mb]], g_lf_data[mb]);
-        const auto filter = vertical ? k.deblock_chroma_vertical : k.deblock_chroma_horizontal;
-        const SegmentTc0 tc0(strengths[2], chroma_edge.tc0);
-        chroma += 4 * (vertical ? 1 : g_stride_chroma);
-        filter(g_cur_u + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
-        filter(g_cur_v + chroma, g_stride_chroma, chroma_edge.alpha, chroma_edge.beta, tc0.values);
-    }
+    const Macroblock macroblock(*this, mb, mb_x, mb_y);
+    macroblock.filter_edges(bs_ver, mb - 1,
+                            {k.deblock_luma_vertical, k.deblock_luma_vertical_strong,
+                             k.deblock_chroma_vertical, k.deblock_chroma_vertical_strong, 1, 1});
+    macroblock.filter_edges(
+        bs_hor, mb - g_mb_width,
+        {k.deblock_luma_horizontal, k.deblock_luma_horizontal_strong, k.deblock_chroma_horizontal,
+         k.deblock_chroma_horizontal_strong, g_stride_luma, g_stride_chroma});
 }
 
 // Boundary strengths of all edges of a macroblock (clause 8.7.2.1). Every inter macroblock has one
