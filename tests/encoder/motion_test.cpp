@@ -171,7 +171,7 @@ protected:
             }
         }
         engine_.framePredInitP();
-        engine_.make_half_pixel_sds(engine_.g_mb_height - 1);
+        engine_.make_half_pixel_sds(32 + engine_.g_pad_luma - 3);
     }
 
     Random random_{2};

@@ -1,0 +1,179 @@
+// Learned decisions: thresholds that were computed apart with exact fractions, at QPs where a value
+// is close to an integer or the rule changes; trees as unions of their paths; mode searches on
+// blocks whose mode is plain.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <vector>
+
+#include "encoder/CEncoder.h"
+
+namespace {
+
+// Energies that a stand-in for Kernels::hadamard_energy gives to the source and to the residual.
+std::int32_t stand_in_energies[2][4];
+int stand_in_calls = 0;
+
+void stand_in_energy(const std::int32_t*, std::int32_t* energy) {
+    std::copy(stand_in_energies[stand_in_calls], stand_in_energies[stand_in_calls] + 4, energy);
+    ++stand_in_calls;
+}
+
+class LearnedTree : public testing::Test {
+protected:
+    LearnedTree() { engine_.initialize_encoder(); }
+
+    static zolt::Kernels with_stand_in() {
+        zolt::Kernels kernels = zolt::scalar_kernels();
+        kernels.hadamard_energy = stand_in_energy;
+        return kernels;
+    }
+
+    // The values at which any of the thresholds decides, and a step below.
+    static std::vector<int> around(const int* thresholds, int count) {
+        std::vector<int> values = {0, 100000};
+        for (int i = 0; i < count; ++i) {
+            values.push_back(std::max(thresholds[i] - 1, 0));
+            values.push_back(std::max(thresholds[i], 0));
+        }
+        return values;
+    }
+
+    zolt::Kernels kernels_ = with_stand_in();
+    CEncoder engine_{16, 16, &kernels_};
+};
+
+TEST_F(LearnedTree, Intra16x16Or4x4) {
+    const struct {
+        int qp, t[7];
+    } cases[] = {
+        {0, {0, 0, 0, 0, 0, 0, 0}},
+        {5, {10, 9, 0, -21, 20, 0, 0}},
+        {17, {34, 31, 0, -72, 68, 0, 0}},
+        {18, {36, 33, 0, -77, 73, 0, 0}},
+        {24, {56, 32, 0, 100, 48, 0, 0}},
+        {28, {80, 42, 0, 129, 71, 0, 0}},
+        {29, {87, 47, 0, 135, 82, 0, 0}},
+        {30, {94, 52, 0, 141, 95, 0, 0}},
+        {33, {119, 70, 180, 175, 146, 51, 132}},
+        {39, {182, 122, 255, 407, 303, 138, 264}},
+        {48, {309, 241, 396, 1558, 674, 526, 855}},
+        {51, {359, 291, 450, 2262, 834, 725, 1156}},
+    };
+    engine_.g_slp->sliceType = I_SLICE;
+    engine_.setMBOffsets();
+    for (const auto& [qp, t] : cases) {
+        engine_.g_mbQp = qp;
+        const std::vector<int> values = around(t, 7);
+        for (const int d : values) {
+            for (const int h : values) {
+                for (const int v : values) {
+                    const bool large = (t[0] > d && t[1] > d) ||
+                                       (t[0] > d && t[1] <= d && t[3] > v && t[4] > h) ||
+                                       (t[0] <= d && t[2] > d && t[5] > h && t[6] > v);
+                    const std::int32_t energies[4] = {9, h, v, d};
+                    std::copy(energies, energies + 4, stand_in_energies[0]);
+                    stand_in_calls = 0;
+                    ASSERT_EQ(engine_.learn16_4(), large ? 16 : 4)
+                        << "QP " << qp << ", textures " << h << ", " << v << ", " << d;
+                }
+            }
+        }
+    }
+}
+
+TEST_F(LearnedTree, InterOrIntra) {
+    const struct {
+        int qp, t[10];
+    } cases[] = {
+        {10, {-1125, 706, 95, 364, -1320, 0, 0, 0, -2490, -2315}},
+        {20, {392, 188, 27, 67, 91, 0, 0, 0, 617, 338}},
+        {26, {464, 239, 44, 97, 190, 0, 0, 0, 765, 347}},
+        {30, {480, 329, 70, 144, 179, 0, 0, 0, 774, 328}},
+        {34, {648, 414, 102, 180, 238, 0, 0, 0, 1060, 644}},
+        {35, {592, 110, 192, 149, 79, 62, 82, 0, 943, 408}},
+        {36, {664, 142, 225, 169, 87, 67, 246, 0, 1031, 476}},
+        {45, {1042, 421, 581, 240, 243, 96, 848, 0, 1569, 533}},
+        {51, {3553, 1959, 1310, 766, 821, 126, 4231, 0, 4947, 1985}},
+    };
+    engine_.setMBOffsets();
+    for (const auto& [qp, t] : cases) {
+        engine_.g_mbQp = qp;
+        const std::vector<int> values = around(t, 10);
+        for (const int x : values) {
+            for (const int y : values) {
+                const bool a = t[0] > y;
+                const bool low_qp_intra = (a && t[1] <= y && t[4] > x) ||
+                                          (a && t[1] > y && t[3] <= y && t[2] > x) ||
+                                          (!a && t[8] <= y) || (!a && t[8] > y && t[9] > x);
+                const bool high_qp_inter = (a && t[1] <= x) ||
+                                           (a && t[1] > x && t[2] > y && t[3] > y) ||
+                                           (a && t[1] > x && t[2] > y && t[3] <= y && t[5] <= x) ||
+                                           (a && t[1] > x && t[2] <= y && t[4] <= x && t[6] > y) ||
+                                           (!a && t[8] > y && t[9] <= x);
+                // The energy counts with its constant part.
+                const std::int32_t energies[2][4] = {{5, 6, 7, x}, {y / 2, 0, 0, y - y / 2}};
+                std::copy(energies[0], energies[0] + 8, stand_in_energies[0]);
+                stand_in_calls = 0;
+                ASSERT_EQ(engine_.setLearnPIMode() != 0, qp < 35 ? !low_qp_intra : high_qp_inter)
+                    << "QP " << qp << ", x " << x << ", y " << y;
+            }
+        }
+    }
+}
+
+class ModeSearch : public testing::Test {
+protected:
+    // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) around it.
+    template <typename Draw>
+    void start(int mb, Draw draw) {
+        for (int y = 0; y < 48; ++y) {
+            for (int x = 0; x < 48; ++x) {
+                const auto value = static_cast<std::uint8_t>(draw(x, y));
+                engine_.g_cur_y[y * engine_.g_stride_luma + x] = value;
+                engine_.g_cur_u[y / 2 * engine_.g_stride_chroma + x / 2] = value;
+                engine_.g_cur_v[y / 2 * engine_.g_stride_chroma + x / 2] = value;
+            }
+        }
+        engine_.g_mbQp = 12;  // rate weight 1
+        engine_.g_mapMBNumber = mb;
+        engine_.setMBOffsets();
+        engine_.set_block_availability();
+    }
+
+    CEncoder engine_{48, 48};
+};
+
+TEST_F(ModeSearch, FindsTheModeOfPlainBlocks) {
+    const auto modes = [&](int mb, auto draw) {
+        start(mb, draw);
+        return std::make_pair(engine_.learn16_mode(), engine_.learn_chroma_mode());
+    };
+    // 16x16 modes: vertical, horizontal, DC, plane; chroma modes: DC, horizontal, vertical, plane.
+    EXPECT_EQ(modes(4, [](int x, int) { return x / 2 * 37 % 256; }), std::make_pair(0, 2));
+    EXPECT_EQ(modes(4, [](int, int y) { return y / 2 * 37 % 256; }), std::make_pair(1, 1));
+    EXPECT_EQ(modes(4, [](int x, int y) { return x / 2 * 3 + y / 2 * 6; }), std::make_pair(3, 3));
+    EXPECT_EQ(modes(4, [](int, int) { return 77; }), std::make_pair(0, 0)) << "ties";
+    EXPECT_EQ(modes(0, [](int x, int) { return x * 5; }), std::make_pair(2, 0)) << "only DC";
+    EXPECT_EQ(modes(1, [](int, int y) { return y / 2 * 9; }), std::make_pair(1, 1))
+        << "no row above";
+    EXPECT_EQ(modes(3, [](int x, int) { return x / 2 * 9; }), std::make_pair(0, 2)) << "none left";
+}
+
+// The predicted mode is kept up to a distortion of 8 * rate weight + 64, here 72; a block d away
+// from its prediction has 16 * d.
+TEST_F(ModeSearch, KeepsThePredicted4x4Mode) {
+    std::uint8_t pred[16];
+    for (const int d : {4, 5}) {
+        // Block 0 of the middle macroblock continues the row above; DC, as predicted, is d off.
+        start(4, [d](int x, int y) { return x < 16 && y >= 16 ? 100 + 2 * d : 100; });
+        EXPECT_EQ(engine_.learn4_mode(0, 2, pred), d == 4 ? 2 : 0);
+        EXPECT_EQ(pred[0], d == 4 ? 104 : 100);
+    }
+    start(0, [](int x, int y) { return 13 * x * y % 256; });
+    EXPECT_EQ(engine_.learn4_mode(0, 2, pred), 2) << "no other candidate";
+}
+
+}  // namespace

@@ -1,0 +1,192 @@
+// What no decoder checks: forward transform, quantiser, coefficient costs, distortions.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <numeric>
+#include <vector>
+
+#include "common/Random.h"
+#include "encoder/CEncoder.h"
+#include "encoder/tables.h"
+
+namespace {
+
+using zolt::Kernels;
+using zolt_test::Random;
+
+using Matrix = int[4][4];
+
+// left * middle * transposed left.
+void transform(const Matrix& left, const Matrix& middle, Matrix& result) {
+    for (int i = 0; i < 4; ++i) {
+        for (int j = 0; j < 4; ++j) {
+            result[i][j] = 0;
+            for (int k = 0; k < 16; ++k) {
+                result[i][j] += left[i][k / 4] * middle[k / 4][k % 4] * left[j][k % 4];
+            }
+        }
+    }
+}
+
+constexpr Matrix kCore = {{1, 1, 1, 1}, {2, 1, -1, -2}, {1, -1, -1, 1}, {1, -2, 2, -1}};
+// Twice the transposed inverse core transform of clause 8.5.12.2, whose halves these are.
+constexpr Matrix kInverse = {{2, 2, 2, 1}, {2, 1, -2, -2}, {2, -1, -2, 2}, {2, -2, 2, -1}};
+constexpr Matrix kHadamard = {{1, 1, 1, 1}, {1, -1, 1, -1}, {1, 1, -1, -1}, {1, -1, -1, 1}};
+
+TEST(Transform, EqualsMatrixProducts) {
+    const Kernels& k = zolt::scalar_kernels();
+    Random random(1);
+    for (int iteration = 0; iteration < 500; ++iteration) {
+        alignas(32) std::uint8_t src[16], pred[16], dst[16];
+        alignas(32) std::int16_t coefs[16];
+        Matrix residual, product;
+        for (int i = 0; i < 16; ++i) {
+            src[i] = iteration % 2 ? random.sample() : i % 2 * 255;
+            pred[i] = iteration % 2 ? random.sample() : 255 - src[i];
+            residual[i / 4][i % 4] = src[i] - pred[i];
+        }
+        k.transform_4x4(src, 4, pred, coefs);
+        transform(kCore, residual, product);
+        for (int i = 0; i < 16; ++i) {
+            ASSERT_EQ(coefs[4 * (i % 4) + i / 4], product[i / 4][i % 4]);
+        }
+        // With multiples of 4 no half is ever rounded.
+        Matrix scaled;
+        for (int i = 0; i < 16; ++i) {
+            scaled[i / 4][i % 4] = 4 * random.between(-600, 600);
+            coefs[4 * (i % 4) + i / 4] = static_cast<std::int16_t>(scaled[i / 4][i % 4]);
+        }
+        k.reconstruct_4x4(coefs, pred, dst, 4);
+        transform(kInverse, scaled, product);
+        for (int i = 0; i < 16; ++i) {
+            ASSERT_EQ(dst[i],
+                      std::clamp(pred[i] + ((product[i / 4][i % 4] / 4 + 32) >> 6), 0, 255));
+        }
+    }
+}
+
+// A halving in the inverse transform rounds towards minus infinity: -3 gives -2.
+TEST(Transform, HalvesRoundDown) {
+    alignas(32) std::int16_t coefs[16] = {30, -3};  // column 0: g = -2, h = -3
+    alignas(32) std::uint8_t pred[16], dst[16];
+    std::fill(pred, pred + 16, std::uint8_t{100});
+    zolt::scalar_kernels().reconstruct_4x4(coefs, pred, dst, 4);
+    // (30 - 3, 30 - 2, 30 + 2, 30 + 3) + 32, shifted by 6.
+    const int expected[4] = {100, 100, 101, 101};
+    for (int i = 0; i < 16; ++i) {
+        EXPECT_EQ(dst[i], expected[i / 4]);
+    }
+}
+
+TEST(Quantizer, LevelsAndScaledLevels) {
+    // Forward factors and normAdjust4x4 by QP % 6: rows and columns even, odd, mixed.
+    constexpr int kForward[6][3] = {{13107, 5243, 8066}, {11916, 4660, 7490}, {10082, 4194, 6554},
+                                    {9362, 3647, 5825},  {8192, 3355, 5243},  {7282, 2893, 4559}};
+    constexpr int kNorm[6][3] = {{10, 16, 13}, {11, 18, 14}, {13, 20, 16},
+                                 {14, 23, 18}, {16, 25, 20}, {18, 29, 23}};
+    // Rows and columns of the zig-zag scan.
+    constexpr int kScan[16][2] = {{0, 0}, {0, 1}, {1, 0}, {2, 0}, {1, 1}, {0, 2}, {0, 3}, {1, 2},
+                                  {2, 1}, {3, 0}, {3, 1}, {2, 2}, {1, 3}, {2, 3}, {3, 2}, {3, 3}};
+    Random random(2);
+    for (int iteration = 0; iteration < 52 * 40; ++iteration) {
+        const int qp = iteration % 52, bits = 15 + qp / 6;
+        const bool intra = iteration / 52 % 2;
+        const std::int64_t rounding = (std::int64_t{1} << bits) / (intra ? 3 : 6);
+        alignas(32) std::int16_t coefs[16], scan[16];
+        std::int16_t source[16];
+        for (int i = 0; i < 16; ++i) {
+            // The largest that a residual transforms to: rows and columns of weight 4 or 6.
+            const int largest = 255 * (i % 2 ? 6 : 4) * (i / 4 % 2 ? 6 : 4);
+            coefs[i] = source[i] = static_cast<std::int16_t>(random.between(-largest, largest) /
+                                                             (1 << random.between(0, 10)));
+        }
+        std::uint16_t nonzero = 0;
+        const auto mask = zolt::scalar_kernels().quantize(
+            coefs, 1, intra ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp), scan,
+            &nonzero);
+        for (int n = 0; n < 16; ++n) {
+            const auto [row, column] = kScan[n];
+            const int c = source[4 * column + row];
+            const int kind = row % 2 && column % 2 ? 1 : row % 2 || column % 2 ? 2 : 0;
+            const std::int64_t magnitude = std::min<std::int64_t>(
+                (std::int64_t{std::abs(c)} * kForward[qp % 6][kind] + rounding) >> bits, 2063);
+            const int level = static_cast<int>(c < 0 ? -magnitude : magnitude);
+            ASSERT_EQ(scan[n], level) << "QP " << qp;
+            ASSERT_EQ(coefs[4 * column + row], level * kNorm[qp % 6][kind] * (1 << qp / 6));
+            ASSERT_EQ(nonzero >> n & 1, level != 0);
+        }
+        ASSERT_EQ(mask, nonzero != 0 ? 1u : 0u);
+    }
+}
+
+// Levels that a stand-in for the quantiser gives to the blocks of a macroblock.
+std::int16_t stand_in_levels[16][16];
+
+std::uint32_t stand_in_quantize(std::int16_t*, int count, const zolt::Quantizer&,
+                                std::int16_t* scan, std::uint16_t* nonzero) {
+    std::uint32_t mask = 0;
+    for (int b = 0; b < count; ++b) {
+        std::copy(stand_in_levels[b], stand_in_levels[b] + 16, scan + 16 * b);
+        nonzero[b] = 0;
+        for (int n = 0; n < 16; ++n) {
+            nonzero[b] = static_cast<std::uint16_t>(nonzero[b] | (scan[16 * b + n] != 0) << n);
+        }
+        mask |= (nonzero[b] != 0 ? 1u : 0u) << b;
+    }
+    return mask;
+}
+
+TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
+    struct Level {
+        int block, position, level;
+    };
+    const struct {
+        std::vector<Level> levels;
+        unsigned kept;
+        const char* why;
+    } cases[] = {
+        {{{0, 0, 1}}, 0, "a single 1 costs 3"},
+        {{{5, 15, -2}}, 1u << 5, "a 2 anywhere is kept"},
+        {{{0, 0, 1}, {1, 1, -1}}, 0, "3 + 2: the 8x8 block is kept, the macroblock is not"},
+        {{{0, 0, 1}, {1, 1, 1}, {4, 0, 1}, {5, 2, 1}}, 0x33, "two 8x8 blocks of 5"},
+        {{{0, 0, 1}, {2, 0, 1}}, 0x5, "a macroblock of exactly 6"},
+        {{{0, 0, 1}, {1, 1, 1}, {4, 0, 1}, {5, 3, 1}}, 0, "5, and 4 that does not count"},
+        {{{8, 0, 1}, {8, 1, 1}}, 1u << 8, "the zeros before a level count from the last one"},
+        {{{8, 6, 1}, {9, 8, 1}, {12, 15, 1}}, 0, "after six zeros a 1 is free"},
+    };
+    Kernels kernels = zolt::scalar_kernels();
+    kernels.quantize = stand_in_quantize;
+    CEncoder engine(16, 16, &kernels);
+    engine.initialize_encoder();
+    engine.g_slp->sliceType = P_SLICE;
+    engine.setMBOffsets();
+    for (const auto& c : cases) {
+        std::fill(stand_in_levels[0], stand_in_levels[0] + 256, std::int16_t{0});
+        for (const Level& l : c.levels) {
+            stand_in_levels[l.block][l.position] = static_cast<std::int16_t>(l.level);
+        }
+        engine.quantTransform_luma_16x16P();
+        EXPECT_EQ(engine.g_luma_mask, c.kept) << c.why;
+    }
+}
+
+TEST(Distortion, HadamardEnergyOfBlockSums) {
+    Random random(3);
+    for (int iteration = 0; iteration < 200; ++iteration) {
+        Matrix values, h;
+        std::int32_t flat[16], energy[4], expected[4] = {};
+        for (int i = 0; i < 16; ++i) {
+            flat[i] = values[i / 4][i % 4] = random.between(-4080, 4080);
+        }
+        transform(kHadamard, values, h);
+        for (int i = 0; i < 16; ++i) {
+            expected[(i % 4 != 0) + 2 * (i / 4 != 0)] += (std::abs(h[i / 4][i % 4]) + 8) >> 4;
+        }
+        zolt::scalar_kernels().hadamard_energy(flat, energy);
+        EXPECT_TRUE(std::equal(energy, energy + 4, expected));
+    }
+}
+
+}  // namespace
