@@ -129,7 +129,7 @@ constexpr PlaneSample kQuarterSamples[4][8][2] = {{{{kFull, 0, 0}, {kHorizontal,
                                                    {{kVertical, 1, 0}, {kHorizontal, 0, 0}},
                                                    {{kVertical, 0, 0}, {kHorizontal, 0, 0}}}};
 
-// Number of candidates whose first phase is measured in one go.
+// Number of candidates whose first phases are measured in one go.
 constexpr int kGroup = 4;
 
 // The motion search of one macroblock. Its stages share the thresholds, which reject a candidate by
@@ -144,18 +144,18 @@ public:
 
 private:
     void search_integer_vectors();
-    bool try_vector(Vector v);
     bool try_vectors(const Vector* vectors, int count);
     bool walk_spiral();
     bool walk_diamond();
     bool first_visit(Vector v);
-    bool improve_integer(Vector v, int first_sad);
 
     int rate_x(int x) const { return m_lambda * component_rate(x - m_pmv.x); }
     int rate_y(int y) const { return m_lambda * component_rate(y - m_pmv.y); }
-    bool passes_first_phase(int first_sad, int rate) const;
-    void set_limits(int rate, int* limits) const;
-    bool accept(const int* sums, int rate, int first_threshold);
+    bool passes_first_phases(int first, int second, int rate) const {
+        return m_thresholds[0] > first + first_share(rate) &&
+               m_thresholds[1] > second + second_share(rate);
+    }
+    bool accept(int first_threshold, int second, const int* last, int rate);
     void set_planes(std::ptrdiff_t position);
     void record_fraction(_mv& result, Vector fraction) const;
 
@@ -174,8 +174,8 @@ private:
         }
     };
 
-    const std::uint8_t* sample(const PlaneSample& s) const {
-        return m_planes[s.plane] + s.y * m_stride + s.x;
+    const std::uint8_t* sample(const CEncoder::plane_offset_t& s) const {
+        return m_planes[s.plane] + s.offset;
     }
 
     CEncoder& m_encoder;
@@ -209,6 +209,16 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
     g_size_Y = (g_height16 + 2 * g_pad_luma) * g_stride_luma;
     g_size_U = (g_cheight + 2 * g_pad_chroma) * g_stride_chroma;
     g_visit_dim = 8 * range;
+    const auto offset = [this](const PlaneSample& s) {
+        return plane_offset_t{s.plane, s.y * g_stride_luma + s.x};
+    };
+    for (int n = 0; n < 8; ++n) {
+        g_half_samples[n] = offset(kHalfCandidates[n].sample);
+        for (int kind = 0; kind < 4; ++kind) {
+            g_quarter_samples[kind][n][0] = offset(kQuarterSamples[kind][n][0]);
+            g_quarter_samples[kind][n][1] = offset(kQuarterSamples[kind][n][1]);
+        }
+    }
 }
 
 // Prepares the reference for the macroblocks of a P picture.
@@ -300,21 +310,28 @@ void MotionSearch::search_integer_vectors() {
                               std::clamp((m_encoder.g_pmv_y + 2) >> 2, -range, range)};
     const Range window_x = vector_range(m_px, m_encoder.g_width16, predictor.x, range);
     const Range window_y = vector_range(m_py, m_encoder.g_height16, predictor.y, range);
-    const auto try_inside = [&](Vector v) {
-        return window_x.between(v.x) && window_y.between(v.y) && try_vector(v);
+    Vector group[kGroup];
+    int count = 0;
+    const auto add = [&](Vector v) {
+        if (window_x.between(v.x) && window_y.between(v.y)) {
+            group[count++] = v;
+        }
     };
-
-    if (try_inside({0, 0}) ||
-        try_inside(
-            {median<int>(top.x, left.x, top_right.x), median<int>(top.y, left.y, top_right.y)}) ||
-        try_inside(predictor)) {
+    add({0, 0});
+    add({median<int>(top.x, left.x, top_right.x), median<int>(top.y, left.y, top_right.y)});
+    add(predictor);
+    if (try_vectors(group, count)) {
         return;
     }
     const auto norm = [](const _mv& v) { return std::abs(v.x) + std::abs(v.y); };
-    if (std::max({norm(top), norm(left), norm(top_right)}) > 3 &&
-        (try_inside({top.x, top.y}) || try_inside({left.x, left.y}) ||
-         try_inside({top_right.x, top_right.y}))) {
-        return;
+    if (std::max({norm(top), norm(left), norm(top_right)}) > 3) {
+        count = 0;
+        add({top.x, top.y});
+        add({left.x, left.y});
+        add({top_right.x, top_right.y});
+        if (try_vectors(group, count)) {
+            return;
+        }
     }
 
     int spiral_sad = 0;
@@ -384,14 +401,8 @@ bool MotionSearch::first_visit(Vector v) {
     return first;
 }
 
-// Evaluates a vector unless this search has already done so. Returns true at an early end.
-bool MotionSearch::try_vector(Vector v) {
-    return first_visit(v) &&
-           improve_integer(
-               v, m_kernels.sad_first_phase(m_phases, m_ref + v.y * m_stride + v.x, m_stride));
-}
-
-// The same for up to kGroup different vectors in order.
+// Evaluates up to kGroup vectors in order, without those that this search has already evaluated.
+// Returns true at an early end.
 bool MotionSearch::try_vectors(const Vector* vectors, int count) {
     Vector fresh[kGroup];
     const std::uint8_t* refs[kGroup];
@@ -405,57 +416,53 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
     if (n == 0) {
         return false;
     }
-    std::fill(refs + n, refs + kGroup, refs[0]);
-    int first_sads[kGroup];
-    m_kernels.sad_first_phase_x4(m_phases, refs, m_stride, first_sads);
+    int first[kGroup], second[kGroup];
+    if (n == 1) {
+        int sums[2];
+        m_kernels.sad_first_phases(m_phases, refs[0], m_stride, sums);
+        first[0] = sums[0];
+        second[0] = sums[1];
+    } else {
+        std::fill(refs + n, refs + kGroup, refs[0]);
+        m_kernels.sad_first_phases_x4(m_phases, refs, m_stride, first, second);
+    }
     for (int i = 0; i < n; ++i) {
-        if (improve_integer(fresh[i], first_sads[i])) {
-            return true;
+        const int rate = rate_x(4 * fresh[i].x) + rate_y(4 * fresh[i].y);
+        if (!passes_first_phases(first[i], second[i], rate)) {
+            continue;
+        }
+        int last[2];
+        m_kernels.sad_last_phases(m_phases, refs[i], m_stride, last);
+        if (accept(2 * (first[i] + first_share(rate)), second[i], last, rate)) {
+            m_best = fresh[i];
+            if (m_best_sad < kGoodSad) {
+                return true;
+            }
         }
     }
     return false;
-}
-
-// Completes a candidate of the integer stage. Returns true at an early end.
-bool MotionSearch::improve_integer(Vector v, int first_sad) {
-    const int rate = rate_x(4 * v.x) + rate_y(4 * v.y);
-    if (!passes_first_phase(first_sad, rate)) {
-        return false;
-    }
-    int limits[3];
-    set_limits(rate, limits);
-    int sums[4] = {first_sad};
-    if (!m_kernels.sad_later_phases(m_phases, m_ref + v.y * m_stride + v.x, m_stride, limits,
-                                    sums) ||
-        !accept(sums, rate, 2 * (first_sad + first_share(rate)))) {
-        return false;
-    }
-    m_best = v;
-    return m_best_sad < kGoodSad;
 }
 
 // Half-pel step around the integer result.
 void MotionSearch::half_stage(_mv& result) {
     set_planes(m_best.y * m_stride + m_best.x);
     const FractionRates rates(*this, 4 * m_best.x, 4 * m_best.y, 2);
-    for (int first = 0; first < 8; first += kGroup) {
+    for (int start = 0; start < 8; start += kGroup) {
         const std::uint8_t* refs[kGroup];
-        int first_sads[kGroup];
+        int first[kGroup], second[kGroup];
         for (int i = 0; i < kGroup; ++i) {
-            refs[i] = sample(kHalfCandidates[first + i].sample);
+            refs[i] = sample(m_encoder.g_half_samples[start + i]);
         }
-        m_kernels.sad_first_phase_x4(m_phases, refs, m_stride, first_sads);
+        m_kernels.sad_first_phases_x4(m_phases, refs, m_stride, first, second);
         for (int i = 0; i < kGroup; ++i) {
-            const Vector direction = kHalfCandidates[first + i].direction;
+            const Vector direction = kHalfCandidates[start + i].direction;
             const int rate = rates.of(direction);
-            if (!passes_first_phase(first_sads[i], rate)) {
+            if (!passes_first_phases(first[i], second[i], rate)) {
                 continue;
             }
-            int limits[3];
-            set_limits(rate, limits);
-            int sums[4] = {first_sads[i]};
-            if (m_kernels.sad_later_phases(m_phases, refs[i], m_stride, limits, sums) &&
-                accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
+            int last[2];
+            m_kernels.sad_last_phases(m_phases, refs[i], m_stride, last);
+            if (accept(2 * (first[i] + first_share(rate)), second[i], last, rate)) {
                 record_fraction(result, {2 * direction.x, 2 * direction.y});
                 if (m_best_sad < kGoodSad) {
                     return;
@@ -474,26 +481,24 @@ void MotionSearch::quarter_stage(_mv& result) {
     }
     set_planes((m_best.y - (half.y < 0 ? 1 : 0)) * m_stride + m_best.x - (half.x < 0 ? 1 : 0));
     const FractionRates rates(*this, 4 * m_best.x + half.x, 4 * m_best.y + half.y, 1);
-    for (int first = 0; first < 8; first += kGroup) {
+    for (int start = 0; start < 8; start += kGroup) {
         const std::uint8_t* a[kGroup];
         const std::uint8_t* b[kGroup];
-        int first_sads[kGroup];
+        int first[kGroup], second[kGroup];
         for (int i = 0; i < kGroup; ++i) {
-            a[i] = sample(kQuarterSamples[kind][first + i][0]);
-            b[i] = sample(kQuarterSamples[kind][first + i][1]);
+            a[i] = sample(m_encoder.g_quarter_samples[kind][start + i][0]);
+            b[i] = sample(m_encoder.g_quarter_samples[kind][start + i][1]);
         }
-        m_kernels.sad_first_phase_average_x4(m_phases, a, b, m_stride, first_sads);
+        m_kernels.sad_first_phases_average_x4(m_phases, a, b, m_stride, first, second);
         for (int i = 0; i < kGroup; ++i) {
-            const Vector direction = kQuarterCandidates[first + i];
+            const Vector direction = kQuarterCandidates[start + i];
             const int rate = rates.of(direction);
-            if (!passes_first_phase(first_sads[i], rate)) {
+            if (!passes_first_phases(first[i], second[i], rate)) {
                 continue;
             }
-            int limits[3];
-            set_limits(rate, limits);
-            int sums[4] = {first_sads[i]};
-            if (m_kernels.sad_later_phases_average(m_phases, a[i], b[i], m_stride, limits, sums) &&
-                accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
+            int last[2];
+            m_kernels.sad_last_phases_average(m_phases, a[i], b[i], m_stride, last);
+            if (accept((5 * (first[i] + first_share(rate))) >> 2, second[i], last, rate)) {
                 record_fraction(result, {half.x + direction.x, half.y + direction.y});
                 if (m_best_sad < kGoodSad) {
                     return;
@@ -519,29 +524,20 @@ void MotionSearch::set_planes(std::ptrdiff_t position) {
     m_planes[kCentre] = m_encoder.g_half_hv_L0 + position;
 }
 
-// Whether a candidate is still in the race after a quarter of its samples.
-bool MotionSearch::passes_first_phase(int first_sad, int rate) const {
-    return m_thresholds[0] > first_sad + first_share(rate);
-}
-
-// SADs at which a candidate is out of the race after phases 1 and 2.
-void MotionSearch::set_limits(int rate, int* limits) const {
-    limits[1] = m_thresholds[1] - second_share(rate);
-    limits[2] = m_thresholds[2] - third_share(rate);
-}
-
-// Makes a candidate the best one if its cost is the lowest; first_threshold is the threshold that
-// it then sets for the first phase.
-bool MotionSearch::accept(const int* sums, int rate, int first_threshold) {
-    const int cost = sums[3] + rate;
-    if (cost >= m_best_cost) {
+// Makes a candidate that has passed its first phases the best one if it passes the third and its
+// cost is the lowest. second: SAD of phases 0 and 1; last: of phase 2 and of phases 2 and 3;
+// first_threshold: the threshold that it then sets for phase 0.
+bool MotionSearch::accept(int first_threshold, int second, const int* last, int rate) {
+    const int third_cost = second + last[0] + third_share(rate);
+    const int sad = second + last[1];
+    if (m_thresholds[2] <= third_cost || sad + rate >= m_best_cost) {
         return false;
     }
     m_thresholds[0] = first_threshold;
-    m_thresholds[1] = sums[1] + second_share(rate);
-    m_thresholds[2] = sums[2] + third_share(rate);
-    m_best_sad = sums[3];
-    m_best_cost = cost;
+    m_thresholds[1] = second + second_share(rate);
+    m_thresholds[2] = third_cost;
+    m_best_sad = sad;
+    m_best_cost = sad + rate;
     return true;
 }
 

@@ -132,23 +132,6 @@ struct References {
     }
 };
 
-void run_later_phases(const Kernels& k, Arena& a, Random random, bool average) {
-    split_current(a, random);
-    const References refs(a, random);
-    int limits[3];
-    for (int p = 0; p < 3; ++p) {
-        limits[p] = random.between(0, 3) ? 0xffffff : random.between(-40, 70 * 64 * (p + 1));
-    }
-    int* sums = a.out();
-    sums[0] = random.between(0, 64 * 255);
-    a.result = average ? k.sad_later_phases_average(a.pred(), refs.a[0], refs.b[0], refs.stride,
-                                                    limits, sums)
-                       : k.sad_later_phases(a.pred(), refs.a[0], refs.stride, limits, sums);
-    // After an early end the sums that follow are anything.
-    const int last = sums[1] >= limits[1] ? 1 : sums[2] >= limits[2] ? 2 : 3;
-    std::fill(sums + last + 1, sums + 4, 0);
-}
-
 void run_quantize(const Kernels& k, Arena& a, Random random) {
     const int qp = random.between(0, 51);
     const zolt::Quantizer& q =
@@ -196,28 +179,36 @@ constexpr Case kCases[] = {
          const Place src(a.plane[0], random, 16);
          k.split_phases(src.p, src.stride, a.pred());
      }},
-    {"sad_first_phase",
+    {"sad_first_phases",
      [](const Kernels& k, Arena& a, Random random) {
          split_current(a, random);
          const References refs(a, random);
-         a.out()[0] = k.sad_first_phase(a.pred(), refs.a[0], refs.stride);
+         k.sad_first_phases(a.pred(), refs.a[0], refs.stride, a.out());
      }},
-    {"sad_first_phase_x4",
+    {"sad_first_phases_x4",
      [](const Kernels& k, Arena& a, Random random) {
          split_current(a, random);
          const References refs(a, random);
-         k.sad_first_phase_x4(a.pred(), refs.a, refs.stride, a.out());
+         k.sad_first_phases_x4(a.pred(), refs.a, refs.stride, a.out(), a.out() + 4);
      }},
-    {"sad_first_phase_average_x4",
+    {"sad_first_phases_average_x4",
      [](const Kernels& k, Arena& a, Random random) {
          split_current(a, random);
          const References refs(a, random);
-         k.sad_first_phase_average_x4(a.pred(), refs.a, refs.b, refs.stride, a.out());
+         k.sad_first_phases_average_x4(a.pred(), refs.a, refs.b, refs.stride, a.out(), a.out() + 4);
      }},
-    {"sad_later_phases",
-     [](const Kernels& k, Arena& a, Random random) { run_later_phases(k, a, random, false); }},
-    {"sad_later_phases_average",
-     [](const Kernels& k, Arena& a, Random random) { run_later_phases(k, a, random, true); }},
+    {"sad_last_phases",
+     [](const Kernels& k, Arena& a, Random random) {
+         split_current(a, random);
+         const References refs(a, random);
+         k.sad_last_phases(a.pred(), refs.a[0], refs.stride, a.out());
+     }},
+    {"sad_last_phases_average",
+     [](const Kernels& k, Arena& a, Random random) {
+         split_current(a, random);
+         const References refs(a, random);
+         k.sad_last_phases_average(a.pred(), refs.a[0], refs.b[0], refs.stride, a.out());
+     }},
     {"extend_edges",
      [](const Kernels& k, Arena& a, Random random) {
          const bool luma = random.between(0, 1);

@@ -39,24 +39,23 @@ struct Kernels {
     // 3 even rows and odd columns. A sample of another column parity is stored as 0.
     void (*split_phases)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* phases);
 
-    // SAD of phase 0 between the block that split_phases was given and the block at ref; the same
-    // for four blocks, and for four rounded averages (a + b + 1) >> 1 of two blocks each.
-    int (*sad_first_phase)(const std::uint8_t* phases, const std::uint8_t* ref,
-                           std::ptrdiff_t stride);
-    void (*sad_first_phase_x4)(const std::uint8_t* phases, const std::uint8_t* const* refs,
-                               std::ptrdiff_t stride, int* sads);
-    void (*sad_first_phase_average_x4)(const std::uint8_t* phases, const std::uint8_t* const* a,
-                                       const std::uint8_t* const* b, std::ptrdiff_t stride,
-                                       int* sads);
+    // SADs between the block that split_phases was given and the block at ref: sums[0] of phase 0,
+    // sums[1] of phases 0 and 1. The x4 forms do this for four blocks, and for four rounded
+    // averages (a + b + 1) >> 1 of two blocks each: first[n] and second[n] are sums[0] and sums[1]
+    // of block n.
+    void (*sad_first_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
+                             std::ptrdiff_t stride, int* sums);
+    void (*sad_first_phases_x4)(const std::uint8_t* phases, const std::uint8_t* const* refs,
+                                std::ptrdiff_t stride, int* first, int* second);
+    void (*sad_first_phases_average_x4)(const std::uint8_t* phases, const std::uint8_t* const* a,
+                                        const std::uint8_t* const* b, std::ptrdiff_t stride,
+                                        int* first, int* second);
 
-    // Continues from sums[0], the SAD of phase 0: sums[p] = the SAD of phases 0..p, sums[3] that of
-    // the whole block. Returns false when sums[1] >= limits[1] or sums[2] >= limits[2]; sums[1..3]
-    // are then not defined.
-    bool (*sad_later_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
-                             std::ptrdiff_t stride, const int* limits, int* sums);
-    bool (*sad_later_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
-                                     const std::uint8_t* b, std::ptrdiff_t stride,
-                                     const int* limits, int* sums);
+    // The other two: sums[0] of phase 2, sums[1] of phases 2 and 3.
+    void (*sad_last_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
+                            std::ptrdiff_t stride, int* sums);
+    void (*sad_last_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
+                                    const std::uint8_t* b, std::ptrdiff_t stride, int* sums);
 
     // ---- Reference planes ----
 

@@ -58,55 +58,53 @@ __m256i odd_columns() {
     return _mm256_set1_epi16(static_cast<short>(0xff00));
 }
 
-// SAD of one phase in four parts, two of its rows at a time.
+// SADs of phases p and p + 1 (p 0 or 2), two rows at a time, in four parts: those of phase p in the
+// even elements, those of phase p + 1 in the odd ones.
 template <typename TwoRows>
-__m256i phase_sad_parts(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
-    __m256i sum = _mm256_setzero_si256();
-    for (int row = 0; row < 8; row += 2) {
-        const __m256i samples = _mm256_and_si256(two_rows(2 * row + first_row), columns);
-        sum = _mm256_add_epi32(sum, _mm256_sad_epu8(samples, load_aligned(phase + 16 * row)));
+[[gnu::always_inline]] inline __m256i two_phase_parts(const uint8_t* phases, int p,
+                                                      TwoRows two_rows) {
+    const __m256i columns[2] = {even_columns(), odd_columns()};
+    __m256i sad[2];
+    for (int n = 0; n < 2; ++n) {
+        const int first_row = p == 0 ? n : 1 - n;
+        sad[n] = _mm256_setzero_si256();
+        for (int row = 0; row < 8; row += 2) {
+            const __m256i samples = _mm256_and_si256(two_rows(2 * row + first_row), columns[n]);
+            sad[n] = _mm256_add_epi32(
+                sad[n], _mm256_sad_epu8(samples, load_aligned(phases + 128 * (p + n) + 16 * row)));
+        }
     }
-    return sum;
+    return _mm256_or_si256(sad[0], _mm256_slli_epi64(sad[1], 32));
 }
 
 template <typename TwoRows>
-int phase_sad(const uint8_t* phase, int first_row, __m256i columns, TwoRows two_rows) {
-    const __m256i parts = phase_sad_parts(phase, first_row, columns, two_rows);
+[[gnu::always_inline]] inline void two_phases(const uint8_t* phases, int p, TwoRows two_rows,
+                                              int* sums) {
+    const __m256i parts = two_phase_parts(phases, p, two_rows);
     const __m128i lanes = _mm_add_epi32(low_lane(parts), high_lane(parts));
-    return _mm_cvtsi128_si32(_mm_add_epi32(lanes, _mm_srli_si128(lanes, 8)));
+    const __m128i sads = _mm_add_epi32(lanes, _mm_srli_si128(lanes, 8));
+    sums[0] = _mm_cvtsi128_si32(sads);
+    sums[1] = sums[0] + _mm_extract_epi32(sads, 1);
 }
 
-// SADs of the first phase of four blocks; two_rows(n) is the row source of block n.
+// The first two phases of four blocks; two_rows_of(n) is the row source of block n.
 template <typename TwoRowsOf>
-void first_phase_x4(const uint8_t* phases, int* sads, TwoRowsOf two_rows_of) {
-    __m256i parts[4];
-    for (int n = 0; n < 4; ++n) {
-        parts[n] = phase_sad_parts(phases, 0, even_columns(), two_rows_of(n));
+[[gnu::always_inline]] inline void first_phases_x4(const uint8_t* phases, int* first, int* second,
+                                                   TwoRowsOf two_rows_of) {
+    __m128i sads[2];  // phases 0 and 1 of two blocks each
+    for (int n = 0; n < 2; ++n) {
+        const __m256i a = two_phase_parts(phases, 0, two_rows_of(2 * n));
+        const __m256i b = two_phase_parts(phases, 0, two_rows_of(2 * n + 1));
+        const __m256i sums =
+            _mm256_add_epi32(_mm256_unpacklo_epi64(a, b), _mm256_unpackhi_epi64(a, b));
+        sads[n] = _mm_add_epi32(low_lane(sums), high_lane(sums));
     }
-    // The parts fill the even 32-bit elements only.
-    const __m256i first = _mm256_or_si256(parts[0], _mm256_slli_epi64(parts[1], 32));
-    const __m256i second = _mm256_or_si256(parts[2], _mm256_slli_epi64(parts[3], 32));
-    const __m256i sums = _mm256_add_epi32(_mm256_unpacklo_epi64(first, second),
-                                          _mm256_unpackhi_epi64(first, second));
-    store_16(sads, _mm_add_epi32(low_lane(sums), high_lane(sums)));
-}
-
-// All three remaining phases, whether the limits are reached or not: telling that after each of
-// them would take longer.
-template <typename TwoRows>
-bool later_phases(const uint8_t* phases, const int* limits, int* sums, TwoRows two_rows) {
-    const __m256i second = phase_sad_parts(phases + 128, 1, odd_columns(), two_rows);
-    const __m256i third = phase_sad_parts(phases + 256, 1, even_columns(), two_rows);
-    const __m256i fourth = phase_sad_parts(phases + 384, 0, odd_columns(), two_rows);
-    // The parts fill the even 32-bit elements only.
-    const __m256i pair = _mm256_or_si256(second, _mm256_slli_epi64(third, 32));
-    const __m256i parts =
-        _mm256_add_epi32(_mm256_unpacklo_epi64(pair, fourth), _mm256_unpackhi_epi64(pair, fourth));
-    const __m128i sads = _mm_add_epi32(low_lane(parts), high_lane(parts));
-    sums[1] = sums[0] + _mm_cvtsi128_si32(sads);
-    sums[2] = sums[1] + _mm_extract_epi32(sads, 1);
-    sums[3] = sums[2] + _mm_extract_epi32(sads, 2);
-    return sums[1] < limits[1] && sums[2] < limits[2];
+    const __m128i even = _mm_castps_si128(_mm_shuffle_ps(
+        _mm_castsi128_ps(sads[0]), _mm_castsi128_ps(sads[1]), _MM_SHUFFLE(2, 0, 2, 0)));
+    const __m128i odd = _mm_castps_si128(_mm_shuffle_ps(
+        _mm_castsi128_ps(sads[0]), _mm_castsi128_ps(sads[1]), _MM_SHUFFLE(3, 1, 3, 1)));
+    store_16(first, even);
+    store_16(second, _mm_add_epi32(even, odd));
 }
 
 auto two_rows_at(const uint8_t* ref, ptrdiff_t stride) {
@@ -125,28 +123,29 @@ auto average_two_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
     };
 }
 
-int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
-    return phase_sad(phases, 0, even_columns(), two_rows_at(ref, stride));
+void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 0, two_rows_at(ref, stride), sums);
 }
 
-void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                        int* sads) {
-    first_phase_x4(phases, sads, [=](int n) { return two_rows_at(refs[n], stride); });
+void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                         int* first, int* second) {
+    first_phases_x4(phases, first, second, [=](int n) { return two_rows_at(refs[n], stride); });
 }
 
-void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
-    first_phase_x4(phases, sads, [=](int n) { return average_two_rows_at(a[n], b[n], stride); });
+void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
+                                 int* second) {
+    first_phases_x4(phases, first, second,
+                    [=](int n) { return average_two_rows_at(a[n], b[n], stride); });
 }
 
-bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
-                      const int* limits, int* sums) {
-    return later_phases(phases, limits, sums, two_rows_at(ref, stride));
+void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, two_rows_at(ref, stride), sums);
 }
 
-bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                              ptrdiff_t stride, const int* limits, int* sums) {
-    return later_phases(phases, limits, sums, average_two_rows_at(a, b, stride));
+void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                             ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, average_two_rows_at(a, b, stride), sums);
 }
 
 // ---- Reference planes ----
@@ -652,11 +651,11 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
 Kernels with_avx2(const Kernels& base) {
     Kernels k = base;
     k.name = "avx2";
-    k.sad_first_phase = sad_first_phase;
-    k.sad_first_phase_x4 = sad_first_phase_x4;
-    k.sad_first_phase_average_x4 = sad_first_phase_average_x4;
-    k.sad_later_phases = sad_later_phases;
-    k.sad_later_phases_average = sad_later_phases_average;
+    k.sad_first_phases = sad_first_phases;
+    k.sad_first_phases_x4 = sad_first_phases_x4;
+    k.sad_first_phases_average_x4 = sad_first_phases_average_x4;
+    k.sad_last_phases = sad_last_phases;
+    k.sad_last_phases_average = sad_last_phases_average;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;

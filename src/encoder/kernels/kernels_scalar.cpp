@@ -37,65 +37,60 @@ void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
     }
 }
 
-// SAD of one phase; sample(offset) is the sample to compare with.
+// SAD of phase p, and of phases p and p + 1; sample(y, x) is the sample to compare with.
 template <typename Sample>
-int phase_sad(const uint8_t* phases, int p, ptrdiff_t stride, Sample sample) {
+void two_phases(const uint8_t* phases, int p, Sample sample, int* sums) {
     int sum = 0;
-    for (int row = 0; row < 8; ++row) {
-        for (int x = kPhaseColumn[p]; x < 16; x += 2) {
-            sum += std::abs(phases[128 * p + 16 * row + x] -
-                            sample((2 * row + kPhaseRow[p]) * stride + x));
+    for (int n = 0; n < 2; ++n, ++p) {
+        for (int row = 0; row < 8; ++row) {
+            for (int x = kPhaseColumn[p]; x < 16; x += 2) {
+                sum += std::abs(phases[128 * p + 16 * row + x] - sample(2 * row + kPhaseRow[p], x));
+            }
         }
+        sums[n] = sum;
     }
-    return sum;
 }
 
-template <typename Sample>
-bool later_phases(const uint8_t* phases, ptrdiff_t stride, const int* limits, int* sums,
-                  Sample sample) {
-    for (int p = 1; p < 4; ++p) {
-        sums[p] = sums[p - 1] + phase_sad(phases, p, stride, sample);
-        if (p < 3 && sums[p] >= limits[p]) {
-            return false;
-        }
-    }
-    return true;
+auto samples_at(const uint8_t* ref, ptrdiff_t stride) {
+    return [=](int y, int x) { return int{ref[y * stride + x]}; };
 }
 
-auto samples_at(const uint8_t* ref) {
-    return [ref](ptrdiff_t i) { return int{ref[i]}; };
+auto averages_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
+    return [=](int y, int x) { return (a[y * stride + x] + b[y * stride + x] + 1) >> 1; };
 }
 
-auto averages_at(const uint8_t* a, const uint8_t* b) {
-    return [a, b](ptrdiff_t i) { return (a[i] + b[i] + 1) >> 1; };
+void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 0, samples_at(ref, stride), sums);
 }
 
-int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
-    return phase_sad(phases, 0, stride, samples_at(ref));
-}
-
-void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                        int* sads) {
+void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                         int* first, int* second) {
     for (int n = 0; n < 4; ++n) {
-        sads[n] = phase_sad(phases, 0, stride, samples_at(refs[n]));
+        int sums[2];
+        two_phases(phases, 0, samples_at(refs[n], stride), sums);
+        first[n] = sums[0];
+        second[n] = sums[1];
     }
 }
 
-void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
+void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
+                                 int* second) {
     for (int n = 0; n < 4; ++n) {
-        sads[n] = phase_sad(phases, 0, stride, averages_at(a[n], b[n]));
+        int sums[2];
+        two_phases(phases, 0, averages_at(a[n], b[n], stride), sums);
+        first[n] = sums[0];
+        second[n] = sums[1];
     }
 }
 
-bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
-                      const int* limits, int* sums) {
-    return later_phases(phases, stride, limits, sums, samples_at(ref));
+void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, samples_at(ref, stride), sums);
 }
 
-bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                              ptrdiff_t stride, const int* limits, int* sums) {
-    return later_phases(phases, stride, limits, sums, averages_at(a, b));
+void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                             ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, averages_at(a, b, stride), sums);
 }
 
 // ---- Reference planes ----
@@ -537,11 +532,11 @@ const Kernels& scalar_kernels() {
     static const Kernels table = {
         "scalar",
         split_phases,
-        sad_first_phase,
-        sad_first_phase_x4,
-        sad_first_phase_average_x4,
-        sad_later_phases,
-        sad_later_phases_average,
+        sad_first_phases,
+        sad_first_phases_x4,
+        sad_first_phases_average_x4,
+        sad_last_phases,
+        sad_last_phases_average,
         extend_edges,
         half_vertical_row,
         half_horizontal_row,

@@ -77,29 +77,23 @@ void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
     }
 }
 
-// SAD of one phase; sample_row(y) gives 16 samples of row y of the block compared with.
+// SAD of phase p, and of phases p and p + 1 (p 0 or 2); sample_row(y) gives 16 samples of row y.
 template <typename SampleRow>
-int phase_sad(const uint8_t* phase, int first_row, __m128i columns, SampleRow sample_row) {
-    __m128i sum = _mm_setzero_si128();
-    for (int row = 0; row < 8; ++row) {
-        const __m128i samples = _mm_and_si128(sample_row(2 * row + first_row), columns);
-        sum = _mm_add_epi32(sum, _mm_sad_epu8(samples, load_aligned(phase + 16 * row)));
+void two_phases(const uint8_t* phases, int p, SampleRow sample_row, int* sums) {
+    const __m128i columns[2] = {even_columns(), odd_columns()};
+    __m128i sad[2];
+    for (int n = 0; n < 2; ++n) {
+        const int first_row = p == 0 ? n : 1 - n;
+        sad[n] = _mm_setzero_si128();
+        for (int row = 0; row < 8; ++row) {
+            const __m128i samples = _mm_and_si128(sample_row(2 * row + first_row), columns[n]);
+            sad[n] = _mm_add_epi32(
+                sad[n], _mm_sad_epu8(samples, load_aligned(phases + 128 * (p + n) + 16 * row)));
+        }
+        sad[n] = _mm_add_epi32(sad[n], _mm_srli_si128(sad[n], 8));
     }
-    return _mm_cvtsi128_si32(_mm_add_epi32(sum, _mm_srli_si128(sum, 8)));
-}
-
-template <typename SampleRow>
-bool later_phases(const uint8_t* phases, const int* limits, int* sums, SampleRow sample_row) {
-    sums[1] = sums[0] + phase_sad(phases + 128, 1, odd_columns(), sample_row);
-    if (sums[1] >= limits[1]) {
-        return false;
-    }
-    sums[2] = sums[1] + phase_sad(phases + 256, 1, even_columns(), sample_row);
-    if (sums[2] >= limits[2]) {
-        return false;
-    }
-    sums[3] = sums[2] + phase_sad(phases + 384, 0, odd_columns(), sample_row);
-    return true;
+    sums[0] = _mm_cvtsi128_si32(sad[0]);
+    sums[1] = sums[0] + _mm_cvtsi128_si32(sad[1]);
 }
 
 auto rows_at(const uint8_t* ref, ptrdiff_t stride) {
@@ -110,32 +104,38 @@ auto average_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
     return [=](int y) { return _mm_avg_epu8(load(a + y * stride), load(b + y * stride)); };
 }
 
-int sad_first_phase(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride) {
-    return phase_sad(phases, 0, even_columns(), rows_at(ref, stride));
+void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 0, rows_at(ref, stride), sums);
 }
 
-void sad_first_phase_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                        int* sads) {
+void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
+                         int* first, int* second) {
     for (int n = 0; n < 4; ++n) {
-        sads[n] = phase_sad(phases, 0, even_columns(), rows_at(refs[n], stride));
+        int sums[2];
+        two_phases(phases, 0, rows_at(refs[n], stride), sums);
+        first[n] = sums[0];
+        second[n] = sums[1];
     }
 }
 
-void sad_first_phase_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                const uint8_t* const* b, ptrdiff_t stride, int* sads) {
+void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
+                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
+                                 int* second) {
     for (int n = 0; n < 4; ++n) {
-        sads[n] = phase_sad(phases, 0, even_columns(), average_rows_at(a[n], b[n], stride));
+        int sums[2];
+        two_phases(phases, 0, average_rows_at(a[n], b[n], stride), sums);
+        first[n] = sums[0];
+        second[n] = sums[1];
     }
 }
 
-bool sad_later_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride,
-                      const int* limits, int* sums) {
-    return later_phases(phases, limits, sums, rows_at(ref, stride));
+void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, rows_at(ref, stride), sums);
 }
 
-bool sad_later_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                              ptrdiff_t stride, const int* limits, int* sums) {
-    return later_phases(phases, limits, sums, average_rows_at(a, b, stride));
+void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
+                             ptrdiff_t stride, int* sums) {
+    two_phases(phases, 2, average_rows_at(a, b, stride), sums);
 }
 
 // ---- Reference planes ----
@@ -779,11 +779,11 @@ Kernels with_sse2(const Kernels& base) {
     Kernels k = base;
     k.name = "sse2";
     k.split_phases = split_phases;
-    k.sad_first_phase = sad_first_phase;
-    k.sad_first_phase_x4 = sad_first_phase_x4;
-    k.sad_first_phase_average_x4 = sad_first_phase_average_x4;
-    k.sad_later_phases = sad_later_phases;
-    k.sad_later_phases_average = sad_later_phases_average;
+    k.sad_first_phases = sad_first_phases;
+    k.sad_first_phases_x4 = sad_first_phases_x4;
+    k.sad_first_phases_average_x4 = sad_first_phases_average_x4;
+    k.sad_last_phases = sad_last_phases;
+    k.sad_last_phases_average = sad_last_phases_average;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;
