@@ -37,7 +37,7 @@ std::string HostServices::last_error() {
     const auto get_err_mgr = reinterpret_cast<IErrMgr* (*)()>(dlsym(library.get(), "GetErrMgr"));
     const auto delete_err_mgr = reinterpret_cast<void (*)()>(dlsym(library.get(), "DeleteErrMgr"));
     const IErrData* const error = get_err_mgr()->GetError();
-    const std::string message = error == nullptr ? "" : error->Message();
+    std::string message = error == nullptr ? "" : error->Message();
     delete_err_mgr();
     return message;
 }

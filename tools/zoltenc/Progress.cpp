@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 #include <string>
 
@@ -13,7 +14,7 @@ constexpr std::chrono::milliseconds kDrawInterval(250);
 
 // "1:05" or "1:02:05".
 std::string clock_text(double seconds) {
-    const auto whole = static_cast<long long>(seconds + 0.5);
+    const auto whole = std::llround(seconds);
     char text[32];
     if (whole < 3600) {
         std::snprintf(text, sizeof text, "%lld:%02lld", whole / 60, whole % 60);
