@@ -317,7 +317,11 @@ void MotionSearch::search_integer_vectors() {
             group[count++] = v;
         }
     };
-    add({0, 0});
+    add({0, 0});  // alone, since it often ends the search
+    if (try_vectors(group, count)) {
+        return;
+    }
+    count = 0;
     add({median<int>(top.x, left.x, top_right.x), median<int>(top.y, left.y, top_right.y)});
     add(predictor);
     if (try_vectors(group, count)) {
