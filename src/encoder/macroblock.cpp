@@ -10,8 +10,9 @@ namespace {
 // Writes value to the 4x4 entries at p of a map with `stride` entries per row.
 template <typename T>
 void fill_blocks(T* p, std::ptrdiff_t stride, T value) {
+    const T row_values[4] = {value, value, value, value};
     for (int row = 0; row < 4; ++row) {
-        std::fill(p + row * stride, p + row * stride + 4, value);
+        std::memcpy(p + row * stride, row_values, sizeof row_values);
     }
 }
 
