@@ -84,9 +84,8 @@ TEST(BitStreamReader, ReadsEveryWidthAtEveryPosition) {
         return value;
     };
     const auto extended = [](std::uint64_t value, int n) {
-        return n < 64 && value >> (n - 1) != 0
-                   ? static_cast<std::int64_t>(value) - (std::int64_t{1} << n)
-                   : static_cast<std::int64_t>(value);
+        const bool is_negative = n < 64 && value >> (n - 1) != 0;
+        return static_cast<std::int64_t>(is_negative ? value - (std::uint64_t{1} << n) : value);
     };
 
     BitStreamReader reader = reader_of(bytes);
