@@ -61,6 +61,8 @@ constexpr Kind kKinds[] = {
      }},
     {"pan", [](int plane, int x, int y,
                int n) { return texture(16 * (x + 40 * n), 16 * (y + 3 * n), plane); }},
+    {"drop", [](int plane, int x, int y,
+                int n) { return texture(16 * (x + 3 * n), 16 * (y + 40 * n), plane); }},
     {"checker",
      [](int plane, int x, int y, int n) {
          const bool fine = (y / 16 + n / 3) % 2 == 0;

@@ -24,9 +24,9 @@ struct Sequence {
 };
 
 // Kinds of generated sequences: "gradient" (moving), "zoom" (into a texture), "noise", "still",
-// "cut" (every fifth picture), "flat", "fade" (to black and back), "pan" (40 pels a picture),
-// "checker" (samples and blocks of 0 and 255 that change places). They are made with integers only,
-// so that they are the same on every platform.
+// "cut" (every fifth picture), "flat", "fade" (to black and back), "pan" and "drop" (40 pels a
+// picture sideways and down), "checker" (samples and blocks of 0 and 255 that change places). They
+// are made with integers only, so that they are the same on every platform.
 const std::vector<std::string>& generated_kinds();
 Sequence generated(const std::string& kind, int width, int height, int pictures);
 

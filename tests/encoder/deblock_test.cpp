@@ -131,15 +131,15 @@ private:
         }
         const int tc0 = index_a < 0 ? 0 : kTc0[bs - 1][index_a];
         const int tc = plane == 0 ? tc0 + ap + aq : tc0 + 1;
-        const int delta = std::clamp((((q[0] - p[0]) << 2) + (p[1] - q[1]) + 4) >> 3, -tc, tc);
+        const int delta = std::clamp(((q[0] - p[0]) * 4 + (p[1] - q[1]) + 4) >> 3, -tc, tc);
         sample(-1) = std::clamp(p[0] + delta, 0, 255);
         sample(0) = std::clamp(q[0] - delta, 0, 255);
         const int middle = (p[0] + q[0] + 1) >> 1;
         if (ap) {
-            sample(-2) = p[1] + std::clamp((p[2] + middle - (p[1] << 1)) >> 1, -tc0, tc0);
+            sample(-2) = p[1] + std::clamp((p[2] + middle - 2 * p[1]) >> 1, -tc0, tc0);
         }
         if (aq) {
-            sample(1) = q[1] + std::clamp((q[2] + middle - (q[1] << 1)) >> 1, -tc0, tc0);
+            sample(1) = q[1] + std::clamp((q[2] + middle - 2 * q[1]) >> 1, -tc0, tc0);
         }
     }
 

@@ -18,7 +18,9 @@ std::atomic<long> allocations{0};
 #ifdef ZOLT_SANITIZED
 
 // The sanitizers own malloc, under operator new too; they tell of every call.
-#include <sanitizer/allocator_interface.h>
+extern "C" int __sanitizer_install_malloc_and_free_hooks(void (*malloc_hook)(const volatile void*,
+                                                                             std::size_t),
+                                                         void (*free_hook)(const volatile void*));
 
 namespace {
 

@@ -78,10 +78,10 @@ constexpr Shape kShapes[] = {
     {"gradient", 48, 80, 12}, {"zoom", 48, 80, 12},  {"noise", 48, 80, 12},
     {"still", 48, 80, 12},    {"cut", 48, 80, 12},   {"flat", 48, 80, 12},
     {"fade", 48, 80, 24},     {"pan", 48, 80, 12},   {"checker", 48, 80, 12},
-    {"zoom", 16, 16, 12},     {"noise", 16, 16, 12}, {"pan", 16, 144, 12},
+    {"zoom", 16, 16, 12},     {"noise", 16, 16, 12}, {"drop", 16, 208, 12},
     {"checker", 16, 144, 12}, {"pan", 176, 16, 12},  {"noise", 176, 16, 12},
     {"pan", 176, 144, 9},     {"cut", 178, 146, 9},  {"gradient", 31, 47, 9},
-    {"zoom", 352, 288, 4},
+    {"drop", 48, 208, 12},    {"zoom", 352, 288, 4},
 };
 INSTANTIATE_TEST_SUITE_P(Shapes, GeneratedStream, testing::ValuesIn(kShapes),
                          [](const auto& test) { return shape_name(test.param); });
