@@ -443,7 +443,7 @@ public:
     // planes below, right, both) and offset in samples. Quarter pels are averages of two, by the
     // kind of the sample that they surround: integer, right, below, both.
     struct plane_offset_t {
-        int plane, offset;
+        std::ptrdiff_t plane, offset;
     };
     plane_offset_t g_half_samples[8];
     plane_offset_t g_quarter_samples[4][8][2];

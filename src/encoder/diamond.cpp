@@ -15,30 +15,33 @@ constexpr int kGoodSad = 512;
 constexpr int kMinSpiralSad = 2048;
 constexpr int kSpiralStep = 4;
 
-constexpr int kMaxRateIndex = 511;
+// Largest difference of two vector components in quarter pels that the rate table holds; vectors
+// stay below 64 integer pels.
+constexpr int kMaxDifference = 512;
 
 struct RateTable {
-    std::uint16_t bits[kMaxRateIndex + 1];
+    std::uint16_t bits[2 * kMaxDifference + 1];
 };
 
+// mv_rate: bits of the Exp-Golomb code (clause 9.1) of min(2 * |d|, 511) by d + kMaxDifference.
 constexpr RateTable make_mv_rate() {
     RateTable table{};
-    for (int k = 0; k <= kMaxRateIndex; ++k) {
+    for (int d = -kMaxDifference; d <= kMaxDifference; ++d) {
+        const int magnitude = d < 0 ? -d : d;
         int log2 = 0;
-        for (int x = k + 1; x > 1; x >>= 1) {
+        for (int x = (2 * magnitude < 511 ? 2 * magnitude : 511) + 1; x > 1; x >>= 1) {
             ++log2;
         }
-        table.bits[k] = static_cast<std::uint16_t>(2 * log2 + 1);
+        table.bits[d + kMaxDifference] = static_cast<std::uint16_t>(2 * log2 + 1);
     }
     return table;
 }
 
-// Bits of the Exp-Golomb code of k (clause 9.1).
 constexpr RateTable mv_rate = make_mv_rate();
 
 // Rate of one vector component that differs by d quarter pels from its prediction.
 int component_rate(int d) {
-    return mv_rate.bits[std::min(2 * std::abs(d), kMaxRateIndex)];
+    return mv_rate.bits[d + kMaxDifference];
 }
 
 template <typename T>
@@ -210,7 +213,7 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
     g_size_U = (g_cheight + 2 * g_pad_chroma) * g_stride_chroma;
     g_visit_dim = 8 * range;
     const auto offset = [this](const PlaneSample& s) {
-        return plane_offset_t{s.plane, s.y * g_stride_luma + s.x};
+        return plane_offset_t{s.plane, static_cast<std::ptrdiff_t>(s.y) * g_stride_luma + s.x};
     };
     for (int n = 0; n < 8; ++n) {
         g_half_samples[n] = offset(kHalfCandidates[n].sample);

@@ -526,6 +526,40 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
     }
 }
 
+// 4-point Hadamard transform across four vectors.
+void hadamard(__m128i* v) {
+    const __m128i a = _mm_add_epi32(v[0], v[1]);
+    const __m128i b = _mm_sub_epi32(v[0], v[1]);
+    const __m128i c = _mm_add_epi32(v[2], v[3]);
+    const __m128i d = _mm_sub_epi32(v[2], v[3]);
+    v[0] = _mm_add_epi32(a, c);
+    v[1] = _mm_add_epi32(b, d);
+    v[2] = _mm_sub_epi32(a, c);
+    v[3] = _mm_sub_epi32(b, d);
+}
+
+void hadamard_energy(const int32_t* values, int32_t* energy) {
+    __m128i v[4] = {load_16(values), load_16(values + 4), load_16(values + 8),
+                    load_16(values + 12)};
+    hadamard(v);
+    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]), b = _mm_unpackhi_epi32(v[0], v[1]);
+    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]), d = _mm_unpackhi_epi32(v[2], v[3]);
+    v[0] = _mm_unpacklo_epi64(a, c);
+    v[1] = _mm_unpackhi_epi64(a, c);
+    v[2] = _mm_unpacklo_epi64(b, d);
+    v[3] = _mm_unpackhi_epi64(b, d);
+    hadamard(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
+    for (__m128i& row : v) {
+        row = _mm_srli_epi32(_mm_add_epi32(_mm_abs_epi32(row), _mm_set1_epi32(8)), 4);
+    }
+    const __m128i others = _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]);
+    const __m128i low = _mm_unpacklo_epi32(v[0], others);   // lanes 0 of both, lanes 1 of both
+    const __m128i high = _mm_unpackhi_epi32(v[0], others);  // lanes 2, lanes 3
+    const __m128i sums =
+        _mm_add_epi32(_mm_add_epi32(_mm_srli_si128(low, 8), high), _mm_srli_si128(high, 8));
+    store_16(energy, _mm_unpacklo_epi64(low, sums));
+}
+
 // ---- Deblocking of luma ----
 
 // Sixteen lines of an edge.
@@ -557,8 +591,11 @@ struct Lanes {
 
 // tC0 of four segments, four lines each.
 Lanes luma_tc0(const int8_t* tc0) {
-    return {_mm256_set_epi16(tc0[3], tc0[3], tc0[3], tc0[3], tc0[2], tc0[2], tc0[2], tc0[2], tc0[1],
-                             tc0[1], tc0[1], tc0[1], tc0[0], tc0[0], tc0[0], tc0[0])};
+    const __m128i segments =
+        _mm_setr_epi8(tc0[0], tc0[1], tc0[2], tc0[3], 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0);
+    const __m128i lines =
+        _mm_shuffle_epi8(segments, _mm_setr_epi8(0, 0, 0, 0, 1, 1, 1, 1, 2, 2, 2, 2, 3, 3, 3, 3));
+    return {_mm256_cvtepi8_epi16(lines)};
 }
 
 // The rows p3..q3 around a horizontal edge.
@@ -668,6 +705,7 @@ Kernels with_avx2(const Kernels& base) {
     k.reconstruct_16x16 = reconstruct_16x16;
     k.reconstruct_8x8 = reconstruct_8x8;
     k.block_sums = block_sums;
+    k.hadamard_energy = hadamard_energy;
     k.deblock_luma_vertical = deblock_luma_vertical;
     k.deblock_luma_horizontal = deblock_luma_horizontal;
     k.deblock_luma_vertical_strong = deblock_luma_vertical_strong;

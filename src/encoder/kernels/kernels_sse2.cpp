@@ -549,14 +549,12 @@ void hadamard_energy(const int32_t* values, int32_t* energy) {
     for (__m128i& row : v) {
         row = _mm_srli_epi32(_mm_add_epi32(absolute_32(row), _mm_set1_epi32(8)), 4);
     }
-    alignas(16) int32_t constant[4];
-    alignas(16) int32_t others[4];
-    store(constant, v[0]);
-    store(others, _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]));
-    energy[0] = constant[0];
-    energy[1] = others[0];
-    energy[2] = constant[1] + constant[2] + constant[3];
-    energy[3] = others[1] + others[2] + others[3];
+    const __m128i others = _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]);
+    const __m128i low = _mm_unpacklo_epi32(v[0], others);   // lanes 0 of both, lanes 1 of both
+    const __m128i high = _mm_unpackhi_epi32(v[0], others);  // lanes 2, lanes 3
+    const __m128i sums =
+        _mm_add_epi32(_mm_add_epi32(_mm_srli_si128(low, 8), high), _mm_srli_si128(high, 8));
+    store(energy, _mm_unpacklo_epi64(low, sums));
 }
 
 void phase_sad_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
