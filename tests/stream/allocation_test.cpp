@@ -94,11 +94,17 @@ TEST(Allocation, IsCounted) {
     struct alignas(64) Wide {
         char bytes[64];
     };
-    EXPECT_GT(counted([] { delete static_cast<int*>(seen = new int); }), 0);
-    EXPECT_GT(counted([] { delete static_cast<Wide*>(seen = new Wide); }), 0);
-    EXPECT_GT(counted([] { std::free(seen = std::malloc(100)); }), 0);
-    EXPECT_GT(counted([] { std::free(seen = std::calloc(3, 7)); }), 0);
-    EXPECT_GT(counted([] { std::free(seen = std::realloc(nullptr, 50)); }), 0);
+    const auto after = [](void (*allocate)(), void (*release)()) {
+        const long count = counted(allocate);
+        release();
+        return count;
+    };
+    const auto free_seen = [] { std::free(seen); };
+    EXPECT_GT(after([] { seen = new int; }, [] { delete static_cast<int*>(seen); }), 0);
+    EXPECT_GT(after([] { seen = new Wide; }, [] { delete static_cast<Wide*>(seen); }), 0);
+    EXPECT_GT(after([] { seen = std::malloc(100); }, free_seen), 0);
+    EXPECT_GT(after([] { seen = std::calloc(3, 7); }, free_seen), 0);
+    EXPECT_GT(after([] { seen = std::realloc(nullptr, 50); }, free_seen), 0);
     EXPECT_EQ(counted([] { seen = nullptr; }), 0);
 }
 
