@@ -2,7 +2,8 @@
 
 // Deblocking filters over vectors of 16-bit lanes, one lane per line of the edge. Included by the
 // kernel files, each of which supplies a vector type V of its own with these operations: load(p)
-// widens V::kLanes samples, store(p) narrows with clipping, and the static functions used below.
+// widens as many samples as it has lanes, store(p) narrows with clipping, and the static functions
+// used below.
 
 #include <cstddef>
 #include <cstdint>
@@ -116,7 +117,7 @@ bool filter_chroma_strong(V p1, V& p0, V& q0, V q1, int alpha, int beta) {
 }
 
 // Filters on samples in memory: rows[i] is the address of the row of samples p3, p2, p1, p0, q0,
-// q1, q2, q3 (chroma: p1, p0, q0, q1) of V::kLanes lines. They return false when nothing changed.
+// q1, q2, q3 (chroma: p1, p0, q0, q1), one line a lane. They return false when nothing changed.
 template <typename V>
 bool luma_rows(std::uint8_t* const* rows, int alpha, int beta, V tc0) {
     V p1 = V::load(rows[2]), p0 = V::load(rows[3]);
