@@ -34,10 +34,9 @@ public:
 
 private:
     void compare_pictures();
-    std::string difference(const std::vector<std::uint8_t>& expected,
-                           const std::vector<std::uint8_t>& decoded, long picture) const;
+    static std::string difference(const std::vector<std::uint8_t>& expected,
+                                  const std::vector<std::uint8_t>& decoded, long picture);
 
-    int width_, height_;
     std::size_t picture_size_;
     pid_t process_ = 0;
     int input_ = -1;

@@ -65,15 +65,6 @@ void* aligned_alloc(std::size_t alignment, std::size_t size) {
     return __libc_memalign(alignment, size);
 }
 
-void* memalign(std::size_t alignment, std::size_t size) {
-    return aligned_alloc(alignment, size);
-}
-
-int posix_memalign(void** block, std::size_t alignment, std::size_t size) {
-    *block = aligned_alloc(alignment, size);
-    return *block ? 0 : 12;  // ENOMEM
-}
-
 }  // extern "C"
 
 #endif

@@ -36,14 +36,10 @@ TEST(DecoderCheck, Succeeds) {
 }
 
 TEST(DecoderCheck, NamesTheFirstSampleThatDiffers) {
-    const auto differ_at = [](std::size_t index) {
-        return check_with([index](int n, Bytes&, Bytes& expected) {
-            expected[index] = static_cast<std::uint8_t>(expected[index] + (n == 1 ? 1 : 0));
-        });
-    };
-    EXPECT_EQ(differ_at(5 * 48 + 7).find("picture 1: luma sample (7, 5) "), 0u);
-    EXPECT_EQ(differ_at(48 * 32 + 383).find("picture 1: Cb sample (23, 15) "), 0u);
-    EXPECT_EQ(differ_at(48 * 32 + 384).find("picture 1: Cr sample (0, 0) "), 0u);
+    EXPECT_EQ(check_with([](int n, Bytes&, Bytes& expected) {
+                  expected[247] = static_cast<std::uint8_t>(expected[247] + (n == 1 ? 1 : 0));
+              }).find("picture 1: sample 247 is "),
+              0u);
 }
 
 TEST(DecoderCheck, ReportsADamagedOrMissingPicture) {
