@@ -3,6 +3,7 @@ The stub encoder library writes down what it was given."""
 
 import os
 import pathlib
+import resource
 import signal
 import subprocess
 import time
@@ -322,7 +323,23 @@ class Outputs(ToolTest):
         self.assert_fails(
             self.zoltenc("in.y4m", "-o", "out.264", "--stats", "none/s.csv"), 1, "none/s.csv"
         )
-        self.assert_fails(self.zoltenc("in.y4m", "-o", "/dev/full"), 1, "/dev/full", "No space")
+        self.assertEqual(self.files(), ["in.y4m"])
+
+    def test_a_write_that_fails_leaves_nothing(self):
+        def limit_file_size():
+            signal.signal(signal.SIGXFSZ, signal.SIG_IGN)
+            resource.setrlimit(resource.RLIMIT_FSIZE, (200, 200))
+
+        command = [ZOLTENC, "--plugin", STUB_ENCODER, "in.y4m", "-o", "out.264"]
+        result = subprocess.run(
+            command,
+            cwd=self.folder,
+            capture_output=True,
+            text=True,
+            preexec_fn=limit_file_size,
+            check=False,
+        )
+        self.assert_fails(result, 1, "out.264", "File too large")
         self.assertEqual(self.files(), ["in.y4m"])
 
     def test_the_input_is_never_overwritten(self):
@@ -339,11 +356,20 @@ class Outputs(ToolTest):
         self.assertEqual(result.returncode, 2)
         self.assertEqual(self.read("in.y4m"), y4m())
 
-    def test_devices_and_pipes_are_written_in_place(self):
-        self.assert_succeeds(self.zoltenc("in.y4m", "-o", "/dev/null"))
-        self.assertTrue(pathlib.Path("/dev/null").is_char_device())
-        result = self.assert_succeeds(self.zoltenc("in.y4m", "-o", "/dev/stdout"))
+    # Only with things of the test's own: a program that replaced a device would replace the machine's.
+    def test_what_is_no_regular_file_is_written_in_place(self):
+        os.mkfifo(self.folder / "pipe")
+        with subprocess.Popen(
+            ["cat", "pipe"], cwd=self.folder, stdout=subprocess.PIPE
+        ) as reader:
+            self.assert_succeeds(self.zoltenc("in.y4m", "-o", "pipe"))
+            self.assertEqual(len(self.told(reader.stdout.read())), 2 + 3)
+        self.assertTrue((self.folder / "pipe").is_fifo())
+
+        (self.folder / "stdout").symlink_to("/proc/self/fd/1")
+        result = self.assert_succeeds(self.zoltenc("in.y4m", "-o", "stdout"))
         self.assertEqual(len(self.told(result.stdout)), 2 + 3)
+        self.assertTrue((self.folder / "stdout").is_symlink())
 
     def test_standard_output_holds_the_stream_alone(self):
         plain = self.zoltenc("in.y4m", "-o", "-").stdout
