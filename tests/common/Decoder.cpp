@@ -47,10 +47,12 @@ Decoder::Decoder(int width, int height)
     posix_spawn_file_actions_adddup2(&actions, in[0], 0);
     posix_spawn_file_actions_adddup2(&actions, out[1], 1);
     posix_spawn_file_actions_adddup2(&actions, fileno(errors_), 2);
-    const char* arguments[] = {"ffmpeg",    "-v",          "warning", "-nostdin", "-threads",
-                               "1",         "-f",          "h264",    "-i",       "pipe:0",
-                               "-fps_mode", "passthrough", "-f",      "rawvideo", "-pix_fmt",
-                               "yuv420p",   "pipe:1",      nullptr};
+    // The probe size lets the demuxer see enough pictures of any stream here to estimate a frame
+    // rate, about which it would warn otherwise.
+    const char* arguments[] = {"ffmpeg",   "-v",         "warning",   "-nostdin",    "-threads",
+                               "1",        "-probesize", "100000000", "-f",          "h264",
+                               "-i",       "pipe:0",     "-fps_mode", "passthrough", "-f",
+                               "rawvideo", "-pix_fmt",   "yuv420p",   "pipe:1",      nullptr};
     const int error = posix_spawnp(&process_, arguments[0], &actions, nullptr,
                                    const_cast<char**>(arguments), environ);
     posix_spawn_file_actions_destroy(&actions);
