@@ -1,0 +1,78 @@
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <random>
+#include <vector>
+
+#include "pictures/Session.h"
+
+// Peak memory of one session, picture size by picture size: what the formula of docs/performance.md
+// says, and by how much the resident memory of a process grows that runs one.
+
+namespace {
+
+constexpr int kSizes[][2] = {{176, 144}, {352, 288}, {640, 352}, {1280, 720}, {1920, 1072}};
+constexpr int kBitRateKbs = 2000;
+constexpr int kPictures = 4;
+
+// Bytes of an engine and of the converter's picture, for sides that are multiples of 16.
+double formula(double width, double height) {
+    const double planes = 6 * (width + 64) * (height + 64);
+    const double maps = 159.0 / 256 * width * height;
+    const double nal_buffer = 1.54 * width * height;
+    const double visited = 128 * 128 * 4;
+    const double converter = 1.5 * width * height;
+    return planes + maps + nal_buffer + visited + converter;
+}
+
+long peak_kilobytes() {
+    rusage usage;
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss;
+}
+
+// The picture is made without memory that is given back: a peak before hides what comes after.
+void measure(int width, int height) {
+    std::vector<std::uint8_t> picture(static_cast<std::size_t>(width * height * 3 / 2));
+    std::minstd_rand random(1);
+    for (std::uint8_t& sample : picture) {
+        sample = static_cast<std::uint8_t>(100 + random() % 32);
+    }
+    const auto encode = [&picture](int w, int h) {
+        zolt_bench::Session session(w, h, kBitRateKbs);
+        for (int n = 0; n < kPictures; ++n) {
+            session.encode(picture.data());
+        }
+    };
+    encode(16, 16);  // so that code and tables are there
+    const long before = peak_kilobytes();
+    encode(width, height);
+    const double measured = 1024.0 * static_cast<double>(peak_kilobytes() - before);
+    std::printf("%4dx%-4d  formula %6.2f MB  measured %6.2f MB\n", width, height,
+                formula(width, height) / 1e6, measured / 1e6);
+}
+
+}  // namespace
+
+// Each size in a process of its own: a peak does not go down.
+int main() {
+    for (const auto& size : kSizes) {
+        const pid_t child = fork();
+        if (child == 0) {
+            measure(size[0], size[1]);
+            std::fflush(stdout);
+            _exit(0);
+        }
+        int status = 0;
+        if (child < 0 || waitpid(child, &status, 0) != child || status != 0) {
+            std::fprintf(stderr, "bench_memory: cannot measure in another process\n");
+            return EXIT_FAILURE;
+        }
+    }
+    return EXIT_SUCCESS;
+}
