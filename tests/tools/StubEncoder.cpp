@@ -50,6 +50,9 @@ public:
         if (misbehaves("drop at 2") && index_ == 2) {
             return;
         }
+        if (misbehaves("announce at 2") && index_ == 2) {
+            Announce();
+        }
         if (misbehaves("exit at 2") && index_ == 2) {
             std::exit(109);
         }

@@ -195,6 +195,12 @@ class Inputs(ToolTest):
         self.assertEqual(sps["fps"], "30.000000")
         self.assertEqual(pps, {"bitrate": "200", "keyint": "30"})
 
+    def test_parameter_sets_come_again_when_the_encoder_announces_them_again(self):
+        self.write("in.y4m", y4m(frames=4))
+        sps, pps, *rest = self.coded("in.y4m", stub_does="announce at 2")
+        self.assertEqual(rest[2:4], [sps, pps])
+        self.assertEqual([unit["index"] for unit in rest[:2] + rest[4:]], ["0", "1", "2", "3"])
+
     def test_y4m_oddities_change_nothing(self):
         plain = y4m(parameters="F25:1")
         self.write("in.y4m", plain)
