@@ -95,9 +95,12 @@ Bytes random_stream(std::mt19937& random) {
     };
     static constexpr std::array<unsigned char, 6> kFrequent = {0, 0, 0, 1, 2, 3};
     Bytes stream;
+    const auto add_zeros = [&](int count) {
+        stream.insert(stream.end(), static_cast<std::size_t>(count), 0);
+    };
     const int units = 20 + below(50);
     for (int unit = 0; unit < units; ++unit) {
-        stream.insert(stream.end(), static_cast<std::size_t>(2 + below(2)), 0);
+        add_zeros(2 + below(2));
         stream.push_back(1);
         static constexpr std::array<unsigned char, 8> kHeaders = {0x67, 0x68, 0x65, 0x41,
                                                                   0x01, 0x06, 0x09, 0x1f};
@@ -111,7 +114,7 @@ Bytes random_stream(std::mt19937& random) {
             stream.push_back(is_dense ? kFrequent[static_cast<std::size_t>(below(6))]
                                       : static_cast<unsigned char>(below(256)));
         }
-        stream.insert(stream.end(), static_cast<std::size_t>(below(4) == 0 ? below(9) : 0), 0);
+        add_zeros(below(4) == 0 ? below(9) : 0);
     }
     const Bytes last = {0, 0, 1, 0x41, 0x9a, 0xff, 0xff, 0xff};
     stream.insert(stream.end(), last.begin(), last.end());

@@ -58,7 +58,7 @@ void read_chroma_format(BitStreamReader& reader, SeqParSet& set) {
 }
 
 // The slice group part of a picture parameter set; false for values that do not exist.
-bool skip_slice_groups(BitStreamReader& reader, const std::vector<unsigned char>& bytes) {
+bool skip_slice_groups(BitStreamReader& reader) {
     const std::uint64_t last_group = reader.ReadExpGolomb();
     if (last_group == 0) {
         return true;
@@ -82,8 +82,10 @@ bool skip_slice_groups(BitStreamReader& reader, const std::vector<unsigned char>
     } else if (map_type == 6) {
         const int id_bits = last_group > 3 ? 3 : last_group > 1 ? 2 : 1;
         const std::uint64_t last_unit = reader.ReadExpGolomb();
-        for (std::uint64_t unit = 0; unit <= last_unit && !is_cut_off(reader, bytes); ++unit) {
-            reader.SkipBits(id_bits);  // slice_group_id
+        for (std::uint64_t unit = 0; unit <= last_unit; ++unit) {
+            if (reader.SkipBits(id_bits) != 0) {  // slice_group_id
+                return false;                     // the end, which such a skip does not reach
+            }
         }
     }
     return map_type <= 6;
@@ -145,7 +147,7 @@ void ParameterSets::add_pic_par_set(const unsigned char* nal, int size) {
     const std::uint64_t seq_par_set_id = reader.ReadExpGolomb();
     set.is_cabac = reader.ReadBoolean();
     set.bottom_field_pic_order_in_frame_present = reader.ReadBoolean();
-    bool is_valid = skip_slice_groups(reader, bytes);
+    bool is_valid = skip_slice_groups(reader);
     for (std::uint64_t& num_ref_idx : set.num_ref_idx_default_active) {
         const std::uint64_t last = reader.ReadExpGolomb();
         is_valid = is_valid && last < kMaxRefIdx;
