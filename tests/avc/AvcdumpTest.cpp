@@ -65,7 +65,7 @@ BitWriter pic_par_set(const PicParSetFields& fields) {
             bits.ue(0).ue(9).ue(3).ue(44);
             break;
         case 4:
-            bits.u(1, 1).ue(7);
+            bits.u(1, 1).ue(40);
             break;
         case 6:
             bits.ue(98);
@@ -133,8 +133,8 @@ TEST(Avcdump, ReadsWholeSliceHeaders) {
             if (is_b) {
                 bits.u(1, 1).se(7).se(-7).u(1, 0);
             }
-            bits.u(1, 1).ue(1).ue(9).ue(2).ue(1).ue(3).ue(5).ue(1).ue(4).ue(2).ue(5).ue(6).ue(0).ue(
-                0);
+            bits.u(1, 1).ue(1).ue(9).ue(2).ue(1);  // marking; operation 3 has two operands
+            bits.ue(3).ue(5).ue(9).ue(4).ue(2).ue(5).ue(6).ue(0).ue(0);
             if (is_cabac) {
                 bits.ue(2);
             }
@@ -191,6 +191,11 @@ TEST(Avcdump, MarksDamagedHeaders) {
         endless_modification.ue(0).ue(0);
     }
     EXPECT_FALSE(add(lister, endless_modification.trailing()).header->is_complete);
+
+    // A set that announces four billion slice groups costs no more than its bytes.
+    BitWriter many_groups;
+    many_groups.u(8, 0x68).ue(1).ue(0).u(2, 0).ue(2).ue(6).ue(0xfffffffe).u(43, 0x155555);
+    add(lister, many_groups);
 
     // A damaged set does not replace a good one.
     BitWriter bad_set;

@@ -106,6 +106,11 @@ TEST(VideoAvcParser, DropsUnitsBeforeBothParameterSets) {
     EXPECT_EQ(parser.GetWidth(), 352);
     const std::vector<RecordedSample> expected = {{other_sps, 0, false}};
     EXPECT_EQ(consumer.samples, expected);
+
+    VideoAvcParser sps_twice(nullptr, 25);
+    put(sps_twice, kSps + other_sps + kPps + kIdr);
+    EXPECT_EQ(sps_twice.GetWidth(), 352);
+    EXPECT_EQ(sps_twice.GetSeqParSetSize(), static_cast<int>(kSps.size()) - 4);
 }
 
 TEST(VideoAvcParser, TakesUnitsOfAnyShape) {
@@ -144,10 +149,11 @@ TEST(VideoAvcParser, WaitsForEightBytes) {
 TEST(VideoAvcParser, FlushDeliversWhatIsHeld) {
     RecordingConsumer consumer;
     VideoAvcParser parser(&consumer, 50);
-    put(parser, kSps + kPps + kIdr + kSlice);
+    const Bytes long_slice = kSlice + Bytes(100, 0xff);
+    put(parser, kSps + kPps + kIdr + long_slice);
     parser.Flush();
     // The sync flag is that of the unit before.
-    std::vector<RecordedSample> expected = {{kIdr, 0, true}, {kSlice, 20000, true}};
+    std::vector<RecordedSample> expected = {{kIdr, 0, true}, {long_slice, 20000, true}};
     EXPECT_EQ(consumer.samples, expected);
     EXPECT_EQ(consumer.ends, 1);
     parser.Flush();

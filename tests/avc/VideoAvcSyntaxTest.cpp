@@ -316,7 +316,7 @@ TEST(VideoAvcSyntax, SurvivesSlicesOfAnyLength) {
     sps.log2_max_pic_order_cnt_lsb_minus4 = 29;
     sps.pic_width_in_mbs_minus1 = 0xffffffff;
     const VideoAvcPicParSet pps;
-    const Bytes nal = {0x65, 0x00, 0x40};
+    const Bytes nal = {0x65, 0xff, 0xff};
     VideoAvcSliceHeader header;
     EXPECT_NE(lines_of({}, sps, &pps, &header).find("Last 3 bytes = 0000.0000 0000.0000 0000.0000"),
               std::string::npos);
