@@ -28,7 +28,8 @@ constexpr int kMaxLevel = 2063;
 //
 // Samples are 8-bit; strides are in samples. A "16x16 prediction" is 256 samples with stride 16, an
 // "8x8 prediction" 64 samples with stride 8, a "4x4 prediction" 16 samples with stride 4 unless a
-// stride is given; predictions, phases and coefficients are aligned to 32 bytes.
+// stride is given. Predictions of 16x16 and 8x8, phases and coefficients are aligned to 32 bytes,
+// 4x4 predictions to 16.
 struct Kernels {
     const char* name;
 
