@@ -76,8 +76,8 @@ void CEncoder::setMBOffsets() {
     g_intra_lambda = g_sad_lambda;
 }
 
-// Asks for samples of the reference that macroblocks further right will read, a row of each plane
-// at a time: 64 bytes are 4 macroblocks of luma and 8 of chroma.
+// Asks for samples of the reference that macroblocks further right will read, four rows of luma and
+// one of either chroma plane at a time: 64 bytes are 4 macroblocks of luma and 8 of chroma.
 void CEncoder::prefetch_reference() const {
     const std::ptrdiff_t luma_row = 16 * g_mb_y + 16 + 4 * (g_mb_x & 3);
     const std::uint8_t* luma = g_ref_y + luma_row * g_stride_luma + 16 * g_mb_x + 64;
