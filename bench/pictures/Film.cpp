@@ -1,4 +1,4 @@
-#include "pictures/Film.h"
+#include "Film.h"
 
 #include <cstdlib>
 

@@ -9,7 +9,7 @@
 #include <random>
 #include <vector>
 
-#include "pictures/Session.h"
+#include "Session.h"
 
 // Peak memory of one session, picture size by picture size: what the formula of docs/performance.md
 // says, and by how much the resident memory of a process grows that runs one.

@@ -9,9 +9,9 @@
 #include <thread>
 #include <vector>
 
+#include "Film.h"
+#include "Session.h"
 #include "encoder/CEncoder.h"
-#include "pictures/Film.h"
-#include "pictures/Session.h"
 
 // What a picture costs: by type, size and kernel table at a constant QP; in a session with rate
 // control; and in two sessions on two threads.
