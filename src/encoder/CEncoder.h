@@ -446,7 +446,7 @@ public:
         std::ptrdiff_t plane, offset;
     };
     plane_offset_t g_half_samples[8];
-    plane_offset_t g_quarter_samples[4][8][2];
+    plane_offset_t g_quarter_samples[4][8];
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
     zolt::AlignedBuffer<std::uint32_t> g_visit_store;
     std::uint32_t* g_visit_L0 = nullptr;

@@ -3,6 +3,7 @@
 #include <cstring>
 
 #include "encoder/CEncoder.h"
+#include "encoder/bitops.h"
 
 namespace {
 
@@ -78,62 +79,54 @@ struct Vector {
     int x, y;
 };
 
-// A half-sample candidate: direction, plane and offset of its sample.
+// Half-sample candidates around the integer result, in the order of their evaluation, and their
+// samples relative to it.
 enum Plane { kFull, kVertical, kHorizontal, kCentre };
 struct PlaneSample {
     Plane plane;
     int x, y;
 };
-struct HalfCandidate {
-    Vector direction;
-    PlaneSample sample;
-};
-constexpr HalfCandidate kHalfCandidates[8] = {
-    {{0, 1}, {kVertical, 0, 0}},     {{0, -1}, {kVertical, 0, -1}}, {{1, 0}, {kHorizontal, 0, 0}},
-    {{-1, 0}, {kHorizontal, -1, 0}}, {{1, 1}, {kCentre, 0, 0}},     {{-1, 1}, {kCentre, -1, 0}},
-    {{1, -1}, {kCentre, 0, -1}},     {{-1, -1}, {kCentre, -1, -1}}};
+constexpr Vector kHalfCandidates[8] = {{0, 1}, {0, -1}, {1, 0},  {-1, 0},
+                                       {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
+constexpr PlaneSample kHalfSamples[8] = {
+    {kVertical, 0, 0}, {kVertical, 0, -1}, {kHorizontal, 0, 0}, {kHorizontal, -1, 0},
+    {kCentre, 0, 0},   {kCentre, -1, 0},   {kCentre, 0, -1},    {kCentre, -1, -1}};
 
 // Quarter-sample candidates around the half-sample result, in the order of their evaluation.
 constexpr Vector kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
                                           {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
 
-// The two samples whose average is each of them (clause 8.4.2.2.1), for a result at an integer
-// sample G, at b, at h and at j. Offsets are relative to the result's sample in its own plane.
-constexpr PlaneSample kQuarterSamples[4][8][2] = {{{{kFull, 0, 0}, {kHorizontal, 0, 0}},
-                                                   {{kFull, 0, 0}, {kVertical, 0, 0}},
-                                                   {{kFull, 0, 0}, {kHorizontal, -1, 0}},
-                                                   {{kFull, 0, 0}, {kVertical, 0, -1}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 0, 0}},
-                                                   {{kHorizontal, -1, 0}, {kVertical, 0, 0}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 0, -1}},
-                                                   {{kHorizontal, -1, 0}, {kVertical, 0, -1}}},
-                                                  {{{kHorizontal, 0, 0}, {kFull, 1, 0}},
-                                                   {{kHorizontal, 0, 0}, {kCentre, 0, 0}},
-                                                   {{kHorizontal, 0, 0}, {kFull, 0, 0}},
-                                                   {{kHorizontal, 0, 0}, {kCentre, 0, -1}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 1, 0}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 0, 0}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 1, -1}},
-                                                   {{kHorizontal, 0, 0}, {kVertical, 0, -1}}},
-                                                  {{{kVertical, 0, 0}, {kCentre, 0, 0}},
-                                                   {{kVertical, 0, 0}, {kFull, 0, 1}},
-                                                   {{kVertical, 0, 0}, {kCentre, -1, 0}},
-                                                   {{kVertical, 0, 0}, {kFull, 0, 0}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, 0, 1}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, -1, 1}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, 0, 0}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, -1, 0}}},
-                                                  {{{kCentre, 0, 0}, {kVertical, 1, 0}},
-                                                   {{kCentre, 0, 0}, {kHorizontal, 0, 1}},
-                                                   {{kCentre, 0, 0}, {kVertical, 0, 0}},
-                                                   {{kCentre, 0, 0}, {kHorizontal, 0, 0}},
-                                                   {{kVertical, 1, 0}, {kHorizontal, 0, 1}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, 0, 1}},
-                                                   {{kVertical, 1, 0}, {kHorizontal, 0, 0}},
-                                                   {{kVertical, 0, 0}, {kHorizontal, 0, 0}}}};
+// Each of them is the average of two samples (clause 8.4.2.2.1), the result's own and one of these,
+// relative to it in its plane. From an integer sample G or a centre sample j that holds for the
+// first four candidates only; the diagonal ones are averages of two of the four (kCrossPairs).
+constexpr PlaneSample kQuarterSamples[4][8] = {
+    {{kHorizontal, 0, 0}, {kVertical, 0, 0}, {kHorizontal, -1, 0}, {kVertical, 0, -1}},
+    {{kFull, 1, 0},
+     {kCentre, 0, 0},
+     {kFull, 0, 0},
+     {kCentre, 0, -1},
+     {kVertical, 1, 0},
+     {kVertical, 0, 0},
+     {kVertical, 1, -1},
+     {kVertical, 0, -1}},
+    {{kCentre, 0, 0},
+     {kFull, 0, 1},
+     {kCentre, -1, 0},
+     {kFull, 0, 0},
+     {kHorizontal, 0, 1},
+     {kHorizontal, -1, 1},
+     {kHorizontal, 0, 0},
+     {kHorizontal, -1, 0}},
+    {{kVertical, 1, 0}, {kHorizontal, 0, 1}, {kVertical, 0, 0}, {kHorizontal, 0, 0}}};
 
-// Number of candidates whose first phases are measured in one go.
+// The plane of the result: G, b, h or j.
+constexpr Plane kResultPlane[4] = {kFull, kHorizontal, kVertical, kCentre};
+
+// Number of integer candidates whose first phases are measured in one go.
 constexpr int kGroup = 4;
+
+// Number of candidates of a fractional step.
+constexpr int kFractions = 8;
 
 // The motion search of one macroblock. Its stages share the thresholds, which reject a candidate by
 // its cost after a part of its samples, and the best distortion. A stage ends early when a new best
@@ -154,26 +147,29 @@ private:
 
     int rate_x(int x) const { return m_lambda * component_rate(x - m_pmv.x); }
     int rate_y(int y) const { return m_lambda * component_rate(y - m_pmv.y); }
-    bool passes_first_phases(int first, int second, int rate) const {
-        return m_thresholds[0] > first + first_share(rate) &&
-               m_thresholds[1] > second + second_share(rate);
-    }
-    bool accept(int first_threshold, int second, const int* last, int rate);
+    // The SAD of phases 0 and 1 that a candidate with this rate must stay below. Acceptance of
+    // another one can only lower it.
+    int first_phases_limit(int rate) const { return m_thresholds[1] - second_share(rate); }
+    bool accept(const int* sums, int rate, int first_threshold);
     void set_planes(std::ptrdiff_t position);
     void record_fraction(_mv& result, Vector fraction) const;
 
-    // Rates of the vectors around (x, y), `step` quarter pels apart.
-    struct FractionRates {
-        int horizontal[3], vertical[3];
+    // The candidates of a fractional step: their directions from (x, y), `step` quarter pels long,
+    // their rates, and the limits of their first phases.
+    struct Fractions {
+        int rates[kFractions];
+        alignas(32) std::int32_t limits[kFractions];
 
-        FractionRates(const MotionSearch& search, int x, int y, int step) {
+        Fractions(const MotionSearch& search, const Vector* directions, int x, int y, int step) {
+            int horizontal[3], vertical[3];
             for (int i = -1; i <= 1; ++i) {
                 horizontal[i + 1] = search.rate_x(x + step * i);
                 vertical[i + 1] = search.rate_y(y + step * i);
             }
-        }
-        int of(Vector direction) const {
-            return horizontal[direction.x + 1] + vertical[direction.y + 1];
+            for (int n = 0; n < kFractions; ++n) {
+                rates[n] = horizontal[directions[n].x + 1] + vertical[directions[n].y + 1];
+                limits[n] = search.first_phases_limit(rates[n]);
+            }
         }
     };
 
@@ -193,8 +189,8 @@ private:
     int m_best_cost = kNoCost;
     int m_best_sad = 0;
     Vector m_best = {0, 0};
-    const std::uint8_t* m_planes[4] = {};    // samples by Plane around the candidates of a stage
-    alignas(64) std::uint8_t m_phases[512];  // the macroblock's samples by sampling phase
+    const std::uint8_t* m_planes[4] = {};  // samples by Plane around the candidates of a stage
+    alignas(64) std::uint8_t m_block[zolt::kArrangedBlock];  // the macroblock's samples, arranged
 };
 
 }  // namespace
@@ -216,10 +212,9 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
         return plane_offset_t{s.plane, static_cast<std::ptrdiff_t>(s.y) * g_stride_luma + s.x};
     };
     for (int n = 0; n < 8; ++n) {
-        g_half_samples[n] = offset(kHalfCandidates[n].sample);
+        g_half_samples[n] = offset(kHalfSamples[n]);
         for (int kind = 0; kind < 4; ++kind) {
-            g_quarter_samples[kind][n][0] = offset(kQuarterSamples[kind][n][0]);
-            g_quarter_samples[kind][n][1] = offset(kQuarterSamples[kind][n][1]);
+            g_quarter_samples[kind][n] = offset(kQuarterSamples[kind][n]);
         }
     }
 }
@@ -284,7 +279,7 @@ MotionSearch::MotionSearch(CEncoder& encoder)
       m_lambda(encoder.g_sad_lambda),
       m_ref(encoder.g_ref_y + m_py * m_stride + m_px),
       m_visited(encoder.g_visit_L0 + encoder.g_visit_dim / 2 * (encoder.g_visit_dim + 1)) {
-    m_kernels.split_phases(encoder.g_mb_src_y, m_stride, m_phases);
+    m_kernels.arrange_block(encoder.g_mb_src_y, m_stride, m_block);
 }
 
 // Subsampled diamond search at integer pels.
@@ -423,24 +418,22 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
     if (n == 0) {
         return false;
     }
-    int first[kGroup], second[kGroup];
-    if (n == 1) {
-        int sums[2];
-        m_kernels.sad_first_phases(m_phases, refs[0], m_stride, sums);
-        first[0] = sums[0];
-        second[0] = sums[1];
-    } else {
-        std::fill(refs + n, refs + kGroup, refs[0]);
-        m_kernels.sad_first_phases_x4(m_phases, refs, m_stride, first, second);
-    }
+    int rates[kGroup];
+    std::int32_t limits[kGroup] = {};
     for (int i = 0; i < n; ++i) {
-        const int rate = rate_x(4 * fresh[i].x) + rate_y(4 * fresh[i].y);
-        if (!passes_first_phases(first[i], second[i], rate)) {
-            continue;
-        }
-        int last[2];
-        m_kernels.sad_last_phases(m_phases, refs[i], m_stride, last);
-        if (accept(2 * (first[i] + first_share(rate)), second[i], last, rate)) {
+        rates[i] = rate_x(4 * fresh[i].x) + rate_y(4 * fresh[i].y);
+        limits[i] = first_phases_limit(rates[i]);
+    }
+    unsigned passed = 1;
+    if (n > 1) {
+        std::fill(refs + n, refs + kGroup, refs[0]);
+        passed = m_kernels.first_phases_below_x4(m_block, refs, m_stride, limits);
+    }
+    for (; passed != 0; passed &= passed - 1) {
+        const int i = zolt::lowest_bit(passed);
+        int sums[4];
+        m_kernels.phase_sads(m_block, refs[i], m_stride, sums);
+        if (accept(sums, rates[i], 2 * (sums[0] + first_share(rates[i])))) {
             m_best = fresh[i];
             if (m_best_sad < kGoodSad) {
                 return true;
@@ -453,27 +446,21 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
 // Half-pel step around the integer result.
 void MotionSearch::half_stage(_mv& result) {
     set_planes(m_best.y * m_stride + m_best.x);
-    const FractionRates rates(*this, 4 * m_best.x, 4 * m_best.y, 2);
-    for (int start = 0; start < 8; start += kGroup) {
-        const std::uint8_t* refs[kGroup];
-        int first[kGroup], second[kGroup];
-        for (int i = 0; i < kGroup; ++i) {
-            refs[i] = sample(m_encoder.g_half_samples[start + i]);
-        }
-        m_kernels.sad_first_phases_x4(m_phases, refs, m_stride, first, second);
-        for (int i = 0; i < kGroup; ++i) {
-            const Vector direction = kHalfCandidates[start + i].direction;
-            const int rate = rates.of(direction);
-            if (!passes_first_phases(first[i], second[i], rate)) {
-                continue;
-            }
-            int last[2];
-            m_kernels.sad_last_phases(m_phases, refs[i], m_stride, last);
-            if (accept(2 * (first[i] + first_share(rate)), second[i], last, rate)) {
-                record_fraction(result, {2 * direction.x, 2 * direction.y});
-                if (m_best_sad < kGoodSad) {
-                    return;
-                }
+    const Fractions candidates(*this, kHalfCandidates, 4 * m_best.x, 4 * m_best.y, 2);
+    const std::uint8_t* refs[kFractions];
+    for (int n = 0; n < kFractions; ++n) {
+        refs[n] = sample(m_encoder.g_half_samples[n]);
+    }
+    unsigned passed = m_kernels.first_phases_below_x8(m_block, refs, m_stride, candidates.limits);
+    for (; passed != 0; passed &= passed - 1) {
+        const int n = zolt::lowest_bit(passed);
+        const int rate = candidates.rates[n];
+        int sums[4];
+        m_kernels.phase_sads(m_block, refs[n], m_stride, sums);
+        if (accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
+            record_fraction(result, {2 * kHalfCandidates[n].x, 2 * kHalfCandidates[n].y});
+            if (m_best_sad < kGoodSad) {
+                return;
             }
         }
     }
@@ -487,29 +474,30 @@ void MotionSearch::quarter_stage(_mv& result) {
         CEncoder::exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
     }
     set_planes((m_best.y - (half.y < 0 ? 1 : 0)) * m_stride + m_best.x - (half.x < 0 ? 1 : 0));
-    const FractionRates rates(*this, 4 * m_best.x + half.x, 4 * m_best.y + half.y, 1);
-    for (int start = 0; start < 8; start += kGroup) {
-        const std::uint8_t* a[kGroup];
-        const std::uint8_t* b[kGroup];
-        int first[kGroup], second[kGroup];
-        for (int i = 0; i < kGroup; ++i) {
-            a[i] = sample(m_encoder.g_quarter_samples[kind][start + i][0]);
-            b[i] = sample(m_encoder.g_quarter_samples[kind][start + i][1]);
-        }
-        m_kernels.sad_first_phases_average_x4(m_phases, a, b, m_stride, first, second);
-        for (int i = 0; i < kGroup; ++i) {
-            const Vector direction = kQuarterCandidates[start + i];
-            const int rate = rates.of(direction);
-            if (!passes_first_phases(first[i], second[i], rate)) {
-                continue;
-            }
-            int last[2];
-            m_kernels.sad_last_phases_average(m_phases, a[i], b[i], m_stride, last);
-            if (accept((5 * (first[i] + first_share(rate))) >> 2, second[i], last, rate)) {
-                record_fraction(result, {half.x + direction.x, half.y + direction.y});
-                if (m_best_sad < kGoodSad) {
-                    return;
-                }
+    const Fractions candidates(*this, kQuarterCandidates, 4 * m_best.x + half.x,
+                               4 * m_best.y + half.y, 1);
+    const bool cross = kind == 0 || kind == 3;
+    const std::uint8_t* centre = m_planes[kResultPlane[kind]];
+    const std::uint8_t* refs[kFractions];
+    for (int n = 0; n < (cross ? 4 : kFractions); ++n) {
+        refs[n] = sample(m_encoder.g_quarter_samples[kind][n]);
+    }
+    unsigned passed =
+        (cross ? m_kernels.first_phases_below_cross : m_kernels.first_phases_below_star)(
+            m_block, centre, refs, m_stride, candidates.limits);
+    for (; passed != 0; passed &= passed - 1) {
+        const int n = zolt::lowest_bit(passed);
+        const bool diagonal = cross && n >= 4;
+        const std::uint8_t* a = diagonal ? refs[zolt::kCrossPairs[n - 4][0]] : centre;
+        const std::uint8_t* b = refs[diagonal ? zolt::kCrossPairs[n - 4][1] : n];
+        const int rate = candidates.rates[n];
+        int sums[4];
+        m_kernels.phase_sads_average(m_block, a, b, m_stride, sums);
+        if (accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
+            record_fraction(result,
+                            {half.x + kQuarterCandidates[n].x, half.y + kQuarterCandidates[n].y});
+            if (m_best_sad < kGoodSad) {
+                return;
             }
         }
     }
@@ -531,20 +519,21 @@ void MotionSearch::set_planes(std::ptrdiff_t position) {
     m_planes[kCentre] = m_encoder.g_half_hv_L0 + position;
 }
 
-// Makes a candidate that has passed its first phases the best one if it passes the third and its
-// cost is the lowest. second: SAD of phases 0 and 1; last: of phase 2 and of phases 2 and 3;
-// first_threshold: the threshold that it then sets for phase 0.
-bool MotionSearch::accept(int first_threshold, int second, const int* last, int rate) {
-    const int third_cost = second + last[0] + third_share(rate);
-    const int sad = second + last[1];
-    if (m_thresholds[2] <= third_cost || sad + rate >= m_best_cost) {
+// Makes a candidate the best one if its costs after every phase are below the thresholds and its
+// cost is the lowest. sums: its SAD of the phases up to each; first_threshold: the threshold that
+// it then sets for phase 0.
+bool MotionSearch::accept(const int* sums, int rate, int first_threshold) {
+    const int second_cost = sums[1] + second_share(rate);
+    const int third_cost = sums[2] + third_share(rate);
+    if (m_thresholds[0] <= sums[0] + first_share(rate) || m_thresholds[1] <= second_cost ||
+        m_thresholds[2] <= third_cost || sums[3] + rate >= m_best_cost) {
         return false;
     }
     m_thresholds[0] = first_threshold;
-    m_thresholds[1] = second + second_share(rate);
+    m_thresholds[1] = second_cost;
     m_thresholds[2] = third_cost;
-    m_best_sad = sad;
-    m_best_cost = sad + rate;
+    m_best_sad = sums[3];
+    m_best_cost = sums[3] + rate;
     return true;
 }
 

@@ -22,41 +22,56 @@ struct Quantizer {
 // can carry at suffixLength 0.
 constexpr int kMaxLevel = 2063;
 
+// Bytes of a block as arrange_block leaves it.
+constexpr int kArrangedBlock = 384;
+
+// The pairs of blocks whose averages are candidates 4..7 of first_phases_below_cross.
+constexpr int kCrossPairs[4][2] = {{0, 1}, {2, 1}, {0, 3}, {2, 3}};
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
 //
 // Samples are 8-bit; strides are in samples. A "16x16 prediction" is 256 samples with stride 16, an
 // "8x8 prediction" 64 samples with stride 8, a "4x4 prediction" 16 samples with stride 4 unless a
-// stride is given. Predictions of 16x16 and 8x8, phases and coefficients are aligned to 32 bytes,
-// 4x4 predictions to 16.
+// stride is given. Predictions of 16x16 and 8x8, arranged blocks and coefficients are aligned to 32
+// bytes, 4x4 predictions to 16.
 struct Kernels {
     const char* name;
 
     // ---- Distortion of the motion search ----
+    // The search samples a 16x16 block in four phases of 64 samples: phase 0 is even rows and even
+    // columns, 1 odd rows and odd columns, 2 odd rows and even columns, 3 even rows and odd
+    // columns.
 
-    // Splits a 16x16 block into its four sampling phases, 8 rows of 16 samples each (512 samples):
-    // phase 0 even rows and even columns, 1 odd rows and odd columns, 2 odd rows and even columns,
-    // 3 even rows and odd columns. A sample of another column parity is stored as 0.
-    void (*split_phases)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* phases);
+    // Arranges a block as the kernels below read it: its rows in the order 0, 8, 1, 9 .. 7, 15,
+    // then phases 0 and 1 as a checkerboard of 8 rows, of which row n stems from rows 2n and 2n +
+    // 1, in the order 0, 4, 1, 5 .. 3, 7 (kArrangedBlock bytes).
+    void (*arrange_block)(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* block);
 
-    // SADs between the block that split_phases was given and the block at ref: sums[0] of phase 0,
-    // sums[1] of phases 0 and 1. The x4 forms do this for four blocks, and for four rounded
-    // averages (a + b + 1) >> 1 of two blocks each: first[n] and second[n] are sums[0] and sums[1]
-    // of block n.
-    void (*sad_first_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
-                             std::ptrdiff_t stride, int* sums);
-    void (*sad_first_phases_x4)(const std::uint8_t* phases, const std::uint8_t* const* refs,
-                                std::ptrdiff_t stride, int* first, int* second);
-    void (*sad_first_phases_average_x4)(const std::uint8_t* phases, const std::uint8_t* const* a,
-                                        const std::uint8_t* const* b, std::ptrdiff_t stride,
-                                        int* first, int* second);
+    // SADs between an arranged block and the block at ref, or the rounded averages (a + b + 1) >> 1
+    // of those at a and b: sums[n] of the phases up to n.
+    void (*phase_sads)(const std::uint8_t* block, const std::uint8_t* ref, std::ptrdiff_t stride,
+                       int* sums);
+    void (*phase_sads_average)(const std::uint8_t* block, const std::uint8_t* a,
+                               const std::uint8_t* b, std::ptrdiff_t stride, int* sums);
 
-    // The other two: sums[0] of phase 2, sums[1] of phases 2 and 3.
-    void (*sad_last_phases)(const std::uint8_t* phases, const std::uint8_t* ref,
-                            std::ptrdiff_t stride, int* sums);
-    void (*sad_last_phases_average)(const std::uint8_t* phases, const std::uint8_t* a,
-                                    const std::uint8_t* b, std::ptrdiff_t stride, int* sums);
+    // Which candidates have a SAD of phases 0 and 1 below their limit: bit n of the result,
+    // candidate n. x4, x8: the candidates are the blocks at refs. Star: the averages of centre and
+    // each of eight. Cross: the averages of centre and each of four, then those of refs 0 and 1, 2
+    // and 1, 0 and 3, 2 and 3 (kCrossPairs).
+    std::uint32_t (*first_phases_below_x4)(const std::uint8_t* block,
+                                           const std::uint8_t* const* refs, std::ptrdiff_t stride,
+                                           const std::int32_t* limits);
+    std::uint32_t (*first_phases_below_x8)(const std::uint8_t* block,
+                                           const std::uint8_t* const* refs, std::ptrdiff_t stride,
+                                           const std::int32_t* limits);
+    std::uint32_t (*first_phases_below_star)(const std::uint8_t* block, const std::uint8_t* centre,
+                                             const std::uint8_t* const* refs, std::ptrdiff_t stride,
+                                             const std::int32_t* limits);
+    std::uint32_t (*first_phases_below_cross)(const std::uint8_t* block, const std::uint8_t* centre,
+                                              const std::uint8_t* const* refs,
+                                              std::ptrdiff_t stride, const std::int32_t* limits);
 
     // ---- Reference planes ----
 

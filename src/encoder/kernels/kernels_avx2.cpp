@@ -51,101 +51,169 @@ __m128i low_lane(__m256i v) {
 
 // ---- Distortion of the motion search ----
 
-__m256i even_columns() {
-    return _mm256_set1_epi16(0x00ff);
-}
 __m256i odd_columns() {
     return _mm256_set1_epi16(static_cast<short>(0xff00));
 }
 
-// SADs of phases p and p + 1 (p 0 or 2), two rows at a time, in four parts: those of phase p in the
-// even elements, those of phase p + 1 in the odd ones.
-template <typename TwoRows>
-[[gnu::always_inline]] inline __m256i two_phase_parts(const uint8_t* phases, int p,
-                                                      TwoRows two_rows) {
-    const __m256i columns[2] = {even_columns(), odd_columns()};
-    __m256i sad[2];
-    for (int n = 0; n < 2; ++n) {
-        const int first_row = p == 0 ? n : 1 - n;
-        sad[n] = _mm256_setzero_si256();
-        for (int row = 0; row < 8; row += 2) {
-            const __m256i samples = _mm256_and_si256(two_rows(2 * row + first_row), columns[n]);
-            sad[n] = _mm256_add_epi32(
-                sad[n], _mm256_sad_epu8(samples, load_aligned(phases + 128 * (p + n) + 16 * row)));
+// 16 samples of two rows of a block that are eight apart.
+__m256i two_rows(const uint8_t* row, ptrdiff_t stride) {
+    return join(load_16(row), load_16(row + 8 * stride));
+}
+
+// Checkerboard rows n and n + 4 from block rows 2n, 2n + 8 and 2n + 1, 2n + 9; row: row 2n.
+__m256i checkerboard(const uint8_t* row, ptrdiff_t stride) {
+    return _mm256_blendv_epi8(two_rows(row, stride), two_rows(row + stride, stride), odd_columns());
+}
+__m256i arranged_checkerboard(const uint8_t* block, int n) {
+    return load_aligned(block + 256 + 32 * n);
+}
+
+void arrange_block(const uint8_t* src, ptrdiff_t stride, uint8_t* block) {
+    for (int n = 0; n < 4; ++n, src += 2 * stride) {
+        const __m256i even = two_rows(src, stride);
+        const __m256i odd = two_rows(src + stride, stride);
+        store_32(block + 64 * n, even);
+        store_32(block + 64 * n + 32, odd);
+        store_32(block + 256 + 32 * n, _mm256_blendv_epi8(even, odd, odd_columns()));
+    }
+}
+
+// Adds up four vectors of 64-bit sums that are each below 2^14: sum n in 16-bit lane n of either
+// half of a lane.
+__m256i pack_sums(const __m256i* sums) {
+    const __m256i pair = _mm256_or_si256(sums[0], _mm256_slli_epi64(sums[1], 16));
+    return _mm256_or_si256(
+        pair, _mm256_or_si256(_mm256_slli_epi64(sums[2], 32), _mm256_slli_epi64(sums[3], 48)));
+}
+
+// two_rows_of(n): block rows n and n + 8 of what the block is compared with.
+template <typename TwoRowsOf>
+[[gnu::always_inline]] inline void add_phases(const uint8_t* block, TwoRowsOf two_rows_of,
+                                              int* sums) {
+    const __m256i even_columns = _mm256_set1_epi16(0x00ff);
+    // All columns of even rows, phase 0 of them, all columns of odd rows, phase 2 of them.
+    __m256i parts[4] = {_mm256_setzero_si256(), _mm256_setzero_si256(), _mm256_setzero_si256(),
+                        _mm256_setzero_si256()};
+    for (int n = 0; n < 8; ++n) {
+        const __m256i a = load_aligned(block + 32 * n);
+        const __m256i b = two_rows_of(n);
+        __m256i* part = parts + 2 * (n & 1);
+        part[0] = _mm256_add_epi32(part[0], _mm256_sad_epu8(a, b));
+        part[1] = _mm256_add_epi32(part[1], _mm256_sad_epu8(_mm256_and_si256(a, even_columns),
+                                                            _mm256_and_si256(b, even_columns)));
+    }
+    const __m256i packed = pack_sums(parts);
+    const __m128i lanes = _mm_add_epi16(low_lane(packed), high_lane(packed));
+    const __m128i totals = _mm_cvtepu16_epi32(_mm_add_epi16(lanes, _mm_srli_si128(lanes, 8)));
+    const int even = _mm_cvtsi128_si32(totals), phase_0 = _mm_extract_epi32(totals, 1);
+    const int odd = _mm_extract_epi32(totals, 2), phase_2 = _mm_extract_epi32(totals, 3);
+    sums[0] = phase_0;
+    sums[1] = phase_0 + odd - phase_2;
+    sums[2] = phase_0 + odd;
+    sums[3] = even + odd;
+}
+
+void phase_sads(const uint8_t* block, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    add_phases(
+        block, [=](int n) { return two_rows(ref + n * stride, stride); }, sums);
+}
+
+void phase_sads_average(const uint8_t* block, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
+                        int* sums) {
+    add_phases(
+        block,
+        [=](int n) {
+            return _mm256_avg_epu8(two_rows(a + n * stride, stride),
+                                   two_rows(b + n * stride, stride));
+        },
+        sums);
+}
+
+void add_sad(__m256i* sum, __m256i a, __m256i b) {
+    *sum = _mm256_add_epi32(*sum, _mm256_sad_epu8(a, b));
+}
+
+// Bit n: sum n is below limit n.
+uint32_t below_limits(const __m256i* sums, const int32_t* limits) {
+    const __m256i a = pack_sums(sums), b = pack_sums(sums + 4);
+    const __m256i lanes =
+        _mm256_add_epi16(_mm256_unpacklo_epi64(a, b), _mm256_unpackhi_epi64(a, b));
+    const __m256i totals = _mm256_cvtepu16_epi32(_mm_add_epi16(low_lane(lanes), high_lane(lanes)));
+    return static_cast<uint32_t>(
+        _mm256_movemask_ps(_mm256_castsi256_ps(_mm256_cmpgt_epi32(load_32(limits), totals))));
+}
+
+uint32_t first_phases_below_x4(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
+                               const int32_t* limits) {
+    __m256i sums[4] = {_mm256_setzero_si256(), _mm256_setzero_si256(), _mm256_setzero_si256(),
+                       _mm256_setzero_si256()};
+    for (int n = 0; n < 4; ++n) {
+        const __m256i current = arranged_checkerboard(block, n);
+        for (int i = 0; i < 4; ++i) {
+            add_sad(sums + i, current, checkerboard(refs[i] + 2 * n * stride, stride));
         }
     }
-    return _mm256_or_si256(sad[0], _mm256_slli_epi64(sad[1], 32));
+    const __m256i packed = pack_sums(sums);
+    const __m128i lanes = _mm_add_epi16(low_lane(packed), high_lane(packed));
+    const __m128i totals = _mm_cvtepu16_epi32(_mm_add_epi16(lanes, _mm_srli_si128(lanes, 8)));
+    return static_cast<uint32_t>(
+        _mm_movemask_ps(_mm_castsi128_ps(_mm_cmpgt_epi32(load_16(limits), totals))));
 }
 
-template <typename TwoRows>
-[[gnu::always_inline]] inline void two_phases(const uint8_t* phases, int p, TwoRows two_rows,
-                                              int* sums) {
-    const __m256i parts = two_phase_parts(phases, p, two_rows);
-    const __m128i lanes = _mm_add_epi32(low_lane(parts), high_lane(parts));
-    const __m128i sads = _mm_add_epi32(lanes, _mm_srli_si128(lanes, 8));
-    sums[0] = _mm_cvtsi128_si32(sads);
-    sums[1] = sums[0] + _mm_extract_epi32(sads, 1);
-}
-
-// The first two phases of four blocks; two_rows_of(n) is the row source of block n.
-template <typename TwoRowsOf>
-[[gnu::always_inline]] inline void first_phases_x4(const uint8_t* phases, int* first, int* second,
-                                                   TwoRowsOf two_rows_of) {
-    __m128i sads[2];  // phases 0 and 1 of two blocks each
-    for (int n = 0; n < 2; ++n) {
-        const __m256i a = two_phase_parts(phases, 0, two_rows_of(2 * n));
-        const __m256i b = two_phase_parts(phases, 0, two_rows_of(2 * n + 1));
-        const __m256i sums =
-            _mm256_add_epi32(_mm256_unpacklo_epi64(a, b), _mm256_unpackhi_epi64(a, b));
-        sads[n] = _mm_add_epi32(low_lane(sums), high_lane(sums));
+uint32_t first_phases_below_x8(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
+                               const int32_t* limits) {
+    __m256i sums[8];
+    for (__m256i& sum : sums) {
+        sum = _mm256_setzero_si256();
     }
-    const __m128i even = _mm_castps_si128(_mm_shuffle_ps(
-        _mm_castsi128_ps(sads[0]), _mm_castsi128_ps(sads[1]), _MM_SHUFFLE(2, 0, 2, 0)));
-    const __m128i odd = _mm_castps_si128(_mm_shuffle_ps(
-        _mm_castsi128_ps(sads[0]), _mm_castsi128_ps(sads[1]), _MM_SHUFFLE(3, 1, 3, 1)));
-    store_16(first, even);
-    store_16(second, _mm_add_epi32(even, odd));
+    for (int n = 0; n < 4; ++n) {
+        const __m256i current = arranged_checkerboard(block, n);
+        for (int i = 0; i < 8; ++i) {
+            add_sad(sums + i, current, checkerboard(refs[i] + 2 * n * stride, stride));
+        }
+    }
+    return below_limits(sums, limits);
 }
 
-auto two_rows_at(const uint8_t* ref, ptrdiff_t stride) {
-    return [=](int y) {
-        const uint8_t* row = ref + y * stride;
-        return join(load_16(row), load_16(row + 2 * stride));
-    };
+uint32_t first_phases_below_star(const uint8_t* block, const uint8_t* centre,
+                                 const uint8_t* const* refs, ptrdiff_t stride,
+                                 const int32_t* limits) {
+    __m256i sums[8];
+    for (__m256i& sum : sums) {
+        sum = _mm256_setzero_si256();
+    }
+    for (int n = 0; n < 4; ++n) {
+        const __m256i current = arranged_checkerboard(block, n);
+        const __m256i c = checkerboard(centre + 2 * n * stride, stride);
+        for (int i = 0; i < 8; ++i) {
+            add_sad(sums + i, current,
+                    _mm256_avg_epu8(c, checkerboard(refs[i] + 2 * n * stride, stride)));
+        }
+    }
+    return below_limits(sums, limits);
 }
 
-auto average_two_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
-    return [=](int y) {
-        const ptrdiff_t first = y * stride;
-        const ptrdiff_t second = first + 2 * stride;
-        return _mm256_avg_epu8(join(load_16(a + first), load_16(a + second)),
-                               join(load_16(b + first), load_16(b + second)));
-    };
-}
-
-void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 0, two_rows_at(ref, stride), sums);
-}
-
-void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                         int* first, int* second) {
-    first_phases_x4(phases, first, second, [=](int n) { return two_rows_at(refs[n], stride); });
-}
-
-void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
-                                 int* second) {
-    first_phases_x4(phases, first, second,
-                    [=](int n) { return average_two_rows_at(a[n], b[n], stride); });
-}
-
-void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, two_rows_at(ref, stride), sums);
-}
-
-void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                             ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, average_two_rows_at(a, b, stride), sums);
+uint32_t first_phases_below_cross(const uint8_t* block, const uint8_t* centre,
+                                  const uint8_t* const* refs, ptrdiff_t stride,
+                                  const int32_t* limits) {
+    __m256i sums[8];
+    for (__m256i& sum : sums) {
+        sum = _mm256_setzero_si256();
+    }
+    for (int n = 0; n < 4; ++n) {
+        const __m256i current = arranged_checkerboard(block, n);
+        const __m256i c = checkerboard(centre + 2 * n * stride, stride);
+        __m256i sides[4];
+        for (int i = 0; i < 4; ++i) {
+            sides[i] = checkerboard(refs[i] + 2 * n * stride, stride);
+            add_sad(sums + i, current, _mm256_avg_epu8(c, sides[i]));
+        }
+        for (int i = 0; i < 4; ++i) {
+            add_sad(sums + 4 + i, current,
+                    _mm256_avg_epu8(sides[kCrossPairs[i][0]], sides[kCrossPairs[i][1]]));
+        }
+    }
+    return below_limits(sums, limits);
 }
 
 // ---- Reference planes ----
@@ -688,11 +756,13 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
 Kernels with_avx2(const Kernels& base) {
     Kernels k = base;
     k.name = "avx2";
-    k.sad_first_phases = sad_first_phases;
-    k.sad_first_phases_x4 = sad_first_phases_x4;
-    k.sad_first_phases_average_x4 = sad_first_phases_average_x4;
-    k.sad_last_phases = sad_last_phases;
-    k.sad_last_phases_average = sad_last_phases_average;
+    k.arrange_block = arrange_block;
+    k.phase_sads = phase_sads;
+    k.phase_sads_average = phase_sads_average;
+    k.first_phases_below_x4 = first_phases_below_x4;
+    k.first_phases_below_x8 = first_phases_below_x8;
+    k.first_phases_below_star = first_phases_below_star;
+    k.first_phases_below_cross = first_phases_below_cross;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;

@@ -22,32 +22,49 @@ uint8_t clip_sample(int value) {
 
 // ---- Distortion of the motion search ----
 
-// First row and first column of each sampling phase.
-constexpr int kPhaseRow[4] = {0, 1, 1, 0};
-constexpr int kPhaseColumn[4] = {0, 1, 0, 1};
+// Row 0..7 of the two halves of an arranged block, and where it stands there.
+constexpr int arranged_position(int row, int rows) {
+    return 2 * (row % (rows / 2)) + row / (rows / 2);
+}
 
-void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
-    std::memset(phases, 0, 512);
-    for (int p = 0; p < 4; ++p) {
-        for (int row = 0; row < 8; ++row) {
-            for (int x = kPhaseColumn[p]; x < 16; x += 2) {
-                phases[128 * p + 16 * row + x] = src[(2 * row + kPhaseRow[p]) * stride + x];
+// Samples of an arranged block: of the block itself, and of the checkerboard.
+uint8_t* block_row(uint8_t* block, int y) {
+    return block + 16 * arranged_position(y, 16);
+}
+const uint8_t* block_row(const uint8_t* block, int y) {
+    return block + 16 * arranged_position(y, 16);
+}
+uint8_t* checkerboard_row(uint8_t* block, int n) {
+    return block + 256 + 16 * arranged_position(n, 8);
+}
+
+void arrange_block(const uint8_t* src, ptrdiff_t stride, uint8_t* block) {
+    for (int y = 0; y < 16; ++y) {
+        for (int x = 0; x < 16; ++x) {
+            const uint8_t sample = src[y * stride + x];
+            block_row(block, y)[x] = sample;
+            if ((x + y) % 2 == 0) {
+                checkerboard_row(block, y / 2)[x] = sample;
             }
         }
     }
 }
 
-// SAD of phase p, and of phases p and p + 1; sample(y, x) is the sample to compare with.
+// First row and first column of each sampling phase.
+constexpr int kPhaseRow[4] = {0, 1, 1, 0};
+constexpr int kPhaseColumn[4] = {0, 1, 0, 1};
+
+// SADs of the phases up to each; sample(y, x) is the sample to compare with.
 template <typename Sample>
-void two_phases(const uint8_t* phases, int p, Sample sample, int* sums) {
+void add_phases(const uint8_t* block, Sample sample, int* sums) {
     int sum = 0;
-    for (int n = 0; n < 2; ++n, ++p) {
-        for (int row = 0; row < 8; ++row) {
+    for (int p = 0; p < 4; ++p) {
+        for (int y = kPhaseRow[p]; y < 16; y += 2) {
             for (int x = kPhaseColumn[p]; x < 16; x += 2) {
-                sum += std::abs(phases[128 * p + 16 * row + x] - sample(2 * row + kPhaseRow[p], x));
+                sum += std::abs(block_row(block, y)[x] - sample(y, x));
             }
         }
-        sums[n] = sum;
+        sums[p] = sum;
     }
 }
 
@@ -59,38 +76,56 @@ auto averages_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
     return [=](int y, int x) { return (a[y * stride + x] + b[y * stride + x] + 1) >> 1; };
 }
 
-void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 0, samples_at(ref, stride), sums);
+void phase_sads(const uint8_t* block, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    add_phases(block, samples_at(ref, stride), sums);
 }
 
-void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                         int* first, int* second) {
-    for (int n = 0; n < 4; ++n) {
-        int sums[2];
-        two_phases(phases, 0, samples_at(refs[n], stride), sums);
-        first[n] = sums[0];
-        second[n] = sums[1];
+void phase_sads_average(const uint8_t* block, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
+                        int* sums) {
+    add_phases(block, averages_at(a, b, stride), sums);
+}
+
+template <typename Sample>
+bool first_phases_below(const uint8_t* block, Sample sample, int32_t limit) {
+    int sums[4];
+    add_phases(block, sample, sums);
+    return sums[1] < limit;
+}
+
+template <int kCount>
+uint32_t first_phases_below(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
+                            const int32_t* limits) {
+    uint32_t below = 0;
+    for (int n = 0; n < kCount; ++n) {
+        below |= uint32_t{first_phases_below(block, samples_at(refs[n], stride), limits[n])} << n;
     }
+    return below;
 }
 
-void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
-                                 int* second) {
-    for (int n = 0; n < 4; ++n) {
-        int sums[2];
-        two_phases(phases, 0, averages_at(a[n], b[n], stride), sums);
-        first[n] = sums[0];
-        second[n] = sums[1];
+// The averages of centre and each of kCount blocks.
+template <int kCount>
+uint32_t averages_below(const uint8_t* block, const uint8_t* centre, const uint8_t* const* refs,
+                        ptrdiff_t stride, const int32_t* limits) {
+    uint32_t below = 0;
+    for (int n = 0; n < kCount; ++n) {
+        below |=
+            uint32_t{first_phases_below(block, averages_at(centre, refs[n], stride), limits[n])}
+            << n;
     }
+    return below;
 }
 
-void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, samples_at(ref, stride), sums);
-}
-
-void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                             ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, averages_at(a, b, stride), sums);
+uint32_t first_phases_below_cross(const uint8_t* block, const uint8_t* centre,
+                                  const uint8_t* const* refs, ptrdiff_t stride,
+                                  const int32_t* limits) {
+    uint32_t below = averages_below<4>(block, centre, refs, stride, limits);
+    for (int n = 0; n < 4; ++n) {
+        const uint8_t* a = refs[kCrossPairs[n][0]];
+        const uint8_t* b = refs[kCrossPairs[n][1]];
+        below |= uint32_t{first_phases_below(block, averages_at(a, b, stride), limits[4 + n])}
+                 << (4 + n);
+    }
+    return below;
 }
 
 // ---- Reference planes ----
@@ -531,12 +566,13 @@ void deblock_chroma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha,
 const Kernels& scalar_kernels() {
     static const Kernels table = {
         "scalar",
-        split_phases,
-        sad_first_phases,
-        sad_first_phases_x4,
-        sad_first_phases_average_x4,
-        sad_last_phases,
-        sad_last_phases_average,
+        arrange_block,
+        phase_sads,
+        phase_sads_average,
+        first_phases_below<4>,
+        first_phases_below<8>,
+        averages_below<8>,
+        first_phases_below_cross,
         extend_edges,
         half_vertical_row,
         half_horizontal_row,

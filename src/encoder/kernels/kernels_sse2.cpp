@@ -58,84 +58,131 @@ __m128i absolute_32(__m128i v) {
 
 // ---- Distortion of the motion search ----
 
-// Masks of the even and of the odd columns; the phases' rows and columns are those of Kernels.h.
 __m128i even_columns() {
     return _mm_set1_epi16(0x00ff);
 }
-__m128i odd_columns() {
-    return _mm_set1_epi16(static_cast<short>(0xff00));
+
+// A checkerboard row from an even row and the odd row below it.
+__m128i checkerboard(__m128i even, __m128i odd) {
+    return _mm_or_si128(_mm_and_si128(even, even_columns()), _mm_andnot_si128(even_columns(), odd));
+}
+__m128i checkerboard(const uint8_t* row, ptrdiff_t stride) {
+    return checkerboard(load(row), load(row + stride));
 }
 
-void split_phases(const uint8_t* src, ptrdiff_t stride, uint8_t* phases) {
-    for (int row = 0; row < 8; ++row) {
-        const __m128i even = load(src + 2 * row * stride);
-        const __m128i odd = load(src + (2 * row + 1) * stride);
-        store(phases + 16 * row, _mm_and_si128(even, even_columns()));
-        store(phases + 128 + 16 * row, _mm_and_si128(odd, odd_columns()));
-        store(phases + 256 + 16 * row, _mm_and_si128(odd, even_columns()));
-        store(phases + 384 + 16 * row, _mm_and_si128(even, odd_columns()));
+// Where row n of an arranged block's samples and of its checkerboard stands.
+constexpr int block_row(int n) {
+    return 32 * (n & 7) + 16 * (n >> 3);
+}
+constexpr int checkerboard_row(int n) {
+    return 256 + 32 * (n & 3) + 16 * (n >> 2);
+}
+
+void arrange_block(const uint8_t* src, ptrdiff_t stride, uint8_t* block) {
+    for (int n = 0; n < 8; ++n) {
+        const __m128i even = load(src + 2 * n * stride);
+        const __m128i odd = load(src + (2 * n + 1) * stride);
+        store(block + block_row(2 * n), even);
+        store(block + block_row(2 * n + 1), odd);
+        store(block + checkerboard_row(n), checkerboard(even, odd));
     }
 }
 
-// SAD of phase p, and of phases p and p + 1 (p 0 or 2); sample_row(y) gives 16 samples of row y.
-template <typename SampleRow>
-void two_phases(const uint8_t* phases, int p, SampleRow sample_row, int* sums) {
-    const __m128i columns[2] = {even_columns(), odd_columns()};
-    __m128i sad[2];
-    for (int n = 0; n < 2; ++n) {
-        const int first_row = p == 0 ? n : 1 - n;
-        sad[n] = _mm_setzero_si128();
-        for (int row = 0; row < 8; ++row) {
-            const __m128i samples = _mm_and_si128(sample_row(2 * row + first_row), columns[n]);
-            sad[n] = _mm_add_epi32(
-                sad[n], _mm_sad_epu8(samples, load_aligned(phases + 128 * (p + n) + 16 * row)));
+int add_halves(__m128i sum) {
+    return _mm_cvtsi128_si32(_mm_add_epi32(sum, _mm_srli_si128(sum, 8)));
+}
+
+// row(n): row n of what the block is compared with.
+template <typename Row>
+void add_phases(const uint8_t* block, Row row, int* sums) {
+    __m128i all[2], even[2];  // all and the even columns, of even and of odd rows
+    for (int parity = 0; parity < 2; ++parity) {
+        all[parity] = even[parity] = _mm_setzero_si128();
+        for (int n = parity; n < 16; n += 2) {
+            const __m128i a = load_aligned(block + block_row(n));
+            const __m128i b = row(n);
+            all[parity] = _mm_add_epi32(all[parity], _mm_sad_epu8(a, b));
+            even[parity] = _mm_add_epi32(
+                even[parity],
+                _mm_sad_epu8(_mm_and_si128(a, even_columns()), _mm_and_si128(b, even_columns())));
         }
-        sad[n] = _mm_add_epi32(sad[n], _mm_srli_si128(sad[n], 8));
     }
-    sums[0] = _mm_cvtsi128_si32(sad[0]);
-    sums[1] = sums[0] + _mm_cvtsi128_si32(sad[1]);
+    sums[0] = add_halves(even[0]);
+    sums[2] = sums[0] + add_halves(all[1]);
+    sums[1] = sums[2] - add_halves(even[1]);
+    sums[3] = add_halves(all[0]) + sums[2] - sums[0];
 }
 
-auto rows_at(const uint8_t* ref, ptrdiff_t stride) {
-    return [=](int y) { return load(ref + y * stride); };
+void phase_sads(const uint8_t* block, const uint8_t* ref, ptrdiff_t stride, int* sums) {
+    add_phases(
+        block, [=](int n) { return load(ref + n * stride); }, sums);
 }
 
-auto average_rows_at(const uint8_t* a, const uint8_t* b, ptrdiff_t stride) {
-    return [=](int y) { return _mm_avg_epu8(load(a + y * stride), load(b + y * stride)); };
+void phase_sads_average(const uint8_t* block, const uint8_t* a, const uint8_t* b, ptrdiff_t stride,
+                        int* sums) {
+    add_phases(
+        block, [=](int n) { return _mm_avg_epu8(load(a + n * stride), load(b + n * stride)); },
+        sums);
 }
 
-void sad_first_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 0, rows_at(ref, stride), sums);
+// Whether the SAD of the checkerboard and rows(n), row n of another one, is below the limit.
+template <typename Rows>
+bool first_phases_below(const uint8_t* block, Rows rows, int32_t limit) {
+    __m128i sum = _mm_setzero_si128();
+    for (int n = 0; n < 8; ++n) {
+        sum = _mm_add_epi32(sum, _mm_sad_epu8(load_aligned(block + checkerboard_row(n)), rows(n)));
+    }
+    return add_halves(sum) < limit;
 }
 
-void sad_first_phases_x4(const uint8_t* phases, const uint8_t* const* refs, ptrdiff_t stride,
-                         int* first, int* second) {
-    for (int n = 0; n < 4; ++n) {
-        int sums[2];
-        two_phases(phases, 0, rows_at(refs[n], stride), sums);
-        first[n] = sums[0];
-        second[n] = sums[1];
+template <int kCount>
+uint32_t first_phases_below(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
+                            const int32_t* limits) {
+    uint32_t below = 0;
+    for (int i = 0; i < kCount; ++i) {
+        const auto rows = [=](int n) { return checkerboard(refs[i] + 2 * n * stride, stride); };
+        below |= uint32_t{first_phases_below(block, rows, limits[i])} << i;
+    }
+    return below;
+}
+
+void gather_checkerboard(const uint8_t* src, ptrdiff_t stride, __m128i* rows) {
+    for (int n = 0; n < 8; ++n) {
+        rows[n] = checkerboard(src + 2 * n * stride, stride);
     }
 }
 
-void sad_first_phases_average_x4(const uint8_t* phases, const uint8_t* const* a,
-                                 const uint8_t* const* b, ptrdiff_t stride, int* first,
-                                 int* second) {
-    for (int n = 0; n < 4; ++n) {
-        int sums[2];
-        two_phases(phases, 0, average_rows_at(a[n], b[n], stride), sums);
-        first[n] = sums[0];
-        second[n] = sums[1];
+uint32_t first_phases_below_star(const uint8_t* block, const uint8_t* centre,
+                                 const uint8_t* const* refs, ptrdiff_t stride,
+                                 const int32_t* limits) {
+    __m128i c[8];
+    gather_checkerboard(centre, stride, c);
+    uint32_t below = 0;
+    for (int i = 0; i < 8; ++i) {
+        const auto rows = [&](int n) {
+            return _mm_avg_epu8(c[n], checkerboard(refs[i] + 2 * n * stride, stride));
+        };
+        below |= uint32_t{first_phases_below(block, rows, limits[i])} << i;
     }
+    return below;
 }
 
-void sad_last_phases(const uint8_t* phases, const uint8_t* ref, ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, rows_at(ref, stride), sums);
-}
-
-void sad_last_phases_average(const uint8_t* phases, const uint8_t* a, const uint8_t* b,
-                             ptrdiff_t stride, int* sums) {
-    two_phases(phases, 2, average_rows_at(a, b, stride), sums);
+uint32_t first_phases_below_cross(const uint8_t* block, const uint8_t* centre,
+                                  const uint8_t* const* refs, ptrdiff_t stride,
+                                  const int32_t* limits) {
+    __m128i boards[5][8];  // the four, and the centre
+    for (int i = 0; i < 4; ++i) {
+        gather_checkerboard(refs[i], stride, boards[i]);
+    }
+    gather_checkerboard(centre, stride, boards[4]);
+    uint32_t below = 0;
+    for (int i = 0; i < 8; ++i) {
+        const __m128i* a = boards[i < 4 ? 4 : kCrossPairs[i - 4][0]];
+        const __m128i* b = boards[i < 4 ? i : kCrossPairs[i - 4][1]];
+        const auto rows = [=](int n) { return _mm_avg_epu8(a[n], b[n]); };
+        below |= uint32_t{first_phases_below(block, rows, limits[i])} << i;
+    }
+    return below;
 }
 
 // ---- Reference planes ----
@@ -776,12 +823,13 @@ void deblock_chroma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, i
 Kernels with_sse2(const Kernels& base) {
     Kernels k = base;
     k.name = "sse2";
-    k.split_phases = split_phases;
-    k.sad_first_phases = sad_first_phases;
-    k.sad_first_phases_x4 = sad_first_phases_x4;
-    k.sad_first_phases_average_x4 = sad_first_phases_average_x4;
-    k.sad_last_phases = sad_last_phases;
-    k.sad_last_phases_average = sad_last_phases_average;
+    k.arrange_block = arrange_block;
+    k.phase_sads = phase_sads;
+    k.phase_sads_average = phase_sads_average;
+    k.first_phases_below_x4 = first_phases_below<4>;
+    k.first_phases_below_x8 = first_phases_below<8>;
+    k.first_phases_below_star = first_phases_below_star;
+    k.first_phases_below_cross = first_phases_below_cross;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
     k.copy_16x16 = copy_16x16;
