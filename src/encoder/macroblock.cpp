@@ -76,16 +76,17 @@ void CEncoder::setMBOffsets() {
     g_intra_lambda = g_sad_lambda;
 }
 
-// Asks for samples of the reference that macroblocks further right will read, four rows of luma and
-// one of either chroma plane at a time: 64 bytes are 4 macroblocks of luma and 8 of chroma.
+// Asks for the samples of the reference that the macroblock row below will read first: a cache line
+// of four rows of luma and of one row of either chroma plane at a time, since 64 bytes are 4
+// macroblocks of luma and 8 of chroma.
 void CEncoder::prefetch_reference() const {
     const std::ptrdiff_t luma_row = 16 * g_mb_y + 16 + 4 * (g_mb_x & 3);
-    const std::uint8_t* luma = g_ref_y + luma_row * g_stride_luma + 16 * g_mb_x + 64;
+    const std::uint8_t* luma = g_ref_y + luma_row * g_stride_luma + 16 * g_mb_x;
     for (int row = 0; row < 4; ++row) {
         zolt::prefetch(luma + row * static_cast<std::ptrdiff_t>(g_stride_luma));
     }
-    const std::ptrdiff_t chroma =
-        static_cast<std::ptrdiff_t>(8 * g_mb_y + (g_mb_x & 7)) * g_stride_chroma + 8 * g_mb_x + 64;
+    const std::ptrdiff_t chroma_row = 8 * g_mb_y + 8 + (g_mb_x & 7);
+    const std::ptrdiff_t chroma = chroma_row * g_stride_chroma + 8 * g_mb_x;
     zolt::prefetch(g_ref_u + chroma);
     zolt::prefetch(g_ref_v + chroma);
 }
