@@ -227,8 +227,8 @@ public:
     void quantTransform_luma_16x16();
     void quantTransform_luma_16x16P();
     void quantTransform_chroma();
-    std::uint32_t quantize_chroma_dc(int component, const int* c, const zolt::Quantizer& quantizer,
-                                     std::int16_t* coefs);
+    std::uint32_t quantize_chroma_dc(int component, const std::int16_t* c,
+                                     const zolt::Quantizer& quantizer, std::int16_t* coefs);
 
     // ---- intrapredict: clause 8.3 ----
     // The 13 neighbours of the 4x4 block at src: L, K, J, I, M, A..H. Where A..D or I..L or M are

@@ -119,8 +119,8 @@ void CEncoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
         g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
     g_kernels->transform_4x4(block, g_stride_luma, pred, coefs);
-    const unsigned coded = g_kernels->quantize(coefs, 1, q, g_scan_levels + 16 * k, g_nonzero + k);
-    g_luma_mask |= coded << k;
+    const bool coded = g_kernels->quantize(coefs, q, g_scan_levels + 16 * k, g_nonzero + k);
+    g_luma_mask |= (coded ? 1u : 0u) << k;
     if (coded) {
         g_kernels->reconstruct_4x4(coefs, pred, block, g_stride_luma);
     } else {
@@ -133,16 +133,13 @@ void CEncoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
 // Intra 16x16 luma (clause 8.5.2): the DC coefficients have a transform of their own.
 void CEncoder::quantTransform_luma_16x16() {
     const Quantizer& q = zolt::intra_quantizer(g_mbQp);
-    g_kernels->transform_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, g_mb_coefs);
-
+    std::int16_t constant[16];
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, q, constant,
+                                                 g_mb_coefs, g_scan_levels, g_nonzero);
     int dc[16];
     for (int r = 0; r < 16; ++r) {
-        std::int16_t& coef = g_mb_coefs[16 * kDecodingOrder[r]];
-        dc[r] = coef;
-        coef = 0;
+        dc[r] = constant[kDecodingOrder[r]];
     }
-    g_luma_mask = g_kernels->quantize(g_mb_coefs, 16, q, g_scan_levels, g_nonzero);
-
     hadamard_4x4(dc);
     for (int r = 0; r < 16; ++r) {
         const int level = quantize_dc(dc[r] >> 1, q);
@@ -162,9 +159,9 @@ void CEncoder::quantTransform_luma_16x16() {
 
 // Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
 void CEncoder::quantTransform_luma_16x16P() {
-    g_kernels->transform_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, g_mb_coefs);
-    g_luma_mask = g_kernels->quantize(g_mb_coefs, 16, zolt::inter_quantizer(g_mbQp), g_scan_levels,
-                                      g_nonzero);
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, g_stride_luma, g_mb_pred,
+                                                 zolt::inter_quantizer(g_mbQp), nullptr, g_mb_coefs,
+                                                 g_scan_levels, g_nonzero);
     int macroblock_cost = 0;
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
         const unsigned blocks = 0xfu << (4 * block8x8);
@@ -196,14 +193,10 @@ void CEncoder::quantTransform_chroma() {
         const std::uint8_t* pred = g_mb_pred + 256 + 64 * component;
         std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
         std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
-        g_kernels->transform_8x8(samples, g_stride_chroma, pred, coefs);
-        int dc[4];
-        for (int b = 0; b < 4; ++b) {
-            dc[b] = coefs[16 * b];
-            coefs[16 * b] = 0;
-        }
-        const std::uint32_t ac_mask = g_kernels->quantize(
-            coefs, 4, q, g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
+        std::int16_t dc[4];
+        const std::uint32_t ac_mask = g_kernels->code_residual_8x8(
+            samples, g_stride_chroma, pred, q, dc, coefs, g_scan_levels + 256 + 64 * component,
+            g_nonzero + 16 + 4 * component);
         const std::uint32_t dc_mask = quantize_chroma_dc(component, dc, q, coefs);
         g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples, g_stride_chroma);
         g_chroma_ac_mask |= ac_mask << (4 * component);
@@ -212,8 +205,8 @@ void CEncoder::quantTransform_chroma() {
 
 // The DC coefficients c of a component's four blocks have a 2x2 transform of their own. Writes
 // their levels, and their scaled values to coefs; returns the mask of the blocks that have one.
-std::uint32_t CEncoder::quantize_chroma_dc(int component, const int* c, const Quantizer& quantizer,
-                                           std::int16_t* coefs) {
+std::uint32_t CEncoder::quantize_chroma_dc(int component, const std::int16_t* c,
+                                           const Quantizer& quantizer, std::int16_t* coefs) {
     const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
                       c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
     const int largest = std::max({std::abs(f[0]), std::abs(f[1]), std::abs(f[2]), std::abs(f[3])});

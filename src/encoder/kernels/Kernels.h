@@ -98,22 +98,31 @@ struct Kernels {
 
     // ---- Residual ----
 
-    // Prediction error and forward core transform. Luma: 16 blocks in decoding order (Figure 6-10);
-    // chroma: the four blocks of one 8x8 component in raster order; one 4x4 block.
-    void (*transform_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
-                            const std::uint8_t* pred, std::int16_t* coefs);
-    void (*transform_8x8)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
-                          std::int16_t* coefs);
+    // Prediction error and forward core transform of one 4x4 block.
     void (*transform_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
                           std::int16_t* coefs);
 
-    // Quantises count blocks of 16 coefficients: level = sign(c) * min((|c| * forward + rounding)
-    // >> shift, kMaxLevel). Writes each block's levels in zig-zag order (clause 8.5.6, frame) to
-    // scan and the mask of its levels that are not 0 to nonzero (bit n: scan position n), and
-    // replaces the coefficients by level * dequant. Returns bit b set when block b has a level
-    // other than 0. Needs |c| < 2^15 and |c| * forward + rounding < 2^31.
-    std::uint32_t (*quantize)(std::int16_t* coefs, int count, const Quantizer& quantizer,
-                              std::int16_t* scan, std::uint16_t* nonzero);
+    // Quantises the 16 coefficients of a block: level = sign(c) * min((|c| * forward + rounding) >>
+    // shift, kMaxLevel). Writes the levels in zig-zag order (clause 8.5.6, frame) to scan and the
+    // mask of those that are not 0 to *nonzero (bit n: scan position n), and replaces the
+    // coefficients by level * dequant. Returns whether there is a level other than 0. Needs |c| <
+    // 2^15 and |c| * forward + rounding < 2^31.
+    bool (*quantize)(std::int16_t* coefs, const Quantizer& quantizer, std::int16_t* scan,
+                     std::uint16_t* nonzero);
+
+    // Both for the 16 luma blocks of a macroblock in decoding order (Figure 6-10), and for the four
+    // blocks of an 8x8 chroma component in raster order; bit b of the result: block b has a level
+    // other than 0. Of a block that has none only the nonzero mask is written. With dc, which takes
+    // one value a block, the constant coefficients go there and 0 stands in for them, and the
+    // coefficients of blocks without levels are set to 0.
+    std::uint32_t (*code_residual_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
+                                         const std::uint8_t* pred, const Quantizer& quantizer,
+                                         std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
+                                         std::uint16_t* nonzero);
+    std::uint32_t (*code_residual_8x8)(const std::uint8_t* src, std::ptrdiff_t stride,
+                                       const std::uint8_t* pred, const Quantizer& quantizer,
+                                       std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
+                                       std::uint16_t* nonzero);
 
     // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and
     // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction. Needs |c| <

@@ -387,55 +387,6 @@ void transpose_four(__m256i* v) {
     v[3] = _mm256_unpackhi_epi64(even_23, odd_23);
 }
 
-// Coefficients of four blocks from the rows of their residual; blocks[0], [1] in the low lane.
-[[gnu::always_inline]] inline void transform_four(__m256i* v, int16_t* const* blocks) {
-    forward_butterfly(v);
-    transpose_four(v);
-    forward_butterfly(v);
-    const __m256i even_01 = _mm256_unpacklo_epi64(v[0], v[1]);
-    const __m256i even_23 = _mm256_unpacklo_epi64(v[2], v[3]);
-    const __m256i odd_01 = _mm256_unpackhi_epi64(v[0], v[1]);
-    const __m256i odd_23 = _mm256_unpackhi_epi64(v[2], v[3]);
-    store_32(blocks[0], _mm256_permute2x128_si256(even_01, even_23, 0x20));
-    store_32(blocks[1], _mm256_permute2x128_si256(odd_01, odd_23, 0x20));
-    store_32(blocks[2], _mm256_permute2x128_si256(even_01, even_23, 0x31));
-    store_32(blocks[3], _mm256_permute2x128_si256(odd_01, odd_23, 0x31));
-}
-
-// First block in decoding order of block row r of a 16x16 block (Figure 6-10); its neighbours to
-// the right are 1, 4 and 5 blocks later.
-constexpr int first_in_row(int r) {
-    return 2 * (r & 1) + 8 * (r >> 1);
-}
-
-void transform_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    for (int r = 0; r < 4; ++r, src += 4 * stride, pred += 64) {
-        __m256i v[4];
-        for (int y = 0; y < 4; ++y) {
-            v[y] = _mm256_sub_epi16(_mm256_cvtepu8_epi16(load_16(src + y * stride)),
-                                    _mm256_cvtepu8_epi16(load_16(pred + 16 * y)));
-        }
-        int16_t* first = coefs + 16 * first_in_row(r);
-        int16_t* const blocks[4] = {first, first + 16, first + 64, first + 80};
-        transform_four(v, blocks);
-    }
-}
-
-// Rows y and y + 4 of an 8x8 block, one in each lane.
-__m256i two_rows_of_8(const uint8_t* p, ptrdiff_t stride) {
-    return _mm256_cvtepu8_epi16(_mm_unpacklo_epi64(load_8(p), load_8(p + 4 * stride)));
-}
-
-void transform_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    __m256i v[4];
-    for (int y = 0; y < 4; ++y) {
-        v[y] = _mm256_sub_epi16(two_rows_of_8(src + y * stride, stride),
-                                two_rows_of_8(pred + 8 * y, 8));
-    }
-    int16_t* const blocks[4] = {coefs, coefs + 16, coefs + 32, coefs + 48};
-    transform_four(v, blocks);
-}
-
 // Puts 16 coefficients kept column by column into zig-zag order (Kernels.h, zigzag.h).
 __m256i zigzag(__m256i v) {
     constexpr char x = -1;              // from the other lane
@@ -452,26 +403,21 @@ __m256i zigzag(__m256i v) {
     return join(first, second);
 }
 
-uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t* scan,
-                  uint16_t* nonzero) {
-    const __m256i zero = _mm256_setzero_si256();
-    const __m256i dead_zone = load_aligned(quantizer.dead_zone);
-    const __m256i forward = load_aligned(quantizer.forward);
-    const __m256i dequant = load_aligned(quantizer.dequant);
-    const __m256i rounding = _mm256_set1_epi32(quantizer.rounding);
-    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
-    const __m256i largest = _mm256_set1_epi16(kMaxLevel);
-    uint32_t mask = 0;
-    for (int block = 0; block < count; ++block, coefs += 16, scan += 16) {
-        const __m256i c = load_aligned(coefs);
+// A quantiser in vectors.
+struct VectorQuantizer {
+    __m256i forward, dequant, rounding, largest;
+    __m128i shift;
+
+    explicit VectorQuantizer(const Quantizer& q)
+        : forward(load_aligned(q.forward)),
+          dequant(load_aligned(q.dequant)),
+          rounding(_mm256_set1_epi32(q.rounding)),
+          largest(_mm256_set1_epi16(kMaxLevel)),
+          shift(_mm_cvtsi32_si128(q.shift)) {}
+
+    // Quantises a block; returns the mask of its levels.
+    uint16_t quantize(__m256i c, int16_t* coefs, int16_t* scan) const {
         const __m256i magnitude = _mm256_abs_epi16(c);
-        const __m256i coded = _mm256_cmpgt_epi16(magnitude, dead_zone);
-        if (_mm256_testz_si256(coded, coded)) {
-            store_32(coefs, zero);
-            store_32(scan, zero);
-            nonzero[block] = 0;
-            continue;
-        }
         const __m256i low = _mm256_mullo_epi16(magnitude, forward);
         const __m256i high = _mm256_mulhi_epu16(magnitude, forward);
         const __m256i first =
@@ -485,10 +431,115 @@ uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t
         store_32(scan, in_order);
         const __m128i bytes = _mm_packs_epi16(low_lane(in_order), high_lane(in_order));
         const int zeros = _mm_movemask_epi8(_mm_cmpeq_epi8(bytes, _mm_setzero_si128()));
-        nonzero[block] = static_cast<uint16_t>(~zeros);
-        mask |= 1u << block;
+        return static_cast<uint16_t>(~zeros);
     }
-    return mask;
+};
+
+bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
+    const __m256i c = load_aligned(coefs);
+    const __m256i coded =
+        _mm256_cmpgt_epi16(_mm256_abs_epi16(c), load_aligned(quantizer.dead_zone));
+    if (_mm256_testz_si256(coded, coded)) {
+        store_32(coefs, _mm256_setzero_si256());
+        store_32(scan, _mm256_setzero_si256());
+        *nonzero = 0;
+        return false;
+    }
+    *nonzero = VectorQuantizer(quantizer).quantize(c, coefs, scan);
+    return true;
+}
+
+// Codes four blocks from the rows of their residual, blocks 0 and 1 in the low lane. kStep: how
+// many blocks after block 0 block 2 stands in coefs, scan, nonzero and dc. Returns the mask of the
+// coded ones, by that order too.
+template <int kStep>
+[[gnu::always_inline]] inline uint32_t code_four(__m256i* v, const Quantizer& quantizer,
+                                                 int16_t* dc, int16_t* coefs, int16_t* scan,
+                                                 uint16_t* nonzero) {
+    constexpr int kPlace[4] = {0, 1, kStep, kStep + 1};
+    forward_butterfly(v);
+    transpose_four(v);
+    forward_butterfly(v);  // now vector j holds column j, 64 bits a block
+    if (dc) {
+        dc[0] = static_cast<int16_t>(_mm256_extract_epi16(v[0], 0));
+        dc[1] = static_cast<int16_t>(_mm256_extract_epi16(v[0], 4));
+        dc[kStep] = static_cast<int16_t>(_mm256_extract_epi16(v[0], 8));
+        dc[kStep + 1] = static_cast<int16_t>(_mm256_extract_epi16(v[0], 12));
+        v[0] = _mm256_and_si256(v[0], _mm256_set1_epi64x(~0xffffLL));
+    }
+    __m256i beyond = _mm256_setzero_si256();
+    for (int j = 0; j < 4; ++j) {
+        const __m256i dead_zone = _mm256_broadcastq_epi64(load_8(quantizer.dead_zone + 4 * j));
+        beyond = _mm256_or_si256(beyond, _mm256_cmpgt_epi16(_mm256_abs_epi16(v[j]), dead_zone));
+    }
+    const __m256i none = _mm256_cmpeq_epi64(beyond, _mm256_setzero_si256());
+    const unsigned coded =
+        ~static_cast<unsigned>(_mm256_movemask_pd(_mm256_castsi256_pd(none))) & 0xf;
+    for (const int place : kPlace) {
+        nonzero[place] = 0;
+        if (dc) {
+            store_32(coefs + 16 * place, _mm256_setzero_si256());
+        }
+    }
+    if (coded == 0) {
+        return 0;
+    }
+    const __m256i even_01 = _mm256_unpacklo_epi64(v[0], v[1]);
+    const __m256i even_23 = _mm256_unpacklo_epi64(v[2], v[3]);
+    const __m256i odd_01 = _mm256_unpackhi_epi64(v[0], v[1]);
+    const __m256i odd_23 = _mm256_unpackhi_epi64(v[2], v[3]);
+    const __m256i blocks[4] = {_mm256_permute2x128_si256(even_01, even_23, 0x20),
+                               _mm256_permute2x128_si256(odd_01, odd_23, 0x20),
+                               _mm256_permute2x128_si256(even_01, even_23, 0x31),
+                               _mm256_permute2x128_si256(odd_01, odd_23, 0x31)};
+    const VectorQuantizer vectors(quantizer);
+    for (int b = 0; b < 4; ++b) {
+        if (coded >> b & 1) {
+            const int place = kPlace[b];
+            nonzero[place] = vectors.quantize(blocks[b], coefs + 16 * place, scan + 16 * place);
+        }
+    }
+    return (coded & 3) | (coded >> 2) << kStep;
+}
+
+// First block in decoding order of block row r of a 16x16 block (Figure 6-10); its neighbours to
+// the right are 1, 4 and 5 blocks later.
+constexpr int first_in_row(int r) {
+    return 2 * (r & 1) + 8 * (r >> 1);
+}
+
+uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                             const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                             uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int r = 0; r < 4; ++r, src += 4 * stride, pred += 64) {
+        __m256i v[4];
+        for (int y = 0; y < 4; ++y) {
+            v[y] = _mm256_sub_epi16(_mm256_cvtepu8_epi16(load_16(src + y * stride)),
+                                    _mm256_cvtepu8_epi16(load_16(pred + 16 * y)));
+        }
+        const int first = first_in_row(r);
+        coded |= code_four<4>(v, quantizer, dc ? dc + first : nullptr, coefs + 16 * first,
+                              scan + 16 * first, nonzero + first)
+                 << first;
+    }
+    return coded;
+}
+
+// Rows y and y + 4 of an 8x8 block, one in each lane.
+__m256i two_rows_of_8(const uint8_t* p, ptrdiff_t stride) {
+    return _mm256_cvtepu8_epi16(_mm_unpacklo_epi64(load_8(p), load_8(p + 4 * stride)));
+}
+
+uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    __m256i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm256_sub_epi16(two_rows_of_8(src + y * stride, stride),
+                                two_rows_of_8(pred + 8 * y, 8));
+    }
+    return code_four<2>(v, quantizer, dc, coefs, scan, nonzero);
 }
 
 // Sums of the magnitudes of 16 coefficients, in eight parts.
@@ -769,9 +820,9 @@ Kernels with_avx2(const Kernels& base) {
     k.average_16x16 = average_16x16;
     k.centre_16x16 = centre_16x16;
     k.chroma_8x8 = chroma_8x8;
-    k.transform_16x16 = transform_16x16;
-    k.transform_8x8 = transform_8x8;
     k.quantize = quantize;
+    k.code_residual_16x16 = code_residual_16x16;
+    k.code_residual_8x8 = code_residual_8x8;
     k.reconstruct_16x16 = reconstruct_16x16;
     k.reconstruct_8x8 = reconstruct_8x8;
     k.block_sums = block_sums;

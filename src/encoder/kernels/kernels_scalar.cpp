@@ -251,44 +251,50 @@ constexpr int block_y(int k) {
     return 4 * (((k >> 1) & 1) + ((k >> 2) & 2));
 }
 
-void transform_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    for (int k = 0; k < 16; ++k) {
-        transform_block(src + block_y(k) * stride + block_x(k), stride,
-                        pred + block_y(k) * 16 + block_x(k), 16, coefs + 16 * k);
-    }
-}
-
-void transform_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    for (int k = 0; k < 4; ++k) {
-        transform_block(src + block_y(k) * stride + block_x(k), stride,
-                        pred + block_y(k) * 8 + block_x(k), 8, coefs + 16 * k);
-    }
-}
-
 void transform_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
     transform_block(src, stride, pred, 4, coefs);
 }
 
-uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t* scan,
-                  uint16_t* nonzero) {
-    uint32_t mask = 0;
-    for (int block = 0; block < count; ++block, coefs += 16, scan += 16) {
-        unsigned block_nonzero = 0;
-        for (int n = 0; n < 16; ++n) {
-            const int position = kZigzag[n];
-            const int c = coefs[position];
-            const int magnitude = std::min(
-                (std::abs(c) * quantizer.forward[position] + quantizer.rounding) >> quantizer.shift,
-                kMaxLevel);
-            const int level = c < 0 ? -magnitude : magnitude;
-            scan[n] = static_cast<int16_t>(level);
-            coefs[position] = static_cast<int16_t>(level * quantizer.dequant[position]);
-            block_nonzero |= (level != 0 ? 1u : 0u) << n;
-        }
-        nonzero[block] = static_cast<uint16_t>(block_nonzero);
-        mask |= (block_nonzero != 0 ? 1u : 0u) << block;
+bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
+    unsigned mask = 0;
+    for (int n = 0; n < 16; ++n) {
+        const int position = kZigzag[n];
+        const int c = coefs[position];
+        const int magnitude = std::min(
+            (std::abs(c) * quantizer.forward[position] + quantizer.rounding) >> quantizer.shift,
+            kMaxLevel);
+        const int level = c < 0 ? -magnitude : magnitude;
+        scan[n] = static_cast<int16_t>(level);
+        coefs[position] = static_cast<int16_t>(level * quantizer.dequant[position]);
+        mask |= (level != 0 ? 1u : 0u) << n;
     }
-    return mask;
+    *nonzero = static_cast<uint16_t>(mask);
+    return mask != 0;
+}
+
+// The blocks of a prediction whose rows are pred_stride samples long.
+template <int kBlocks, int pred_stride>
+uint32_t code_residual(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                       const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                       uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int k = 0; k < kBlocks; ++k) {
+        int16_t block[16], levels[16];
+        transform_block(src + block_y(k) * stride + block_x(k), stride,
+                        pred + block_y(k) * pred_stride + block_x(k), pred_stride, block);
+        if (dc) {
+            dc[k] = block[0];
+            block[0] = 0;
+        }
+        if (quantize(block, quantizer, levels, nonzero + k)) {
+            coded |= 1u << k;
+            std::copy(levels, levels + 16, scan + 16 * k);
+            std::copy(block, block + 16, coefs + 16 * k);
+        } else if (dc) {
+            std::fill(coefs + 16 * k, coefs + 16 * k + 16, int16_t{0});
+        }
+    }
+    return coded;
 }
 
 // Inverse core transform of four values with the given input step, written contiguously.
@@ -580,10 +586,10 @@ const Kernels& scalar_kernels() {
         average_16x16,
         centre_16x16,
         chroma_8x8,
-        transform_16x16,
-        transform_8x8,
         transform_4x4,
         quantize,
+        code_residual<16, 16>,
+        code_residual<4, 8>,
         reconstruct_16x16,
         reconstruct_8x8,
         reconstruct_4x4,

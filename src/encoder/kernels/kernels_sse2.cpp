@@ -352,41 +352,12 @@ void transpose_two(__m128i* v) {
     v[3] = _mm_unpackhi_epi64(first_23, second_23);
 }
 
-// Two blocks side by side, written one after the other.
-void transform_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptrdiff_t pred_stride,
-                   int16_t* coefs) {
-    __m128i v[4];
-    for (int y = 0; y < 4; ++y) {
-        v[y] = _mm_sub_epi16(widen_low(load_8(src + y * stride)),
-                             widen_low(load_8(pred + y * pred_stride)));
-    }
-    forward_butterfly(v);
-    transpose_two(v);
-    forward_butterfly(v);
-    store(coefs, _mm_unpacklo_epi64(v[0], v[1]));
-    store(coefs + 8, _mm_unpacklo_epi64(v[2], v[3]));
-    store(coefs + 16, _mm_unpackhi_epi64(v[0], v[1]));
-    store(coefs + 24, _mm_unpackhi_epi64(v[2], v[3]));
-}
-
 // Sample offsets of the pair of blocks 2n, 2n + 1 in decoding order (Figure 6-10).
 constexpr int pair_x(int n) {
     return 8 * (n >> 1 & 1);
 }
 constexpr int pair_y(int n) {
     return 4 * (n & 1) + 8 * (n >> 2);
-}
-
-void transform_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    for (int n = 0; n < 8; ++n) {
-        transform_two(src + pair_y(n) * stride + pair_x(n), stride,
-                      pred + pair_y(n) * 16 + pair_x(n), 16, coefs + 32 * n);
-    }
-}
-
-void transform_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    transform_two(src, stride, pred, 8, coefs);
-    transform_two(src + 4 * stride, stride, pred + 32, 8, coefs + 32);
 }
 
 void transform_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
@@ -418,44 +389,113 @@ void quantize_eight(__m128i c, const int16_t* forward, const int16_t* dequant, _
     *scaled = _mm_mullo_epi16(*levels, load_aligned(dequant));
 }
 
-uint32_t quantize(int16_t* coefs, int count, const Quantizer& quantizer, int16_t* scan,
-                  uint16_t* nonzero) {
+// Quantises a block that has a coefficient beyond the dead zone; returns the mask of its levels.
+uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int16_t* coefs,
+                        int16_t* scan) {
     const __m128i rounding = _mm_set1_epi32(quantizer.rounding);
     const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
-    const __m128i zero = _mm_setzero_si128();
-    uint32_t mask = 0;
-    for (int block = 0; block < count; ++block, coefs += 16, scan += 16) {
-        const __m128i c0 = load_aligned(coefs);
-        const __m128i c1 = load_aligned(coefs + 8);
-        const __m128i coded =
-            _mm_or_si128(_mm_cmpgt_epi16(absolute_16(c0), load_aligned(quantizer.dead_zone)),
-                         _mm_cmpgt_epi16(absolute_16(c1), load_aligned(quantizer.dead_zone + 8)));
-        if (_mm_movemask_epi8(coded) == 0) {
-            store(coefs, zero);
-            store(coefs + 8, zero);
-            store(scan, zero);
-            store(scan + 8, zero);
-            nonzero[block] = 0;
-            continue;
-        }
-        alignas(16) int16_t levels[16];
-        __m128i level0, level1, scaled0, scaled1;
-        quantize_eight(c0, quantizer.forward, quantizer.dequant, rounding, shift, &level0,
-                       &scaled0);
-        quantize_eight(c1, quantizer.forward + 8, quantizer.dequant + 8, rounding, shift, &level1,
-                       &scaled1);
-        store(levels, level0);
-        store(levels + 8, level1);
-        store(coefs, scaled0);
-        store(coefs + 8, scaled1);
-        for (int n = 0; n < 16; ++n) {
-            scan[n] = levels[kZigzag[n]];
-        }
-        const __m128i zeros = _mm_cmpeq_epi8(_mm_packs_epi16(load(scan), load(scan + 8)), zero);
-        nonzero[block] = static_cast<uint16_t>(~_mm_movemask_epi8(zeros));
-        mask |= 1u << block;
+    alignas(16) int16_t levels[16];
+    __m128i level0, level1, scaled0, scaled1;
+    quantize_eight(c0, quantizer.forward, quantizer.dequant, rounding, shift, &level0, &scaled0);
+    quantize_eight(c1, quantizer.forward + 8, quantizer.dequant + 8, rounding, shift, &level1,
+                   &scaled1);
+    store(levels, level0);
+    store(levels + 8, level1);
+    store(coefs, scaled0);
+    store(coefs + 8, scaled1);
+    for (int n = 0; n < 16; ++n) {
+        scan[n] = levels[kZigzag[n]];
     }
-    return mask;
+    const __m128i zeros =
+        _mm_cmpeq_epi8(_mm_packs_epi16(load(scan), load(scan + 8)), _mm_setzero_si128());
+    return static_cast<uint16_t>(~_mm_movemask_epi8(zeros));
+}
+
+// Whether a level of the block is not 0.
+bool leaves_dead_zone(__m128i c0, __m128i c1, const Quantizer& quantizer) {
+    const __m128i beyond =
+        _mm_or_si128(_mm_cmpgt_epi16(absolute_16(c0), load_aligned(quantizer.dead_zone)),
+                     _mm_cmpgt_epi16(absolute_16(c1), load_aligned(quantizer.dead_zone + 8)));
+    return _mm_movemask_epi8(beyond) != 0;
+}
+
+void clear_block(int16_t* block) {
+    store(block, _mm_setzero_si128());
+    store(block + 8, _mm_setzero_si128());
+}
+
+bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
+    const __m128i c0 = load_aligned(coefs);
+    const __m128i c1 = load_aligned(coefs + 8);
+    if (!leaves_dead_zone(c0, c1, quantizer)) {
+        clear_block(coefs);
+        clear_block(scan);
+        *nonzero = 0;
+        return false;
+    }
+    *nonzero = quantize_block(c0, c1, quantizer, coefs, scan);
+    return true;
+}
+
+// Codes two blocks side by side; dc, coefs, scan and nonzero are those of the first. Returns the
+// mask of the coded ones.
+uint32_t code_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptrdiff_t pred_stride,
+                  const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                  uint16_t* nonzero) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_8(src + y * stride)),
+                             widen_low(load_8(pred + y * pred_stride)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    if (dc) {
+        dc[0] = static_cast<int16_t>(_mm_extract_epi16(v[0], 0));
+        dc[1] = static_cast<int16_t>(_mm_extract_epi16(v[0], 4));
+        v[0] = _mm_and_si128(v[0], _mm_set1_epi64x(~0xffffLL));
+    }
+    const __m128i blocks[2][2] = {{_mm_unpacklo_epi64(v[0], v[1]), _mm_unpacklo_epi64(v[2], v[3])},
+                                  {_mm_unpackhi_epi64(v[0], v[1]), _mm_unpackhi_epi64(v[2], v[3])}};
+    uint32_t coded = 0;
+    for (int b = 0; b < 2; ++b) {
+        if (leaves_dead_zone(blocks[b][0], blocks[b][1], quantizer)) {
+            coded |= 1u << b;
+            nonzero[b] = quantize_block(blocks[b][0], blocks[b][1], quantizer, coefs + 16 * b,
+                                        scan + 16 * b);
+        } else {
+            nonzero[b] = 0;
+            if (dc) {
+                clear_block(coefs + 16 * b);
+            }
+        }
+    }
+    return coded;
+}
+
+uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                             const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                             uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int n = 0; n < 8; ++n) {
+        coded |= code_two(src + pair_y(n) * stride + pair_x(n), stride,
+                          pred + pair_y(n) * 16 + pair_x(n), 16, quantizer,
+                          dc ? dc + 2 * n : nullptr, coefs + 32 * n, scan + 32 * n, nonzero + 2 * n)
+                 << (2 * n);
+    }
+    return coded;
+}
+
+uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int n = 0; n < 2; ++n) {
+        coded |= code_two(src + 4 * n * stride, stride, pred + 32 * n, 8, quantizer,
+                          dc ? dc + 2 * n : nullptr, coefs + 32 * n, scan + 32 * n, nonzero + 2 * n)
+                 << (2 * n);
+    }
+    return coded;
 }
 
 // Whether 16-bit sums are exact for a block: no sum of the inverse transform, rounding included,
@@ -836,10 +876,10 @@ Kernels with_sse2(const Kernels& base) {
     k.average_16x16 = average_16x16;
     k.centre_16x16 = centre_16x16;
     k.chroma_8x8 = chroma_8x8;
-    k.transform_16x16 = transform_16x16;
-    k.transform_8x8 = transform_8x8;
     k.transform_4x4 = transform_4x4;
     k.quantize = quantize;
+    k.code_residual_16x16 = code_residual_16x16;
+    k.code_residual_8x8 = code_residual_8x8;
     k.reconstruct_16x16 = reconstruct_16x16;
     k.reconstruct_8x8 = reconstruct_8x8;
     k.reconstruct_4x4 = reconstruct_4x4;
