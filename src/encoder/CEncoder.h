@@ -280,10 +280,10 @@ public:
     void form_mv_prediction(std::int16_t* pmv_x, std::int16_t* pmv_y, std::int8_t ref, int bx,
                             int by, int w, int h) const;
     // Luma prediction of the 16x16 block at sample (px, py) for a vector in quarter pels, and
-    // chroma prediction (plane 0 Cb, 1 Cr) of the 8x8 block at chroma sample (cx, cy) for the same
+    // predictions of Cb and then Cr of the 8x8 blocks at chroma sample (cx, cy) for the same
     // vector.
     void qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int py) const;
-    void qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy, int plane) const;
+    void qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy) const;
 
     // ---- lfilter: deblocking filter ----
     void filter_mb_row(int mb_y);

@@ -91,10 +91,10 @@ struct SegmentTc0 {
 
 // The filters of the vertical or of the horizontal edges, and the steps across an edge, in samples.
 struct EdgeFilters {
-    zolt::Kernels::NormalFilter luma;
-    zolt::Kernels::StrongFilter luma_strong;
-    zolt::Kernels::NormalFilter chroma;
-    zolt::Kernels::StrongFilter chroma_strong;
+    zolt::Kernels::LumaFilter luma;
+    zolt::Kernels::StrongLumaFilter luma_strong;
+    zolt::Kernels::ChromaFilter chroma;
+    zolt::Kernels::StrongChromaFilter chroma_strong;
     std::ptrdiff_t luma_step, chroma_step;
 };
 
@@ -134,15 +134,13 @@ struct Macroblock {
                                     lf);
         if (strengths == kAllStrong) {
             filters.luma_strong(y, encoder.g_stride_luma, luma.alpha, luma.beta);
-            filters.chroma_strong(u, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
-            filters.chroma_strong(v, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
+            filters.chroma_strong(u, v, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
             return;
         }
         filters.luma(y, encoder.g_stride_luma, luma.alpha, luma.beta,
                      SegmentTc0(strengths, luma.tc0).values);
-        const SegmentTc0 tc0(strengths, chroma.tc0);
-        filters.chroma(u, encoder.g_stride_chroma, chroma.alpha, chroma.beta, tc0.values);
-        filters.chroma(v, encoder.g_stride_chroma, chroma.alpha, chroma.beta, tc0.values);
+        filters.chroma(u, v, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
+                       SegmentTc0(strengths, chroma.tc0).values);
     }
 
     void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
@@ -157,12 +155,9 @@ struct Macroblock {
         }
         if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
             const EdgeParameters chroma(zolt::QP_SCALE_CR[qp], lf);
-            const SegmentTc0 tc0(strengths[2], chroma.tc0);
             const std::ptrdiff_t offset = 4 * filters.chroma_step;
-            filters.chroma(u + offset, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
-                           tc0.values);
-            filters.chroma(v + offset, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
-                           tc0.values);
+            filters.chroma(u + offset, v + offset, encoder.g_stride_chroma, chroma.alpha,
+                           chroma.beta, SegmentTc0(strengths[2], chroma.tc0).values);
         }
     }
 };

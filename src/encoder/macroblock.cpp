@@ -171,10 +171,7 @@ void CEncoder::generatePredError16x16() {
 
 void CEncoder::predict_inter_chroma() {
     const std::ptrdiff_t block = first_block();
-    for (int plane = 0; plane < 2; ++plane) {
-        qpmc_c_core(g_mb_pred + 256 + 64 * plane, g_blk_mvx[block], g_blk_mvy[block], 8 * g_mb_x,
-                    8 * g_mb_y, plane);
-    }
+    qpmc_c_core(g_mb_pred + 256, g_blk_mvx[block], g_blk_mvy[block], 8 * g_mb_x, 8 * g_mb_y);
 }
 
 // mb_type and coded_block_pattern (Tables 7-11, 7-13; clause 7.4.5) of the coded blocks.

@@ -114,10 +114,10 @@ void CEncoder::qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int p
     }
 }
 
-void CEncoder::qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy, int plane) const {
+void CEncoder::qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy) const {
     const int x = std::clamp((mvx + 8 * cx) >> 3, -kChromaOverhang, g_cwidth + kFarOverhang);
     const int y = std::clamp((mvy + 8 * cy) >> 3, -kChromaOverhang, g_cheight + kFarOverhang);
-    const std::uint8_t* ref = plane == 0 ? g_ref_u : g_ref_v;
-    g_kernels->chroma_8x8(pred, ref + static_cast<std::ptrdiff_t>(y) * g_stride_chroma + x,
-                          g_stride_chroma, mvx & 7, mvy & 7);
+    const std::ptrdiff_t position = static_cast<std::ptrdiff_t>(y) * g_stride_chroma + x;
+    g_kernels->chroma_8x8(pred, g_ref_u + position, g_ref_v + position, g_stride_chroma, mvx & 7,
+                          mvy & 7);
 }

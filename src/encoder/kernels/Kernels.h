@@ -92,9 +92,11 @@ struct Kernels {
                           const std::uint8_t* b, std::ptrdiff_t b_stride);
     // The centre half samples j of clause 8.4.2.2.1, from unrounded intermediate sums.
     void (*centre_16x16)(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride);
-    // Bilinear chroma samples of clause 8.4.2.2.2; fx, fy in eighth pels, 0..7.
-    void (*chroma_8x8)(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int fx,
-                       int fy);
+    // Bilinear samples of clause 8.4.2.2.2 of both chroma components: 8x8 predictions of Cb at pred
+    // and of Cr after it; fx, fy in eighth pels, 0..7. Up to 16 samples of nine rows are read at u
+    // and at v.
+    void (*chroma_8x8)(std::uint8_t* pred, const std::uint8_t* u, const std::uint8_t* v,
+                       std::ptrdiff_t stride, int fx, int fy);
 
     // ---- Residual ----
 
@@ -157,21 +159,26 @@ struct Kernels {
 
     // ---- Deblocking (clause 8.7.2) ----
 
-    // Filters one macroblock edge: pix is the first sample on the q side; "vertical" edges are
-    // crossed horizontally. Luma edges have 16 lines, chroma edges 8. tc0 holds tC0 of the edge's
-    // four segments (bS 1..3), -1 for a segment that is not filtered.
-    using NormalFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta,
-                                  const std::int8_t* tc0);
+    // Filters one macroblock edge: pix, u and v are the first samples on the q side; "vertical"
+    // edges are crossed horizontally. Luma edges have 16 lines, chroma edges 8 of either component.
+    // tc0 holds tC0 of the edge's four segments (bS 1..3), -1 for a segment that is not filtered.
+    using LumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta,
+                                const std::int8_t* tc0);
+    using ChromaFilter = void (*)(std::uint8_t* u, std::uint8_t* v, std::ptrdiff_t stride,
+                                  int alpha, int beta, const std::int8_t* tc0);
     // The same with bS 4.
-    using StrongFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta);
-    NormalFilter deblock_luma_vertical;
-    NormalFilter deblock_luma_horizontal;
-    NormalFilter deblock_chroma_vertical;
-    NormalFilter deblock_chroma_horizontal;
-    StrongFilter deblock_luma_vertical_strong;
-    StrongFilter deblock_luma_horizontal_strong;
-    StrongFilter deblock_chroma_vertical_strong;
-    StrongFilter deblock_chroma_horizontal_strong;
+    using StrongLumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha,
+                                      int beta);
+    using StrongChromaFilter = void (*)(std::uint8_t* u, std::uint8_t* v, std::ptrdiff_t stride,
+                                        int alpha, int beta);
+    LumaFilter deblock_luma_vertical;
+    LumaFilter deblock_luma_horizontal;
+    ChromaFilter deblock_chroma_vertical;
+    ChromaFilter deblock_chroma_horizontal;
+    StrongLumaFilter deblock_luma_vertical_strong;
+    StrongLumaFilter deblock_luma_horizontal_strong;
+    StrongChromaFilter deblock_chroma_vertical_strong;
+    StrongChromaFilter deblock_chroma_horizontal_strong;
 };
 
 // The scalar table; it runs on any processor.

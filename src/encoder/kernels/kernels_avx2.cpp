@@ -218,39 +218,55 @@ uint32_t first_phases_below_cross(const uint8_t* block, const uint8_t* centre,
 
 // ---- Reference planes ----
 
-// 32 half samples between p[0] and p[step].
-__m256i half_samples(const uint8_t* p, ptrdiff_t step) {
-    const __m256i e = load_32(p - 2 * step), f = load_32(p - step), g = load_32(p);
-    const __m256i h = load_32(p + step), i = load_32(p + 2 * step), j = load_32(p + 3 * step);
+// Half samples from pairs of neighbours: E and F, G and H, I and J, interleaved.
+__m256i half_samples(__m256i ef, __m256i gh, __m256i ij) {
     const __m256i first = _mm256_set1_epi16(static_cast<short>(0xfb01));  // 1, -5
     const __m256i middle = _mm256_set1_epi16(0x1414);                     // 20, 20
     const __m256i last = _mm256_set1_epi16(0x01fb);                       // -5, 1
-    const __m256i rounding = _mm256_set1_epi16(16);
-    const auto filter = [=](__m256i ef, __m256i gh, __m256i ij) {
-        const __m256i sum = _mm256_add_epi16(
-            _mm256_add_epi16(_mm256_maddubs_epi16(ef, first), _mm256_maddubs_epi16(gh, middle)),
-            _mm256_add_epi16(_mm256_maddubs_epi16(ij, last), rounding));
-        return _mm256_srai_epi16(sum, 5);
-    };
+    const __m256i sum = _mm256_add_epi16(
+        _mm256_add_epi16(_mm256_maddubs_epi16(ef, first), _mm256_maddubs_epi16(ij, last)),
+        _mm256_maddubs_epi16(gh, middle));
+    return _mm256_mulhrs_epi16(sum, _mm256_set1_epi16(1 << 10));  // (sum + 16) >> 5
+}
+
+// 32 half samples below those at p.
+__m256i half_vertical(const uint8_t* p, ptrdiff_t stride) {
+    const __m256i e = load_32(p - 2 * stride), f = load_32(p - stride), g = load_32(p);
+    const __m256i h = load_32(p + stride), i = load_32(p + 2 * stride), j = load_32(p + 3 * stride);
+    return _mm256_packus_epi16(half_samples(_mm256_unpacklo_epi8(e, f), _mm256_unpacklo_epi8(g, h),
+                                            _mm256_unpacklo_epi8(i, j)),
+                               half_samples(_mm256_unpackhi_epi8(e, f), _mm256_unpackhi_epi8(g, h),
+                                            _mm256_unpackhi_epi8(i, j)));
+}
+
+// Pairs of neighbours in either lane, of which the first begins at byte n.
+__m256i neighbours(__m256i samples, int n) {
+    const __m256i pairs =
+        _mm256_broadcastsi128_si256(_mm_setr_epi8(0, 1, 1, 2, 2, 3, 3, 4, 4, 5, 5, 6, 6, 7, 7, 8));
+    return _mm256_shuffle_epi8(samples,
+                               _mm256_add_epi8(pairs, _mm256_set1_epi8(static_cast<char>(n))));
+}
+
+// 32 half samples right of those at p.
+__m256i half_horizontal(const uint8_t* p) {
+    // The samples that the first eight of a lane need are 0..12 of `left`, those of the others are
+    // 3..15 of `right`; so nothing beyond the last tap is read.
+    const __m256i left = load_32(p - 2), right = load_32(p + 3);
     return _mm256_packus_epi16(
-        filter(_mm256_unpacklo_epi8(e, f), _mm256_unpacklo_epi8(g, h), _mm256_unpacklo_epi8(i, j)),
-        filter(_mm256_unpackhi_epi8(e, f), _mm256_unpackhi_epi8(g, h), _mm256_unpackhi_epi8(i, j)));
+        half_samples(neighbours(left, 0), neighbours(left, 2), neighbours(left, 4)),
+        half_samples(neighbours(right, 3), neighbours(right, 5), neighbours(right, 7)));
 }
 
-// A row of count >= 32 half samples; the last step overlaps the one before it.
-void half_row(const uint8_t* src, ptrdiff_t step, uint8_t* dst, int count) {
-    for (int x = 0; x < count - 32; x += 32) {
-        store_32(dst + x, half_samples(src + x, step));
-    }
-    store_32(dst + count - 32, half_samples(src + count - 32, step));
-}
-
+// Rows of count >= 32 half samples; the last step overlaps the one before it.
 void half_vertical_row(const uint8_t* src, ptrdiff_t stride, uint8_t* dst, int count) {
     if (count < 32) {
         scalar_kernels().half_vertical_row(src, stride, dst, count);
         return;
     }
-    half_row(src, stride, dst, count);
+    for (int x = 0; x < count - 32; x += 32) {
+        store_32(dst + x, half_vertical(src + x, stride));
+    }
+    store_32(dst + count - 32, half_vertical(src + count - 32, stride));
 }
 
 void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
@@ -258,7 +274,10 @@ void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
         scalar_kernels().half_horizontal_row(src, dst, count);
         return;
     }
-    half_row(src, 1, dst, count);
+    for (int x = 0; x < count - 32; x += 32) {
+        store_32(dst + x, half_horizontal(src + x));
+    }
+    store_32(dst + count - 32, half_horizontal(src + count - 32));
 }
 
 // ---- Inter prediction ----
@@ -327,20 +346,25 @@ void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
     }
 }
 
-void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
-    const __m128i columns = _mm_set1_epi16(static_cast<short>((8 - fx) | fx << 8));
-    const __m128i upper_weight = _mm_set1_epi16(static_cast<short>(8 - fy));
-    const __m128i lower_weight = _mm_set1_epi16(static_cast<short>(fy));
-    const auto horizontal = [&](const uint8_t* row) {
-        return _mm_maddubs_epi16(_mm_unpacklo_epi8(load_8(row), load_8(row + 1)), columns);
+// Cb in the low lane, Cr in the high one.
+void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t stride, int fx,
+                int fy) {
+    const __m256i columns = _mm256_set1_epi16(static_cast<short>((8 - fx) | fx << 8));
+    const __m256i upper_weight = _mm256_set1_epi16(static_cast<short>(8 - fy));
+    const __m256i lower_weight = _mm256_set1_epi16(static_cast<short>(fy));
+    const auto horizontal = [&](int y) {
+        const __m256i row = join(load_16(u + y * stride), load_16(v + y * stride));
+        return _mm256_maddubs_epi16(neighbours(row, 0), columns);
     };
-    __m128i upper = horizontal(src);
+    __m256i upper = horizontal(0);
     for (int y = 0; y < 8; ++y) {
-        const __m128i lower = horizontal(src + (y + 1) * stride);
-        const __m128i sum = _mm_add_epi16(_mm_mullo_epi16(upper, upper_weight),
-                                          _mm_mullo_epi16(lower, lower_weight));
-        const __m128i rounded = _mm_srli_epi16(_mm_add_epi16(sum, _mm_set1_epi16(32)), 6);
-        store_8(pred + 8 * y, _mm_packus_epi16(rounded, rounded));
+        const __m256i lower = horizontal(y + 1);
+        const __m256i sum = _mm256_add_epi16(_mm256_mullo_epi16(upper, upper_weight),
+                                             _mm256_mullo_epi16(lower, lower_weight));
+        const __m256i rounded = _mm256_srli_epi16(_mm256_add_epi16(sum, _mm256_set1_epi16(32)), 6);
+        const __m256i samples = _mm256_packus_epi16(rounded, rounded);
+        store_8(pred + 8 * y, low_lane(samples));
+        store_8(pred + 64 + 8 * y, high_lane(samples));
         upper = lower;
     }
 }
@@ -679,7 +703,7 @@ void hadamard_energy(const int32_t* values, int32_t* energy) {
     store_16(energy, _mm_unpacklo_epi64(low, sums));
 }
 
-// ---- Deblocking of luma ----
+// ---- Deblocking ----
 
 // Sixteen lines of an edge.
 struct Lanes {
@@ -802,6 +826,111 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
     }
 }
 
+// The samples p1, p0, q0, q1 around a chroma edge: eight lines of Cb, then of Cr.
+struct ChromaLines {
+    Lanes p1, p0, q0, q1;
+
+    bool filter(int alpha, int beta, const int8_t* tc0) {
+        const __m128i segments =
+            _mm_setr_epi8(tc0[0], tc0[1], tc0[2], tc0[3], 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0);
+        const __m128i lines = _mm_shuffle_epi8(
+            segments, _mm_setr_epi8(0, 0, 1, 1, 2, 2, 3, 3, 0, 0, 1, 1, 2, 2, 3, 3));
+        return filter_chroma(p1, p0, q0, q1, alpha, beta, Lanes{_mm256_cvtepi8_epi16(lines)});
+    }
+    bool filter_strong(int alpha, int beta) {
+        return filter_chroma_strong(p1, p0, q0, q1, alpha, beta);
+    }
+};
+
+ChromaLines chroma_rows(const uint8_t* u, const uint8_t* v, ptrdiff_t stride) {
+    const auto row = [=](int y) {
+        const __m128i samples = _mm_unpacklo_epi64(load_8(u + y * stride), load_8(v + y * stride));
+        return Lanes{_mm256_cvtepu8_epi16(samples)};
+    };
+    return {row(-2), row(-1), row(0), row(1)};
+}
+
+void store_chroma_rows(const ChromaLines& lines, uint8_t* u, uint8_t* v, ptrdiff_t stride) {
+    // p0 and q0 of Cb in the low lane, of Cr in the high one.
+    const __m256i samples = _mm256_packus_epi16(lines.p0.v, lines.q0.v);
+    store_8(u - stride, low_lane(samples));
+    store_8(u, _mm_srli_si128(low_lane(samples), 8));
+    store_8(v - stride, high_lane(samples));
+    store_8(v, _mm_srli_si128(high_lane(samples), 8));
+}
+
+// Columns p1..q1 of four lines, one after the other.
+__m128i four_lines(const uint8_t* p, ptrdiff_t stride) {
+    const auto line = [=](int y) {
+        int32_t samples;
+        __builtin_memcpy(&samples, p + y * stride, sizeof samples);
+        return samples;
+    };
+    const __m128i lines = _mm_insert_epi32(
+        _mm_insert_epi32(_mm_insert_epi32(_mm_cvtsi32_si128(line(0)), line(1), 1), line(2), 2),
+        line(3), 3);
+    return _mm_shuffle_epi8(lines,
+                            _mm_setr_epi8(0, 4, 8, 12, 1, 5, 9, 13, 2, 6, 10, 14, 3, 7, 11, 15));
+}
+
+ChromaLines chroma_columns(const uint8_t* u, const uint8_t* v, ptrdiff_t stride) {
+    const __m128i u0 = four_lines(u - 2, stride), u4 = four_lines(u - 2 + 4 * stride, stride);
+    const __m128i v0 = four_lines(v - 2, stride), v4 = four_lines(v - 2 + 4 * stride, stride);
+    const __m128i u_p = _mm_unpacklo_epi32(u0, u4), u_q = _mm_unpackhi_epi32(u0, u4);
+    const __m128i v_p = _mm_unpacklo_epi32(v0, v4), v_q = _mm_unpackhi_epi32(v0, v4);
+    return {{_mm256_cvtepu8_epi16(_mm_unpacklo_epi64(u_p, v_p))},
+            {_mm256_cvtepu8_epi16(_mm_unpackhi_epi64(u_p, v_p))},
+            {_mm256_cvtepu8_epi16(_mm_unpacklo_epi64(u_q, v_q))},
+            {_mm256_cvtepu8_epi16(_mm_unpackhi_epi64(u_q, v_q))}};
+}
+
+// Stores the eight pairs of samples in `pairs`, one a line.
+void store_pairs(uint8_t* p, ptrdiff_t stride, __m128i pairs) {
+    alignas(16) uint16_t values[8];
+    _mm_store_si128(reinterpret_cast<__m128i*>(values), pairs);
+    for (int y = 0; y < 8; ++y) {
+        __builtin_memcpy(p + y * stride, values + y, sizeof *values);
+    }
+}
+
+void store_chroma_columns(const ChromaLines& lines, uint8_t* u, uint8_t* v, ptrdiff_t stride) {
+    const __m256i samples = _mm256_packus_epi16(lines.p0.v, lines.q0.v);
+    const __m256i pairs = _mm256_unpacklo_epi8(samples, _mm256_srli_si256(samples, 8));
+    store_pairs(u - 1, stride, low_lane(pairs));
+    store_pairs(v - 1, stride, high_lane(pairs));
+}
+
+void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
+                               const int8_t* tc0) {
+    ChromaLines lines = chroma_rows(u, v, stride);
+    if (lines.filter(alpha, beta, tc0)) {
+        store_chroma_rows(lines, u, v, stride);
+    }
+}
+
+void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha,
+                                      int beta) {
+    ChromaLines lines = chroma_rows(u, v, stride);
+    if (lines.filter_strong(alpha, beta)) {
+        store_chroma_rows(lines, u, v, stride);
+    }
+}
+
+void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
+                             const int8_t* tc0) {
+    ChromaLines lines = chroma_columns(u, v, stride);
+    if (lines.filter(alpha, beta, tc0)) {
+        store_chroma_columns(lines, u, v, stride);
+    }
+}
+
+void deblock_chroma_vertical_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta) {
+    ChromaLines lines = chroma_columns(u, v, stride);
+    if (lines.filter_strong(alpha, beta)) {
+        store_chroma_columns(lines, u, v, stride);
+    }
+}
+
 }  // namespace
 
 Kernels with_avx2(const Kernels& base) {
@@ -829,8 +958,12 @@ Kernels with_avx2(const Kernels& base) {
     k.hadamard_energy = hadamard_energy;
     k.deblock_luma_vertical = deblock_luma_vertical;
     k.deblock_luma_horizontal = deblock_luma_horizontal;
+    k.deblock_chroma_vertical = deblock_chroma_vertical;
+    k.deblock_chroma_horizontal = deblock_chroma_horizontal;
     k.deblock_luma_vertical_strong = deblock_luma_vertical_strong;
     k.deblock_luma_horizontal_strong = deblock_luma_horizontal_strong;
+    k.deblock_chroma_vertical_strong = deblock_chroma_vertical_strong;
+    k.deblock_chroma_horizontal_strong = deblock_chroma_horizontal_strong;
     return k;
 }
 

@@ -194,7 +194,7 @@ void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
     }
 }
 
-void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
+void chroma_component(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
     const int a = (8 - fx) * (8 - fy);
     const int b = fx * (8 - fy);
     const int c = (8 - fx) * fy;
@@ -208,6 +208,12 @@ void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int
                                      6);
         }
     }
+}
+
+void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t stride, int fx,
+                int fy) {
+    chroma_component(pred, u, stride, fx, fy);
+    chroma_component(pred + 64, v, stride, fx, fy);
 }
 
 // ---- Residual ----
@@ -533,14 +539,16 @@ void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta
     filter_edge(pix, 1, stride, 4, alpha, beta, tc0, filter_luma_line);
 }
 
-void deblock_chroma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
                              const int8_t* tc0) {
-    filter_edge(pix, stride, 1, 2, alpha, beta, tc0, filter_chroma_line);
+    filter_edge(u, stride, 1, 2, alpha, beta, tc0, filter_chroma_line);
+    filter_edge(v, stride, 1, 2, alpha, beta, tc0, filter_chroma_line);
 }
 
-void deblock_chroma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
                                const int8_t* tc0) {
-    filter_edge(pix, 1, stride, 2, alpha, beta, tc0, filter_chroma_line);
+    filter_edge(u, 1, stride, 2, alpha, beta, tc0, filter_chroma_line);
+    filter_edge(v, 1, stride, 2, alpha, beta, tc0, filter_chroma_line);
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
@@ -555,15 +563,18 @@ void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, i
     }
 }
 
-void deblock_chroma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+void deblock_chroma_vertical_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta) {
     for (int line = 0; line < 8; ++line) {
-        filter_chroma_line_strong(pix + line * stride, 1, alpha, beta);
+        filter_chroma_line_strong(u + line * stride, 1, alpha, beta);
+        filter_chroma_line_strong(v + line * stride, 1, alpha, beta);
     }
 }
 
-void deblock_chroma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
+void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha,
+                                      int beta) {
     for (int line = 0; line < 8; ++line) {
-        filter_chroma_line_strong(pix + line, stride, alpha, beta);
+        filter_chroma_line_strong(u + line, stride, alpha, beta);
+        filter_chroma_line_strong(v + line, stride, alpha, beta);
     }
 }
 

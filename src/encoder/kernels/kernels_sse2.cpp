@@ -1,6 +1,7 @@
 #include <emmintrin.h>
 
 #include <cstring>
+#include <initializer_list>
 
 #include "encoder/kernels/deblock_simd.h"
 #include "encoder/kernels/x86_tables.h"
@@ -289,7 +290,7 @@ void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
     }
 }
 
-void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
+void chroma_component(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int fy) {
     const __m128i left = _mm_set1_epi16(static_cast<short>(8 - fx));
     const __m128i right = _mm_set1_epi16(static_cast<short>(fx));
     const __m128i upper_weight = _mm_set1_epi16(static_cast<short>(8 - fy));
@@ -308,6 +309,12 @@ void chroma_8x8(uint8_t* pred, const uint8_t* src, ptrdiff_t stride, int fx, int
         store_8(pred + 8 * y, _mm_packus_epi16(rounded, rounded));
         upper = lower;
     }
+}
+
+void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t stride, int fx,
+                int fy) {
+    chroma_component(pred, u, stride, fx, fy);
+    chroma_component(pred + 64, v, stride, fx, fy);
 }
 
 // ---- Residual ----
@@ -833,29 +840,39 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
     }
 }
 
-void deblock_chroma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
                                const int8_t* tc0) {
-    filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
-        return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
-    });
+    for (uint8_t* pix : {u, v}) {
+        filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
+            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+        });
+    }
 }
 
-void deblock_chroma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
+void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
                              const int8_t* tc0) {
-    filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
-        return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
-    });
+    for (uint8_t* pix : {u, v}) {
+        filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
+            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+        });
+    }
 }
 
-void deblock_chroma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    filter_rows(pix, stride, 2,
-                [&](uint8_t* const* rows) { return chroma_rows_strong<Lanes>(rows, alpha, beta); });
+void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha,
+                                      int beta) {
+    for (uint8_t* pix : {u, v}) {
+        filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
+            return chroma_rows_strong<Lanes>(rows, alpha, beta);
+        });
+    }
 }
 
-void deblock_chroma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
-        return chroma_rows_strong<Lanes>(rows, alpha, beta);
-    });
+void deblock_chroma_vertical_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta) {
+    for (uint8_t* pix : {u, v}) {
+        filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
+            return chroma_rows_strong<Lanes>(rows, alpha, beta);
+        });
+    }
 }
 
 }  // namespace
