@@ -26,16 +26,17 @@ constexpr int kQp = 28;
 // quantise to themselves, and edges that are filtered once are filtered again.
 struct Arena {
     alignas(64) std::uint8_t planes[2][kPlaneSize];
-    alignas(64) std::uint8_t phases[512];
+    alignas(64) std::uint8_t block[zolt::kArrangedBlock];
     alignas(64) std::uint8_t pred[256];
     alignas(64) std::int16_t coefs[256];
     alignas(64) std::int16_t scan[256];
     alignas(64) std::int32_t values[16];
     alignas(64) std::int32_t sums[16];
     std::uint16_t nonzero[16];
+    std::int16_t dc[16];
     std::uint8_t* current;  // a macroblock
-    const std::uint8_t* a[4];
-    const std::uint8_t* b[4];
+    const std::uint8_t* refs[8];
+    alignas(32) std::int32_t limits[8] = {};
 
     Arena() {
         std::minstd_rand random(1);
@@ -56,15 +57,16 @@ struct Arena {
         }
         const std::ptrdiff_t place = (kBorder + 160) * kStride + kBorder + 320;
         current = planes[0] + place;
-        for (int i = 0; i < 4; ++i) {
-            a[i] = planes[1] + place + (i - 2) * kStride + 3 * i - 5;
-            b[i] = a[i] + 1;
+        for (int i = 0; i < 8; ++i) {
+            refs[i] = planes[1] + place + (i - 2) * kStride + 3 * i - 5;
         }
-        zolt::scalar_kernels().split_phases(current, kStride, phases);
-        zolt::scalar_kernels().transform_16x16(current, kStride, pred, coefs);
+        zolt::scalar_kernels().arrange_block(current, kStride, block);
+        for (std::int16_t& coef : coefs) {
+            coef = static_cast<std::int16_t>(between(-300, 300));
+        }
     }
 
-    const std::uint8_t* reference() const { return a[0]; }
+    const std::uint8_t* reference() const { return refs[0]; }
 };
 
 struct Case {
@@ -72,44 +74,58 @@ struct Case {
     void (*run)(const Kernels& k, Arena& a);
 };
 
-template <Kernels::NormalFilter Kernels::*filter>
-void run_normal(const Kernels& k, Arena& a) {
-    constexpr std::int8_t kTc0[4] = {1, 2, -1, 1};
+constexpr std::int8_t kTc0[4] = {1, 2, -1, 1};
+
+template <Kernels::LumaFilter Kernels::*filter>
+void run_luma(const Kernels& k, Arena& a) {
     (k.*filter)(a.current, kStride, 40, 10, kTc0);
 }
 
-template <Kernels::StrongFilter Kernels::*filter>
-void run_strong(const Kernels& k, Arena& a) {
+template <Kernels::StrongLumaFilter Kernels::*filter>
+void run_strong_luma(const Kernels& k, Arena& a) {
     (k.*filter)(a.current, kStride, 40, 10);
 }
 
-void quantize(const Kernels& k, Arena& a, int blocks) {
-    benchmark::DoNotOptimize(
-        k.quantize(a.coefs, blocks, zolt::inter_quantizer(kQp), a.scan, a.nonzero));
+template <Kernels::ChromaFilter Kernels::*filter>
+void run_chroma(const Kernels& k, Arena& a) {
+    (k.*filter)(a.current, a.current + 64, kStride, 40, 10, kTc0);
+}
+
+template <Kernels::StrongChromaFilter Kernels::*filter>
+void run_strong_chroma(const Kernels& k, Arena& a) {
+    (k.*filter)(a.current, a.current + 64, kStride, 40, 10);
+}
+
+const zolt::Quantizer& quantizer() {
+    return zolt::inter_quantizer(kQp);
 }
 
 constexpr Case kCases[] = {
-    {"split_phases",
-     [](const Kernels& k, Arena& a) { k.split_phases(a.current, kStride, a.phases); }},
-    {"sad_first_phases",
+    {"arrange_block",
+     [](const Kernels& k, Arena& a) { k.arrange_block(a.current, kStride, a.block); }},
+    {"phase_sads",
+     [](const Kernels& k, Arena& a) { k.phase_sads(a.block, a.reference(), kStride, a.sums); }},
+    {"phase_sads_average",
      [](const Kernels& k, Arena& a) {
-         k.sad_first_phases(a.phases, a.reference(), kStride, a.sums);
+         k.phase_sads_average(a.block, a.refs[0], a.refs[1], kStride, a.sums);
      }},
-    {"sad_first_phases_x4",
+    {"first_phases_below_x4",
      [](const Kernels& k, Arena& a) {
-         k.sad_first_phases_x4(a.phases, a.a, kStride, a.sums, a.sums + 4);
+         benchmark::DoNotOptimize(k.first_phases_below_x4(a.block, a.refs, kStride, a.limits));
      }},
-    {"sad_first_phases_average_x4",
+    {"first_phases_below_x8",
      [](const Kernels& k, Arena& a) {
-         k.sad_first_phases_average_x4(a.phases, a.a, a.b, kStride, a.sums, a.sums + 4);
+         benchmark::DoNotOptimize(k.first_phases_below_x8(a.block, a.refs, kStride, a.limits));
      }},
-    {"sad_last_phases",
+    {"first_phases_below_star",
      [](const Kernels& k, Arena& a) {
-         k.sad_last_phases(a.phases, a.reference(), kStride, a.sums);
+         benchmark::DoNotOptimize(
+             k.first_phases_below_star(a.block, a.reference(), a.refs, kStride, a.limits));
      }},
-    {"sad_last_phases_average",
+    {"first_phases_below_cross",
      [](const Kernels& k, Arena& a) {
-         k.sad_last_phases_average(a.phases, a.a[0], a.b[0], kStride, a.sums);
+         benchmark::DoNotOptimize(
+             k.first_phases_below_cross(a.block, a.reference(), a.refs, kStride, a.limits));
      }},
     {"extend_edges",
      [](const Kernels& k, Arena& a) {
@@ -128,18 +144,29 @@ constexpr Case kCases[] = {
     {"copy_16x16",
      [](const Kernels& k, Arena& a) { k.copy_16x16(a.pred, a.reference(), kStride); }},
     {"average_16x16",
-     [](const Kernels& k, Arena& a) { k.average_16x16(a.pred, a.a[0], kStride, a.b[0], kStride); }},
+     [](const Kernels& k, Arena& a) {
+         k.average_16x16(a.pred, a.refs[0], kStride, a.refs[1], kStride);
+     }},
     {"centre_16x16",
      [](const Kernels& k, Arena& a) { k.centre_16x16(a.pred, a.reference(), kStride); }},
     {"chroma_8x8",
-     [](const Kernels& k, Arena& a) { k.chroma_8x8(a.pred, a.reference(), kStride, 3, 5); }},
-    {"transform_16x16",
-     [](const Kernels& k, Arena& a) { k.transform_16x16(a.current, kStride, a.pred, a.coefs); }},
-    {"transform_8x8",
-     [](const Kernels& k, Arena& a) { k.transform_8x8(a.current, kStride, a.pred, a.coefs); }},
+     [](const Kernels& k, Arena& a) { k.chroma_8x8(a.pred, a.refs[0], a.refs[1], kStride, 3, 5); }},
     {"transform_4x4",
      [](const Kernels& k, Arena& a) { k.transform_4x4(a.current, kStride, a.pred, a.coefs); }},
-    {"quantize", [](const Kernels& k, Arena& a) { quantize(k, a, 16); }},
+    {"quantize",
+     [](const Kernels& k, Arena& a) {
+         benchmark::DoNotOptimize(k.quantize(a.coefs, quantizer(), a.scan, a.nonzero));
+     }},
+    {"code_residual_16x16",
+     [](const Kernels& k, Arena& a) {
+         benchmark::DoNotOptimize(k.code_residual_16x16(a.current, kStride, a.pred, quantizer(),
+                                                        nullptr, a.coefs, a.scan, a.nonzero));
+     }},
+    {"code_residual_8x8",
+     [](const Kernels& k, Arena& a) {
+         benchmark::DoNotOptimize(k.code_residual_8x8(a.current, kStride, a.pred, quantizer(), a.dc,
+                                                      a.coefs, a.scan, a.nonzero));
+     }},
     {"reconstruct_16x16",
      [](const Kernels& k, Arena& a) {
          k.reconstruct_16x16(a.coefs, 0xffff, a.pred, a.current, kStride);
@@ -158,14 +185,15 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) { k.phase_satd_8x8(a.current, kStride, a.pred, a.sums); }},
     {"phase_satd_4x4",
      [](const Kernels& k, Arena& a) { k.phase_satd_4x4(a.current, kStride, a.pred, a.sums); }},
-    {"deblock_luma_vertical", run_normal<&Kernels::deblock_luma_vertical>},
-    {"deblock_luma_horizontal", run_normal<&Kernels::deblock_luma_horizontal>},
-    {"deblock_chroma_vertical", run_normal<&Kernels::deblock_chroma_vertical>},
-    {"deblock_chroma_horizontal", run_normal<&Kernels::deblock_chroma_horizontal>},
-    {"deblock_luma_vertical_strong", run_strong<&Kernels::deblock_luma_vertical_strong>},
-    {"deblock_luma_horizontal_strong", run_strong<&Kernels::deblock_luma_horizontal_strong>},
-    {"deblock_chroma_vertical_strong", run_strong<&Kernels::deblock_chroma_vertical_strong>},
-    {"deblock_chroma_horizontal_strong", run_strong<&Kernels::deblock_chroma_horizontal_strong>},
+    {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical>},
+    {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal>},
+    {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical>},
+    {"deblock_chroma_horizontal", run_chroma<&Kernels::deblock_chroma_horizontal>},
+    {"deblock_luma_vertical_strong", run_strong_luma<&Kernels::deblock_luma_vertical_strong>},
+    {"deblock_luma_horizontal_strong", run_strong_luma<&Kernels::deblock_luma_horizontal_strong>},
+    {"deblock_chroma_vertical_strong", run_strong_chroma<&Kernels::deblock_chroma_vertical_strong>},
+    {"deblock_chroma_horizontal_strong",
+     run_strong_chroma<&Kernels::deblock_chroma_horizontal_strong>},
 };
 static_assert(sizeof(Kernels) ==
                   sizeof(const char*) + sizeof kCases / sizeof *kCases * sizeof(void (*)()),

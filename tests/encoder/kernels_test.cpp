@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstddef>
 #include <cstring>
 #include <memory>
 #include <string>
@@ -110,104 +111,152 @@ struct Case {
     void (*run)(const Kernels& k, Arena& a, Random random);
 };
 
-// Puts the phases of a block into the arena's samples.
-void split_current(Arena& a, Random& random) {
+// Arranges a block in the arena's samples.
+void arrange_current(Arena& a, Random& random) {
     const Place current(a.plane[0], random, 16);
-    zolt::scalar_kernels().split_phases(current.p, current.stride, a.pred());
+    zolt::scalar_kernels().arrange_block(current.p, current.stride, a.pred());
 }
 
-// Four pairs of blocks with one stride, as the stages of the motion search give them.
-struct References {
-    const std::uint8_t* a[4];
-    const std::uint8_t* b[4];
+// A block of the reference and eight around it, with limits at which their distortions decide.
+struct Candidates {
+    const std::uint8_t* centre;
+    const std::uint8_t* refs[8];
     std::ptrdiff_t stride;
+    alignas(32) std::int32_t limits[8];
 
-    References(Arena& arena, Random& random) {
-        const Place centre(arena.plane[1], random);
-        stride = centre.stride;
-        for (int i = 0; i < 4; ++i) {
-            a[i] = centre.p + random.between(-8, 8) * stride + random.between(-8, 8);
-            b[i] = a[i] + random.between(-1, 1) * stride + random.between(-1, 1);
+    Candidates(Arena& arena, Random& random) {
+        const Place place(arena.plane[1], random);
+        centre = place.p;
+        stride = place.stride;
+        for (int i = 0; i < 8; ++i) {
+            refs[i] = centre + random.between(-8, 8) * stride + random.between(-8, 8);
+            int sums[4];
+            zolt::scalar_kernels().phase_sads(arena.pred(), refs[i], stride, sums);
+            const int choices[4] = {sums[1], sums[1] + 1, sums[1] + random.between(-300, 300),
+                                    random.between(0, 1) ? 0xffffff : -5};
+            limits[i] = choices[random.between(0, 3)];
+        }
+    }
+
+    // Limits at which the distortions of averages decide.
+    void average(const Arena& arena, bool cross, Random& random) {
+        for (int i = 0; i < 8; ++i) {
+            const bool diagonal = cross && i >= 4;
+            const std::uint8_t* a = diagonal ? refs[zolt::kCrossPairs[i - 4][0]] : centre;
+            const std::uint8_t* b = refs[diagonal ? zolt::kCrossPairs[i - 4][1] : i];
+            int sums[4];
+            zolt::scalar_kernels().phase_sads_average(arena.samples + kMargin, a, b, stride, sums);
+            limits[i] = sums[1] + random.between(-1, 2);
         }
     }
 };
 
-void run_quantize(const Kernels& k, Arena& a, Random random) {
+const zolt::Quantizer& any_quantizer(Random& random) {
     const int qp = random.between(0, 51);
-    const zolt::Quantizer& q =
-        random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
-    constexpr int kCounts[] = {1, 4, 16};
-    const int count = kCounts[random.between(0, 2)];
+    return random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+}
+
+void run_quantize(const Kernels& k, Arena& a, Random random) {
+    const zolt::Quantizer& q = any_quantizer(random);
     // No residual transforms to more than 36 * 255; beyond, the scaled coefficients need not fit.
     const bool beyond = random.between(0, 3) == 0;
-    for (int i = 0; i < 16 * count; ++i) {
+    for (int i = 0; i < 16; ++i) {
         std::int16_t& c = a.coef()[i];
-        const int edge = q.dead_zone[i % 16] + random.between(0, 1);
+        const int edge = q.dead_zone[i] + random.between(0, 1);
         const int limited = beyond ? c : c % 9181;
         c = static_cast<std::int16_t>(random.between(0, 3) ? limited : c < 0 ? -edge : edge);
     }
-    a.result = k.quantize(a.coef(), count, q, a.scan + kMargin, a.nonzero + kMargin);
+    a.result = k.quantize(a.coef(), q, a.scan + kMargin, a.nonzero + kMargin);
     if (beyond) {
-        std::fill(a.coef(), a.coef() + 16 * count, std::int16_t{0});
+        std::fill(a.coef(), a.coef() + 16, std::int16_t{0});
     }
 }
 
-using Normal = Kernels::NormalFilter Kernels::*;
-using Strong = Kernels::StrongFilter Kernels::*;
-
-template <Normal filter>
-void run_normal(const Kernels& k, Arena& a, Random random) {
-    const Place edge(a.plane[0], random, 4);
-    const int alpha = random.between(0, 255), beta = random.between(0, 18);
-    std::int8_t tc0[4];
-    for (auto& t : tc0) {
-        t = static_cast<std::int8_t>(random.between(-1, 25));
+// A residual kernel on blocks of `size` x `size` samples. Predictions near the samples leave some
+// blocks without levels.
+template <auto kernel, int size>
+void run_residual(const Kernels& k, Arena& a, Random random) {
+    const Place src(a.plane[0], random, size);
+    const zolt::Quantizer& q = any_quantizer(random);
+    for (int i = 0; i < size * size && random.between(0, 7); ++i) {
+        a.pred()[i] = src.p[i / size * src.stride + i % size];
     }
-    (k.*filter)(edge.p, edge.stride, alpha, beta, tc0);
+    std::int16_t* const dc =
+        random.between(0, 1) ? reinterpret_cast<std::int16_t*>(a.out()) : nullptr;
+    a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, dc, a.coef(), a.scan + kMargin,
+                           a.nonzero + kMargin);
 }
 
-template <Strong filter>
-void run_strong(const Kernels& k, Arena& a, Random random) {
-    const Place edge(a.plane[0], random, 4);
+// Runs a filter with random parameters on the edge whose samples it takes.
+template <auto filter, bool strong, typename... Samples>
+void run_filter(const Kernels& k, Random& random, std::ptrdiff_t stride, Samples... samples) {
     const int alpha = random.between(0, 255), beta = random.between(0, 18);
-    (k.*filter)(edge.p, edge.stride, alpha, beta);
+    if constexpr (strong) {
+        (k.*filter)(samples..., stride, alpha, beta);
+    } else {
+        std::int8_t tc0[4];
+        for (auto& t : tc0) {
+            t = static_cast<std::int8_t>(random.between(-1, 25));
+        }
+        (k.*filter)(samples..., stride, alpha, beta, tc0);
+    }
+}
+
+template <auto filter, bool strong>
+void run_luma_filter(const Kernels& k, Arena& a, Random random) {
+    const Place edge(a.plane[0], random, 4);
+    run_filter<filter, strong>(k, random, edge.stride, edge.p);
+}
+
+template <auto filter, bool strong>
+void run_chroma_filter(const Kernels& k, Arena& a, Random random) {
+    const Place edge(a.plane[0], random, 4);
+    run_filter<filter, strong>(k, random, edge.stride, edge.p, a.plane[1] + (edge.p - a.plane[0]));
 }
 
 constexpr Case kCases[] = {
-    {"split_phases",
+    {"arrange_block",
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random, 16);
-         k.split_phases(src.p, src.stride, a.pred());
+         k.arrange_block(src.p, src.stride, a.pred());
      }},
-    {"sad_first_phases",
+    {"phase_sads",
      [](const Kernels& k, Arena& a, Random random) {
-         split_current(a, random);
-         const References refs(a, random);
-         k.sad_first_phases(a.pred(), refs.a[0], refs.stride, a.out());
+         arrange_current(a, random);
+         const Place ref(a.plane[1], random);
+         k.phase_sads(a.pred(), ref.p, ref.stride, a.out());
      }},
-    {"sad_first_phases_x4",
+    {"phase_sads_average",
      [](const Kernels& k, Arena& a, Random random) {
-         split_current(a, random);
-         const References refs(a, random);
-         k.sad_first_phases_x4(a.pred(), refs.a, refs.stride, a.out(), a.out() + 4);
+         arrange_current(a, random);
+         const Place ref(a.plane[1], random);
+         k.phase_sads_average(a.pred(), ref.p, ref.p + random.between(-2, 2), ref.stride, a.out());
      }},
-    {"sad_first_phases_average_x4",
+    {"first_phases_below_x4",
      [](const Kernels& k, Arena& a, Random random) {
-         split_current(a, random);
-         const References refs(a, random);
-         k.sad_first_phases_average_x4(a.pred(), refs.a, refs.b, refs.stride, a.out(), a.out() + 4);
+         arrange_current(a, random);
+         const Candidates c(a, random);
+         a.result = k.first_phases_below_x4(a.pred(), c.refs, c.stride, c.limits);
      }},
-    {"sad_last_phases",
+    {"first_phases_below_x8",
      [](const Kernels& k, Arena& a, Random random) {
-         split_current(a, random);
-         const References refs(a, random);
-         k.sad_last_phases(a.pred(), refs.a[0], refs.stride, a.out());
+         arrange_current(a, random);
+         const Candidates c(a, random);
+         a.result = k.first_phases_below_x8(a.pred(), c.refs, c.stride, c.limits);
      }},
-    {"sad_last_phases_average",
+    {"first_phases_below_star",
      [](const Kernels& k, Arena& a, Random random) {
-         split_current(a, random);
-         const References refs(a, random);
-         k.sad_last_phases_average(a.pred(), refs.a[0], refs.b[0], refs.stride, a.out());
+         arrange_current(a, random);
+         Candidates c(a, random);
+         c.average(a, false, random);
+         a.result = k.first_phases_below_star(a.pred(), c.centre, c.refs, c.stride, c.limits);
+     }},
+    {"first_phases_below_cross",
+     [](const Kernels& k, Arena& a, Random random) {
+         arrange_current(a, random);
+         Candidates c(a, random);
+         c.average(a, true, random);
+         a.result = k.first_phases_below_cross(a.pred(), c.centre, c.refs, c.stride, c.limits);
      }},
     {"extend_edges",
      [](const Kernels& k, Arena& a, Random random) {
@@ -250,17 +299,7 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random);
          const int fx = random.between(0, 7), fy = random.between(0, 7);
-         k.chroma_8x8(a.pred(), src.p, src.stride, fx, fy);
-     }},
-    {"transform_16x16",
-     [](const Kernels& k, Arena& a, Random random) {
-         const Place src(a.plane[0], random, 16);
-         k.transform_16x16(src.p, src.stride, a.pred(), a.coef());
-     }},
-    {"transform_8x8",
-     [](const Kernels& k, Arena& a, Random random) {
-         const Place src(a.plane[0], random, 8);
-         k.transform_8x8(src.p, src.stride, a.pred(), a.coef());
+         k.chroma_8x8(a.pred(), src.p, a.plane[1] + (src.p - a.plane[0]), src.stride, fx, fy);
      }},
     {"transform_4x4",
      [](const Kernels& k, Arena& a, Random random) {
@@ -268,6 +307,8 @@ constexpr Case kCases[] = {
          k.transform_4x4(src.p, src.stride, a.pred(), a.coef());
      }},
     {"quantize", run_quantize},
+    {"code_residual_16x16", run_residual<&Kernels::code_residual_16x16, 16>},
+    {"code_residual_8x8", run_residual<&Kernels::code_residual_8x8, 8>},
     {"reconstruct_16x16",
      [](const Kernels& k, Arena& a, Random random) {
          const Place dst(a.plane[0], random, 16);
@@ -307,14 +348,17 @@ constexpr Case kCases[] = {
          // The engine keeps the predictions of the nine modes one after the other.
          k.phase_satd_4x4(src.p, src.stride, a.pred() + 16 * random.between(0, 8), a.out());
      }},
-    {"deblock_luma_vertical", run_normal<&Kernels::deblock_luma_vertical>},
-    {"deblock_luma_horizontal", run_normal<&Kernels::deblock_luma_horizontal>},
-    {"deblock_chroma_vertical", run_normal<&Kernels::deblock_chroma_vertical>},
-    {"deblock_chroma_horizontal", run_normal<&Kernels::deblock_chroma_horizontal>},
-    {"deblock_luma_vertical_strong", run_strong<&Kernels::deblock_luma_vertical_strong>},
-    {"deblock_luma_horizontal_strong", run_strong<&Kernels::deblock_luma_horizontal_strong>},
-    {"deblock_chroma_vertical_strong", run_strong<&Kernels::deblock_chroma_vertical_strong>},
-    {"deblock_chroma_horizontal_strong", run_strong<&Kernels::deblock_chroma_horizontal_strong>},
+    {"deblock_luma_vertical", run_luma_filter<&Kernels::deblock_luma_vertical, false>},
+    {"deblock_luma_horizontal", run_luma_filter<&Kernels::deblock_luma_horizontal, false>},
+    {"deblock_chroma_vertical", run_chroma_filter<&Kernels::deblock_chroma_vertical, false>},
+    {"deblock_chroma_horizontal", run_chroma_filter<&Kernels::deblock_chroma_horizontal, false>},
+    {"deblock_luma_vertical_strong", run_luma_filter<&Kernels::deblock_luma_vertical_strong, true>},
+    {"deblock_luma_horizontal_strong",
+     run_luma_filter<&Kernels::deblock_luma_horizontal_strong, true>},
+    {"deblock_chroma_vertical_strong",
+     run_chroma_filter<&Kernels::deblock_chroma_vertical_strong, true>},
+    {"deblock_chroma_horizontal_strong",
+     run_chroma_filter<&Kernels::deblock_chroma_horizontal_strong, true>},
 };
 // All function pointers of a table have a case.
 static_assert(sizeof(Kernels) ==
