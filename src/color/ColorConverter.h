@@ -48,6 +48,9 @@ public:
     // buffer. An undefined format leaves the buffer as it was: all 0.
     void Convert(const unsigned char* source);
 
+    // Whether the output is the source as it stands, so that Convert only copies it.
+    bool KeepsPictures() const { return sourceFormat == resultFormat && !NeedsCropping(); }
+
     int GetOutputWidth() const { return outputWidth; }
     int GetOutputHeight() const { return outputHeight; }
     // The converted picture: owned by the converter, overwritten by the next Convert.

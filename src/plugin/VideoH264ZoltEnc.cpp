@@ -92,7 +92,11 @@ void VideoH264ZoltEnc::PutSample(ISample* sample) {
         return;
     }
     MeasureFrameRate(time);
-    converter->Convert(data);
+    // The engine reads a picture that needs no conversion where it stands.
+    const bool converts = !converter->KeepsPictures();
+    if (converts) {
+        converter->Convert(data);
+    }
 
     // However the rest ends, the engine is ready for the next frame. The engine is looked up again
     // then: a consumer that calls back against the rules may have replaced it.
@@ -105,7 +109,7 @@ void VideoH264ZoltEnc::PutSample(ISample* sample) {
         }
     } const reset{*this};
     engine().set_intra_period(keyFrameInt);
-    engine().encode_frame(frameBuffer);
+    engine().encode_frame(converts ? frameBuffer.load() : data);
     FillOutSample(time);
     if (ISampleConsumer* const connected = consumer) {
         connected->PutSample(&outSample);
