@@ -185,6 +185,10 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) { k.phase_satd_8x8(a.current, kStride, a.pred, a.sums); }},
     {"phase_satd_4x4",
      [](const Kernels& k, Arena& a) { k.phase_satd_4x4(a.current, kStride, a.pred, a.sums); }},
+    {"intra_4x4_modes",
+     [](const Kernels& k, Arena& a) {
+         k.intra_4x4_modes(a.current, kStride, a.reference(), 100, a.pred, a.coefs);
+     }},
     {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical>},
     {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal>},
     {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical>},

@@ -242,6 +242,7 @@ public:
     // with status 104.
     static void ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up, int left,
                        int mode);
+    static int ipred4_dc(const std::uint8_t* neighbours, int up, int left);
     static void ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
                         int left, int mode);
     static void ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,

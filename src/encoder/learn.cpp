@@ -16,6 +16,14 @@ constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
 // Factors of the predicted mode's share at which another 4x4 mode is dropped, by step.
 constexpr double thresh_4[4] = {2.0, 1.25, 1.0, 1.0};
 
+// 4x4 modes that a block lacks the neighbours for (1), by whether there are samples above and to
+// the left; what follows the nine modes is padding.
+constexpr std::int16_t kUnavailable4[2][2][16] = {
+    {{1, 1, 0, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1, 1},
+     {1, 0, 0, 1, 1, 1, 1, 1, 0, 1, 1, 1, 1, 1, 1, 1}},
+    {{0, 1, 0, 0, 1, 1, 1, 0, 1, 1, 1, 1, 1, 1, 1, 1},
+     {0, 0, 0, 0, 0, 0, 0, 0, 0, 1, 1, 1, 1, 1, 1, 1}}};
+
 // Thresholds of the inter/intra tree as cubic polynomials of QP, in groups of four thresholds: four
 // cubic coefficients, four quadratic, four linear, four constant.
 constexpr float _treepoly_p_l35[48] = {
@@ -284,60 +292,53 @@ int CEncoder::learn_chroma_mode() {
 }
 
 // Mode of intra 4x4 block k, whose predicted mode is predicted_mode; leaves its prediction in pred.
+// The elimination takes every step for all modes at once: a mode that was dropped cannot win.
 int CEncoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
     const std::uint8_t* src =
         g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
     const bool up = g_blk_up[k] != 0;
     const bool left = g_blk_left[k] != 0;
-    std::uint8_t neighbours[13];
+    std::uint8_t neighbours[16] = {};  // 13, and room for kernels to read
     gather_neighbours4(neighbours, src, g_stride_luma, up, left, g_blk_up_right[k],
                        g_blk_up_left[k]);
 
-    std::int32_t distortion[9][4];
+    std::int32_t d[4];
     ipred4(pred, neighbours, up, left, predicted_mode);
-    g_kernels->phase_satd_4x4(src, g_stride_luma, pred, distortion[predicted_mode]);
-    const std::int32_t* d = distortion[predicted_mode];
+    g_kernels->phase_satd_4x4(src, g_stride_luma, pred, d);
     const int predicted_cost = d[0] + d[1] + d[2] + d[3];
-
-    Candidates<9> candidates;
-    const bool both = up && left;
-    const bool possible[9] = {up, left, true, up, both, both, both, up, left};
-    for (int mode = 0; mode < 9; ++mode) {
-        candidates.enabled[mode] = possible[mode] && mode != predicted_mode;
-    }
-    if (candidates.number() == 0 || predicted_cost <= 8 * g_intra_lambda + 64) {
+    if ((!up && !left) || predicted_cost <= 8 * g_intra_lambda + 64) {
         return predicted_mode;
     }
 
-    alignas(32) std::uint8_t other[9][16];
-    for (int mode = 0; mode < 9; ++mode) {
-        if (candidates.enabled[mode]) {
-            ipred4(other[mode], neighbours, up, left, mode);
-            g_kernels->phase_satd_4x4(src, g_stride_luma, other[mode], distortion[mode]);
-        }
-    }
+    alignas(32) std::uint8_t modes[9][16];
+    alignas(32) std::int16_t distortion[4][16];
+    g_kernels->intra_4x4_modes(src, g_stride_luma, neighbours, ipred4_dc(neighbours, up, left),
+                               modes[0], distortion[0]);
     const int share = predicted_cost >> 2;
+    const std::int16_t rate = static_cast<std::int16_t>(2 * g_intra_lambda);
+    std::int16_t cost[16] = {};
+    std::int16_t dropped[16];  // 0: still a candidate
+    std::copy(kUnavailable4[up][left], kUnavailable4[up][left] + 16, dropped);
+    dropped[predicted_mode] = 1;
     for (int step = 0; step < 4; ++step) {
-        for (int mode = 0; mode < 9; ++mode) {
-            if (candidates.enabled[mode]) {
-                candidates.cost[mode] += distortion[mode][step] + 2 * g_intra_lambda;
-            }
-        }
-        if (step == 3) {
-            break;
-        }
-        const double limit = (step + 1) * share * thresh_4[step];
-        for (int mode = 0; mode < 9; ++mode) {
-            candidates.enabled[mode] = candidates.enabled[mode] && !(candidates.cost[mode] > limit);
-        }
-        if (candidates.number() == 0) {
-            return predicted_mode;
+        // Costs are integers, so that the fraction of a limit does not matter.
+        const std::int16_t limit = static_cast<std::int16_t>((step + 1) * share * thresh_4[step]);
+        for (int mode = 0; mode < 16; ++mode) {
+            cost[mode] = static_cast<std::int16_t>(cost[mode] + distortion[step][mode] + rate);
+            dropped[mode] =
+                static_cast<std::int16_t>(dropped[mode] | (step < 3 && cost[mode] > limit ? 1 : 0));
         }
     }
-    const int best = candidates.best();
-    if (4 * share <= candidates.cost[best]) {
-        return predicted_mode;
+    int best = predicted_mode;
+    int best_cost = 4 * share;
+    for (int mode = 0; mode < 9; ++mode) {
+        if (dropped[mode] == 0 && cost[mode] < best_cost) {
+            best = mode;
+            best_cost = cost[mode];
+        }
     }
-    std::copy(other[best], other[best] + 16, pred);
+    if (best != predicted_mode) {
+        std::copy(modes[best], modes[best] + 16, pred);
+    }
     return best;
 }

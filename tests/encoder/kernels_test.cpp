@@ -348,6 +348,12 @@ constexpr Case kCases[] = {
          // The engine keeps the predictions of the nine modes one after the other.
          k.phase_satd_4x4(src.p, src.stride, a.pred() + 16 * random.between(0, 8), a.out());
      }},
+    {"intra_4x4_modes",
+     [](const Kernels& k, Arena& a, Random random) {
+         const Place src(a.plane[0], random, 4);
+         const std::uint8_t* neighbours = a.plane[1] + random.between(0, 100);
+         k.intra_4x4_modes(src.p, src.stride, neighbours, random.sample(), a.pred(), a.coef());
+     }},
     {"deblock_luma_vertical", run_luma_filter<&Kernels::deblock_luma_vertical, false>},
     {"deblock_luma_horizontal", run_luma_filter<&Kernels::deblock_luma_horizontal, false>},
     {"deblock_chroma_vertical", run_chroma_filter<&Kernels::deblock_chroma_vertical, false>},

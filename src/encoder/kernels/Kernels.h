@@ -157,6 +157,14 @@ struct Kernels {
     void (*phase_satd_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
                            std::int32_t* distortion);
 
+    // The predictions of all nine intra 4x4 modes from a block's neighbours L, K, J, I, M, A..H (16
+    // bytes are read), with dc for the DC mode: at preds, one after the other. And their
+    // distortions as those of phase_satd_4x4: that of phase p of mode m at [16 * p + m], 0 at m
+    // > 8.
+    void (*intra_4x4_modes)(const std::uint8_t* src, std::ptrdiff_t stride,
+                            const std::uint8_t* neighbours, int dc, std::uint8_t* preds,
+                            std::int16_t* distortion);
+
     // ---- Deblocking (clause 8.7.2) ----
 
     // Filters one macroblock edge: pix, u and v are the first samples on the q side; "vertical"

@@ -703,6 +703,99 @@ void hadamard_energy(const int32_t* values, int32_t* energy) {
     store_16(energy, _mm_unpacklo_epi64(low, sums));
 }
 
+// ---- Intra 4x4 prediction ----
+
+// The predictions of clause 8.3.1.2 in the order of their modes, from the neighbours L, K, J, I, M,
+// A..H. Every row of a directional mode is made of neighbours, of two in a row averaged, and of
+// three in a row filtered.
+void predict_4x4_modes(const uint8_t* neighbours_at, int dc, __m128i* modes) {
+    constexpr char x = -1;  // from the other vector
+    const __m128i n = load_16(neighbours_at);
+    const __m128i before =
+        _mm_shuffle_epi8(n, _mm_setr_epi8(0, 0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 12, 12));
+    const __m128i after =
+        _mm_shuffle_epi8(n, _mm_setr_epi8(1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 12, 12, 12, 12));
+    const __m128i two = _mm_avg_epu8(n, after);  // (n[i] + n[i + 1] + 1) >> 1
+    const __m128i odd = _mm_and_si128(_mm_xor_si128(before, after), _mm_set1_epi8(1));
+    // (n[i - 1] + 2 n[i] + n[i + 1] + 2) >> 2
+    const __m128i three = _mm_avg_epu8(n, _mm_sub_epi8(_mm_avg_epu8(before, after), odd));
+    const auto mix = [=](__m128i from_two, __m128i from_three) {
+        return _mm_or_si128(_mm_shuffle_epi8(two, from_two), _mm_shuffle_epi8(three, from_three));
+    };
+    modes[0] = _mm_shuffle_epi8(n, _mm_set1_epi32(0x08070605));
+    modes[1] = _mm_shuffle_epi8(n, _mm_setr_epi8(3, 3, 3, 3, 2, 2, 2, 2, 1, 1, 1, 1, 0, 0, 0, 0));
+    modes[2] = _mm_set1_epi8(static_cast<char>(dc));
+    modes[3] = _mm_shuffle_epi8(
+        three, _mm_setr_epi8(6, 7, 8, 9, 7, 8, 9, 10, 8, 9, 10, 11, 9, 10, 11, 12));
+    modes[4] =
+        _mm_shuffle_epi8(three, _mm_setr_epi8(4, 5, 6, 7, 3, 4, 5, 6, 2, 3, 4, 5, 1, 2, 3, 4));
+    modes[5] = mix(_mm_setr_epi8(4, 5, 6, 7, x, x, x, x, x, 4, 5, 6, x, x, x, x),
+                   _mm_setr_epi8(x, x, x, x, 4, 5, 6, 7, 3, x, x, x, 2, 4, 5, 6));
+    modes[6] = mix(_mm_setr_epi8(3, x, x, x, 2, x, 3, x, 1, x, 2, x, 0, x, 1, x),
+                   _mm_setr_epi8(x, 4, 5, 6, x, 3, x, 4, x, 2, x, 3, x, 1, x, 2));
+    modes[7] = mix(_mm_setr_epi8(5, 6, 7, 8, x, x, x, x, 6, 7, 8, 9, x, x, x, x),
+                   _mm_setr_epi8(x, x, x, x, 6, 7, 8, 9, x, x, x, x, 7, 8, 9, 10));
+    const __m128i last =
+        _mm_shuffle_epi8(n, _mm_setr_epi8(x, x, x, x, x, x, x, x, x, x, 0, 0, 0, 0, 0, 0));
+    modes[8] = _mm_or_si128(mix(_mm_setr_epi8(2, x, 1, x, 1, x, 0, x, 0, x, x, x, x, x, x, x),
+                                _mm_setr_epi8(x, 2, x, 1, x, 1, x, 0, x, 0, x, x, x, x, x, x)),
+                            last);
+}
+
+// The distortions of two predictions at the four phases, as 16-bit values in the low half of either
+// lane; rows 0, 1 and 2, 3 of the block are in both lanes.
+__m256i phase_satds(__m256i src_01, __m256i src_23, __m128i a, __m128i b) {
+    const __m256i rows_01 =
+        _mm256_sub_epi16(src_01, _mm256_cvtepu8_epi16(_mm_unpacklo_epi64(a, b)));
+    const __m256i rows_23 =
+        _mm256_sub_epi16(src_23, _mm256_cvtepu8_epi16(_mm_unpackhi_epi64(a, b)));
+    const __m256i sums = _mm256_abs_epi16(_mm256_add_epi16(rows_01, rows_23));
+    const __m256i differences = _mm256_abs_epi16(_mm256_sub_epi16(rows_01, rows_23));
+    // |a + b| + |a - b| = 2 max(|a|, |b|), a and b two columns apart.
+    const __m256i largest =
+        _mm256_add_epi16(_mm256_max_epi16(sums, _mm256_srli_epi64(sums, 32)),
+                         _mm256_max_epi16(differences, _mm256_srli_epi64(differences, 32)));
+    return _mm256_shuffle_epi32(_mm256_add_epi16(largest, largest), _MM_SHUFFLE(3, 1, 2, 0));
+}
+
+__m256i two_rows_of_4(const uint8_t* src, ptrdiff_t stride) {
+    int32_t upper, lower;
+    __builtin_memcpy(&upper, src, sizeof upper);
+    __builtin_memcpy(&lower, src + stride, sizeof lower);
+    return _mm256_broadcastsi128_si256(
+        _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1)));
+}
+
+void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighbours_at, int dc,
+                     uint8_t* preds, int16_t* distortion) {
+    __m128i modes[9];
+    predict_4x4_modes(neighbours_at, dc, modes);
+    for (int mode = 0; mode < 9; ++mode) {
+        store_16(preds + 16 * mode, modes[mode]);
+    }
+    const __m256i src_01 = two_rows_of_4(src, stride);
+    const __m256i src_23 = two_rows_of_4(src + 2 * stride, stride);
+    __m256i d[4];  // modes n and n + 4
+    for (int n = 0; n < 4; ++n) {
+        d[n] = phase_satds(src_01, src_23, modes[n], modes[n + 4]);
+    }
+    const __m256i d01 = _mm256_unpacklo_epi16(d[0], d[1]);
+    const __m256i d23 = _mm256_unpacklo_epi16(d[2], d[3]);
+    constexpr int kLanesBySide = _MM_SHUFFLE(3, 1, 2, 0);
+    const __m256i first = _mm256_permute4x64_epi64(_mm256_unpacklo_epi32(d01, d23), kLanesBySide);
+    const __m256i last = _mm256_permute4x64_epi64(_mm256_unpackhi_epi32(d01, d23), kLanesBySide);
+    const __m128i d8 = low_lane(phase_satds(src_01, src_23, modes[8], modes[8]));
+    const __m128i first_value = _mm_setr_epi16(-1, 0, 0, 0, 0, 0, 0, 0);
+    const auto store_phase = [=](int phase, __m128i eight, __m128i ninth) {
+        store_16(distortion + 16 * phase, eight);
+        store_16(distortion + 16 * phase + 8, _mm_and_si128(ninth, first_value));
+    };
+    store_phase(0, low_lane(first), d8);
+    store_phase(1, high_lane(first), _mm_srli_epi64(d8, 16));
+    store_phase(2, low_lane(last), _mm_srli_epi64(d8, 32));
+    store_phase(3, high_lane(last), _mm_srli_epi64(d8, 48));
+}
+
 // ---- Deblocking ----
 
 // Sixteen lines of an edge.
@@ -956,6 +1049,7 @@ Kernels with_avx2(const Kernels& base) {
     k.reconstruct_8x8 = reconstruct_8x8;
     k.block_sums = block_sums;
     k.hadamard_energy = hadamard_energy;
+    k.intra_4x4_modes = intra_4x4_modes;
     k.deblock_luma_vertical = deblock_luma_vertical;
     k.deblock_luma_horizontal = deblock_luma_horizontal;
     k.deblock_chroma_vertical = deblock_chroma_vertical;

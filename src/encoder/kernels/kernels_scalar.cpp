@@ -3,6 +3,7 @@
 #include <cstring>
 
 #include "encoder/kernels/Kernels.h"
+#include "encoder/kernels/predict_4x4.h"
 #include "encoder/kernels/zigzag.h"
 
 namespace zolt {
@@ -444,6 +445,19 @@ void phase_satd_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
     phase_satd<2>(src, stride, pred, distortion);
 }
 
+void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighbours, int dc,
+                     uint8_t* preds, int16_t* distortion) {
+    std::fill(distortion, distortion + 64, int16_t{0});
+    for (int mode = 0; mode < 9; ++mode, preds += 16) {
+        predict_4x4(preds, neighbours, dc, mode);
+        int32_t phases[4];
+        phase_satd_4x4(src, stride, preds, phases);
+        for (int p = 0; p < 4; ++p) {
+            distortion[16 * p + mode] = static_cast<int16_t>(phases[p]);
+        }
+    }
+}
+
 // ---- Deblocking ----
 
 // Whether a line of samples across an edge is filtered at all: clause 8.7.2.2, filterSamplesFlag.
@@ -609,6 +623,7 @@ const Kernels& scalar_kernels() {
         phase_sad_16x16,
         phase_satd_8x8,
         phase_satd_4x4,
+        intra_4x4_modes,
         deblock_luma_vertical,
         deblock_luma_horizontal,
         deblock_chroma_vertical,

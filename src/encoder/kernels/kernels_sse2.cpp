@@ -4,6 +4,7 @@
 #include <initializer_list>
 
 #include "encoder/kernels/deblock_simd.h"
+#include "encoder/kernels/predict_4x4.h"
 #include "encoder/kernels/x86_tables.h"
 #include "encoder/kernels/zigzag.h"
 
@@ -686,21 +687,57 @@ void phase_satd_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
     }
 }
 
-void phase_satd_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
-                    int32_t* distortion) {
-    const __m128i src_01 = _mm_unpacklo_epi32(load_4(src), load_4(src + stride));
-    const __m128i src_23 = _mm_unpacklo_epi32(load_4(src + 2 * stride), load_4(src + 3 * stride));
-    const __m128i rows_01 = _mm_sub_epi16(widen_low(src_01), widen_low(load_8(pred)));
-    const __m128i rows_23 = _mm_sub_epi16(widen_low(src_23), widen_low(load_8(pred + 8)));
+// A 4x4 block's rows 0, 1 and 2, 3 in 16-bit lanes.
+struct TwoRowPairs {
+    __m128i rows_01, rows_23;
+};
+
+TwoRowPairs load_4x4(const uint8_t* src, ptrdiff_t stride) {
+    return {widen_low(_mm_unpacklo_epi32(load_4(src), load_4(src + stride))),
+            widen_low(_mm_unpacklo_epi32(load_4(src + 2 * stride), load_4(src + 3 * stride)))};
+}
+
+// The distortions of the four phases as 16-bit values in the low half.
+__m128i phase_satds(const TwoRowPairs& src, const uint8_t* pred) {
+    const __m128i rows_01 = _mm_sub_epi16(src.rows_01, widen_low(load_8(pred)));
+    const __m128i rows_23 = _mm_sub_epi16(src.rows_23, widen_low(load_8(pred + 8)));
     const __m128i sums = absolute_16(_mm_add_epi16(rows_01, rows_23));
     const __m128i differences = absolute_16(_mm_sub_epi16(rows_01, rows_23));
     // As above, two columns apart: each row is a group of four lanes.
     const __m128i largest =
         _mm_add_epi16(_mm_max_epi16(sums, _mm_srli_epi64(sums, 32)),
                       _mm_max_epi16(differences, _mm_srli_epi64(differences, 32)));
-    const __m128i doubled = _mm_add_epi16(largest, largest);
-    const __m128i phases = _mm_shuffle_epi32(doubled, _MM_SHUFFLE(3, 1, 2, 0));
+    return _mm_shuffle_epi32(_mm_add_epi16(largest, largest), _MM_SHUFFLE(3, 1, 2, 0));
+}
+
+void phase_satd_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                    int32_t* distortion) {
+    const __m128i phases = phase_satds(load_4x4(src, stride), pred);
     store(distortion, _mm_unpacklo_epi16(phases, _mm_setzero_si128()));
+}
+
+void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighbours, int dc,
+                     uint8_t* preds, int16_t* distortion) {
+    const TwoRowPairs block = load_4x4(src, stride);
+    __m128i d[9];
+    for (int mode = 0; mode < 9; ++mode) {
+        predict_4x4(preds + 16 * mode, neighbours, dc, mode);
+        d[mode] = phase_satds(block, preds + 16 * mode);
+    }
+    const __m128i d01 = _mm_unpacklo_epi16(d[0], d[1]), d23 = _mm_unpacklo_epi16(d[2], d[3]);
+    const __m128i d45 = _mm_unpacklo_epi16(d[4], d[5]), d67 = _mm_unpacklo_epi16(d[6], d[7]);
+    const __m128i first_low = _mm_unpacklo_epi32(d01, d23),
+                  first_high = _mm_unpackhi_epi32(d01, d23);
+    const __m128i last_low = _mm_unpacklo_epi32(d45, d67), last_high = _mm_unpackhi_epi32(d45, d67);
+    store(distortion, _mm_unpacklo_epi64(first_low, last_low));
+    store(distortion + 16, _mm_unpackhi_epi64(first_low, last_low));
+    store(distortion + 32, _mm_unpacklo_epi64(first_high, last_high));
+    store(distortion + 48, _mm_unpackhi_epi64(first_high, last_high));
+    const __m128i first_value = _mm_setr_epi16(-1, 0, 0, 0, 0, 0, 0, 0);
+    store(distortion + 8, _mm_and_si128(d[8], first_value));
+    store(distortion + 24, _mm_and_si128(_mm_srli_epi64(d[8], 16), first_value));
+    store(distortion + 40, _mm_and_si128(_mm_srli_epi64(d[8], 32), first_value));
+    store(distortion + 56, _mm_and_si128(_mm_srli_epi64(d[8], 48), first_value));
 }
 
 // ---- Deblocking ----
@@ -905,6 +942,7 @@ Kernels with_sse2(const Kernels& base) {
     k.phase_sad_16x16 = phase_sad_16x16;
     k.phase_satd_8x8 = phase_satd_8x8;
     k.phase_satd_4x4 = phase_satd_4x4;
+    k.intra_4x4_modes = intra_4x4_modes;
     k.deblock_luma_vertical = deblock_luma_vertical;
     k.deblock_luma_horizontal = deblock_luma_horizontal;
     k.deblock_chroma_vertical = deblock_chroma_vertical;
