@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstddef>
 #include <cstring>
 #include <memory>
 #include <string>
@@ -316,8 +317,8 @@ constexpr Case kCases[] = {
     {"deblock_chroma_vertical_strong", run_strong<&Kernels::deblock_chroma_vertical_strong>},
     {"deblock_chroma_horizontal_strong", run_strong<&Kernels::deblock_chroma_horizontal_strong>},
 };
-// All function pointers of a table have a case.
-static_assert(sizeof(Kernels) ==
+// All function pointers of a table have a case, those of the colour conversions elsewhere.
+static_assert(offsetof(Kernels, rgb32_rows_to_iyuv) ==
                   sizeof(const char*) + sizeof kCases / sizeof *kCases * sizeof(void (*)()),
               "a kernel without a case");
 
