@@ -24,7 +24,7 @@ KernelTables kernel_tables() {
                 ++count;
             }
             if (__builtin_cpu_supports("avx2")) {
-                table[count] = with_avx2(table[count - 1]);
+                table[count] = with_avx2_color(with_avx2(table[count - 1]));
                 ++count;
             }
 #endif
