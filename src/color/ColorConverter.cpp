@@ -291,7 +291,7 @@ void ColorConverter::Convert_BGRA_to_YUY2(const unsigned char* source) {
 }
 
 void ColorConverter::Convert_BGRA_to_IYUV(const unsigned char* source) {
-    RgbToIyuv<4>(source);
+    RgbToIyuv(source, 4, best_kernels().rgb32_rows_to_iyuv);
 }
 
 void ColorConverter::Convert_BGR_to_BGRA(const unsigned char* source) {
@@ -311,7 +311,7 @@ void ColorConverter::Convert_BGR_to_YUY2(const unsigned char* source) {
 }
 
 void ColorConverter::Convert_BGR_to_IYUV(const unsigned char* source) {
-    RgbToIyuv<3>(source);
+    RgbToIyuv(source, 3, best_kernels().rgb24_rows_to_iyuv);
 }
 
 void ColorConverter::Convert_AYUV_to_BGRA(const unsigned char* source) {
@@ -333,11 +333,7 @@ void ColorConverter::Convert_AYUV_to_YUY2(const unsigned char* source) {
 }
 
 void ColorConverter::Convert_AYUV_to_IYUV(const unsigned char* source) {
-    ForEachRowPair(
-        source, 4,
-        [&](const std::uint8_t* upper, const std::uint8_t* lower, const IyuvRowPair& to) {
-            ayuv_rows_to_iyuv(upper, lower, to, outputWidth);
-        });
+    YuvToIyuv(source, 4, best_kernels().ayuv_rows_to_iyuv);
 }
 
 void ColorConverter::Convert_YUY2_to_BGRA(const unsigned char* source) {
@@ -361,11 +357,7 @@ void ColorConverter::Convert_YUY2_to_YUY2(const unsigned char* source) {
 }
 
 void ColorConverter::Convert_YUY2_to_IYUV(const unsigned char* source) {
-    ForEachRowPair(
-        source, 2,
-        [&](const std::uint8_t* upper, const std::uint8_t* lower, const IyuvRowPair& to) {
-            yuy2_rows_to_iyuv(upper, lower, to, outputWidth);
-        });
+    YuvToIyuv(source, 2, best_kernels().yuy2_rows_to_iyuv);
 }
 
 void ColorConverter::Convert_IYUV_to_BGRA(const unsigned char* source) {
@@ -436,14 +428,21 @@ void ColorConverter::RgbToYuy2(const unsigned char* source) {
     });
 }
 
-template <int kFrom>
-void ColorConverter::RgbToIyuv(const unsigned char* source) {
-    const Rgba in = SourceOffsets();
-    ForEachRowPair(
-        source, kFrom,
-        [&](const std::uint8_t* upper, const std::uint8_t* lower, const IyuvRowPair& to) {
-            rgb_rows_to_iyuv<kFrom>(upper, lower, in, to, outputWidth);
-        });
+void ColorConverter::RgbToIyuv(const unsigned char* source, int pixelBytes,
+                               Kernels::RgbConversion kernel) {
+    const RgbOffsets at = {sourceOffsetR, sourceOffsetG, sourceOffsetB};
+    ForEachRowPair(source, pixelBytes,
+                   [&](const std::uint8_t* upper, const std::uint8_t* lower, const IyuvRows& to) {
+                       kernel(upper, lower, at, to, outputWidth);
+                   });
+}
+
+void ColorConverter::YuvToIyuv(const unsigned char* source, int pixelBytes,
+                               Kernels::YuvConversion kernel) {
+    ForEachRowPair(source, pixelBytes,
+                   [&](const std::uint8_t* upper, const std::uint8_t* lower, const IyuvRows& to) {
+                       kernel(upper, lower, to, outputWidth);
+                   });
 }
 
 template <int kTo>
@@ -517,7 +516,7 @@ void ColorConverter::ForEachRowPair(const unsigned char* source, int sourceBytes
         std::uint8_t* to = y_plane + y * outputWidth;
         const int chroma_at = y / 2 * (outputWidth / 2);
         kernel(from, from + sourceWidth * sourceBytes,
-               IyuvRowPair{to, to + outputWidth, u_plane + chroma_at, v_plane + chroma_at});
+               IyuvRows{to, to + outputWidth, u_plane + chroma_at, v_plane + chroma_at});
     }
 }
 

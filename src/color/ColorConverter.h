@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "encoder/kernels/Kernels.h"
 #include "media/fourcc.h"
 
 namespace zolt {
@@ -120,8 +121,10 @@ private:
     void RgbToAyuv(const unsigned char* source);
     template <int kFrom>
     void RgbToYuy2(const unsigned char* source);
-    template <int kFrom>
-    void RgbToIyuv(const unsigned char* source);
+    void RgbToIyuv(const unsigned char* source, int pixelBytes,
+                   zolt::Kernels::RgbConversion kernel);
+    void YuvToIyuv(const unsigned char* source, int pixelBytes,
+                   zolt::Kernels::YuvConversion kernel);
     template <int kTo>
     void AyuvToRgb(const unsigned char* source);
     template <int kTo>

@@ -5,8 +5,8 @@
 
 #include "color/color_tables.h"
 
-// Row loops of the colour converter. Widths are output pixels; loops over pixel pairs and over row
-// pairs need even ones.
+// Row loops of the colour converter, but for the conversions to 4:2:0, which are kernels. Widths
+// are output pixels; loops over pixel pairs need even ones.
 namespace zolt {
 
 struct Rgba {
@@ -85,31 +85,6 @@ void rgb_row_to_yuy2(const std::uint8_t* from, const Rgba& in, std::uint8_t* to,
     }
 }
 
-// Two luma rows of a 4:2:0 picture and the chroma rows that belong to them.
-struct IyuvRowPair {
-    std::uint8_t *upper, *lower;
-    std::uint8_t *u, *v;
-};
-
-template <int kFrom>
-void rgb_rows_to_iyuv(const std::uint8_t* upper, const std::uint8_t* lower, const Rgba& in,
-                      const IyuvRowPair& to, int width) {
-    for (int x = 0; x < width; x += 2, upper += 2 * kFrom, lower += 2 * kFrom) {
-        int r_sum = 0, b_sum = 0;
-        const int y00 = luma_and_sums(upper, in, &r_sum, &b_sum);
-        const int y01 = luma_and_sums(upper + kFrom, in, &r_sum, &b_sum);
-        const int y10 = luma_and_sums(lower, in, &r_sum, &b_sum);
-        const int y11 = luma_and_sums(lower + kFrom, in, &r_sum, &b_sum);
-        const int y_mean = (y00 + y01 + y10 + y11) >> 2;
-        to.upper[x] = static_cast<std::uint8_t>(y00);
-        to.upper[x + 1] = static_cast<std::uint8_t>(y01);
-        to.lower[x] = static_cast<std::uint8_t>(y10);
-        to.lower[x + 1] = static_cast<std::uint8_t>(y11);
-        to.u[x / 2] = chroma_u(b_sum >> 2, y_mean);
-        to.v[x / 2] = chroma_v(r_sum >> 2, y_mean);
-    }
-}
-
 template <int kTo>
 void ayuv_row_to_rgb(const std::uint8_t* from, std::uint8_t* to, const Rgba& out, int width) {
     for (int x = 0; x < width; ++x, from += 4, to += kTo) {
@@ -123,34 +98,6 @@ inline void ayuv_row_to_yuy2(const std::uint8_t* from, std::uint8_t* to, int wid
         to[kYuy2Y1] = from[4 + kAyuvY];
         to[kYuy2U] = static_cast<std::uint8_t>((from[kAyuvU] + from[4 + kAyuvU]) >> 1);
         to[kYuy2V] = static_cast<std::uint8_t>((from[kAyuvV] + from[4 + kAyuvV]) >> 1);
-    }
-}
-
-inline void ayuv_rows_to_iyuv(const std::uint8_t* upper, const std::uint8_t* lower,
-                              const IyuvRowPair& to, int width) {
-    const auto mean = [&](int at) {
-        return static_cast<std::uint8_t>((upper[at] + upper[4 + at] + lower[at] + lower[4 + at]) >>
-                                         2);
-    };
-    for (int x = 0; x < width; x += 2, upper += 8, lower += 8) {
-        to.upper[x] = upper[kAyuvY];
-        to.upper[x + 1] = upper[4 + kAyuvY];
-        to.lower[x] = lower[kAyuvY];
-        to.lower[x + 1] = lower[4 + kAyuvY];
-        to.u[x / 2] = mean(kAyuvU);
-        to.v[x / 2] = mean(kAyuvV);
-    }
-}
-
-inline void yuy2_rows_to_iyuv(const std::uint8_t* upper, const std::uint8_t* lower,
-                              const IyuvRowPair& to, int width) {
-    for (int x = 0; x < width; x += 2, upper += 4, lower += 4) {
-        to.upper[x] = upper[kYuy2Y0];
-        to.upper[x + 1] = upper[kYuy2Y1];
-        to.lower[x] = lower[kYuy2Y0];
-        to.lower[x + 1] = lower[kYuy2Y1];
-        to.u[x / 2] = static_cast<std::uint8_t>((upper[kYuy2U] + lower[kYuy2U]) >> 1);
-        to.v[x / 2] = static_cast<std::uint8_t>((upper[kYuy2V] + lower[kYuy2V]) >> 1);
     }
 }
 

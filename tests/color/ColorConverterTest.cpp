@@ -11,6 +11,8 @@
 
 #include "HostErrors.h"
 #include "ReferenceConverter.h"
+#include "color/color_tables.h"
+#include "encoder/kernels/color_rules.h"
 #include "support/Util.h"
 
 namespace {
@@ -155,6 +157,22 @@ TEST(ColorConverter, ConvertsKnownColours) {
         EXPECT_EQ(y, colour.y);
         EXPECT_EQ(u, colour.u);
         EXPECT_EQ(v, colour.v);
+    }
+}
+
+// What the converter looks up is what its kernels compute.
+TEST(ColorConverter, TablesHoldTheRulesOfTheKernels) {
+    ColorConverter::FillTablesRGB2YUV();
+    for (int i = 0; i < 256; ++i) {
+        EXPECT_EQ(zolt::TableCr[i], zolt::luma_part(i, zolt::kRedPercent)) << i;
+        EXPECT_EQ(zolt::TableCg[i], zolt::luma_part(i, zolt::kGreenPercent)) << i;
+        EXPECT_EQ(zolt::TableCb[i], zolt::luma_part(i, zolt::kBluePercent)) << i;
+    }
+    for (int difference = -255; difference <= 255; ++difference) {
+        EXPECT_EQ(zolt::TableCu[difference + 255], zolt::chroma(difference, zolt::kStepPercentU))
+            << difference;
+        EXPECT_EQ(zolt::TableCv[difference + 255], zolt::chroma(difference, zolt::kStepPercentV))
+            << difference;
     }
 }
 

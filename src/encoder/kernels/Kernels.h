@@ -28,6 +28,17 @@ constexpr int kArrangedBlock = 384;
 // The pairs of blocks whose averages are candidates 4..7 of first_phases_below_cross.
 constexpr int kCrossPairs[4][2] = {{0, 1}, {2, 1}, {0, 3}, {2, 3}};
 
+// Byte offsets of the colours in a pixel: blue two bytes before or after red, green between them.
+struct RgbOffsets {
+    int r, g, b;
+};
+
+// Two luma rows of a 4:2:0 picture and the chroma rows that belong to them.
+struct IyuvRows {
+    std::uint8_t *upper, *lower;
+    std::uint8_t *u, *v;
+};
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
@@ -187,6 +198,26 @@ struct Kernels {
     StrongLumaFilter deblock_luma_horizontal_strong;
     StrongChromaFilter deblock_chroma_vertical_strong;
     StrongChromaFilter deblock_chroma_horizontal_strong;
+
+    // ---- Colour conversion ----
+
+    // Two rows of a packed picture to 4:2:0. A row has width pixels, a positive even number, and
+    // any alignment; the result (width luma samples a row, width / 2 samples of U and V) does not
+    // overlap the source. Means over the pixels that share a chroma sample are rounded down.
+
+    // RGB of 4 or 3 bytes a pixel: luma and chroma by the rules of color_rules.h, chroma from the
+    // means of R, B and luma over 2x2 pixels. A fourth byte counts for nothing.
+    using RgbConversion = void (*)(const std::uint8_t* upper, const std::uint8_t* lower,
+                                   RgbOffsets at, IyuvRows to, int width);
+    RgbConversion rgb32_rows_to_iyuv;
+    RgbConversion rgb24_rows_to_iyuv;
+
+    // AYUV (bytes A Y U V of each pixel): chroma is the mean over 2x2 pixels. YUY2 (bytes Y U Y V
+    // of each pixel pair): chroma is the mean of the two rows.
+    using YuvConversion = void (*)(const std::uint8_t* upper, const std::uint8_t* lower,
+                                   IyuvRows to, int width);
+    YuvConversion ayuv_rows_to_iyuv;
+    YuvConversion yuy2_rows_to_iyuv;
 };
 
 // The scalar table; it runs on any processor.

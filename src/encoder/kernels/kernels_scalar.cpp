@@ -3,6 +3,7 @@
 #include <cstring>
 
 #include "encoder/kernels/Kernels.h"
+#include "encoder/kernels/color_scalar.h"
 #include "encoder/kernels/predict_4x4.h"
 #include "encoder/kernels/zigzag.h"
 
@@ -632,6 +633,10 @@ const Kernels& scalar_kernels() {
         deblock_luma_horizontal_strong,
         deblock_chroma_vertical_strong,
         deblock_chroma_horizontal_strong,
+        scalar_rgb32_rows_to_iyuv,
+        scalar_rgb24_rows_to_iyuv,
+        scalar_ayuv_rows_to_iyuv,
+        scalar_yuy2_rows_to_iyuv,
     };
     return table;
 }

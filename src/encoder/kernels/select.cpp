@@ -20,11 +20,11 @@ KernelTables kernel_tables() {
 #ifdef ZOLT_X86
             __builtin_cpu_init();
             if (__builtin_cpu_supports("sse2")) {
-                table[count] = with_sse2(table[count - 1]);
+                table[count] = with_sse2_color(with_sse2(table[count - 1]));
                 ++count;
             }
             if (__builtin_cpu_supports("avx2")) {
-                table[count] = with_avx2(table[count - 1]);
+                table[count] = with_avx2_color(with_avx2(table[count - 1]));
                 ++count;
             }
 #endif

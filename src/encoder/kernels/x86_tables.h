@@ -8,4 +8,8 @@ namespace zolt {
 Kernels with_sse2(const Kernels& base);
 Kernels with_avx2(const Kernels& base);
 
+// Their colour conversions.
+Kernels with_sse2_color(const Kernels& base);
+Kernels with_avx2_color(const Kernels& base);
+
 }  // namespace zolt
