@@ -152,12 +152,6 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) { k.centre_16x16(a.pred, a.reference(), kStride); }},
     {"chroma_8x8",
      [](const Kernels& k, Arena& a) { k.chroma_8x8(a.pred, a.refs[0], a.refs[1], kStride, 3, 5); }},
-    {"transform_4x4",
-     [](const Kernels& k, Arena& a) { k.transform_4x4(a.current, kStride, a.pred, a.coefs); }},
-    {"quantize",
-     [](const Kernels& k, Arena& a) {
-         benchmark::DoNotOptimize(k.quantize(a.coefs, quantizer(), a.scan, a.nonzero));
-     }},
     {"code_residual_16x16",
      [](const Kernels& k, Arena& a) {
          benchmark::DoNotOptimize(k.code_residual_16x16(a.current, kStride, a.pred, quantizer(),
@@ -166,6 +160,11 @@ constexpr Case kCases[] = {
     {"code_residual_8x8",
      [](const Kernels& k, Arena& a) {
          benchmark::DoNotOptimize(k.code_residual_8x8(a.current, kStride, a.pred, quantizer(), a.dc,
+                                                      a.coefs, a.scan, a.nonzero));
+     }},
+    {"code_residual_4x4",
+     [](const Kernels& k, Arena& a) {
+         benchmark::DoNotOptimize(k.code_residual_4x4(a.current, kStride, a.pred, quantizer(),
                                                       a.coefs, a.scan, a.nonzero));
      }},
     {"reconstruct_16x16",

@@ -156,13 +156,13 @@ public:
     void manageRefBuffers();
 
     // ---- bits: bit writer, NAL units, parameter sets ----
-    // Writes the low `length` (1..32) bits of value, most significant first; the other bits of
-    // value must be 0. Clears the bits that follow up to the eighth byte.
-    void write_bits(std::uint32_t value, int length) {
+    // Writes the low `length` (1..kMaxWrite) bits of value, most significant first; the other bits
+    // of value must be 0. Clears the bits that follow up to the eighth byte.
+    static constexpr int kMaxWrite = 57;
+    void write_bits(std::uint64_t value, int length) {
         std::uint8_t* byte = g_nal_buf + (g_nal_bitpos >> 3);
         const std::uint64_t window =
-            static_cast<std::uint64_t>(*byte) << 56 | static_cast<std::uint64_t>(value)
-                                                          << (64 - (g_nal_bitpos & 7) - length);
+            static_cast<std::uint64_t>(*byte) << 56 | value << (64 - (g_nal_bitpos & 7) - length);
         for (int i = 0; i < 8; ++i) {
             byte[i] = static_cast<std::uint8_t>(window >> (56 - 8 * i));
         }
@@ -267,7 +267,8 @@ public:
     void encodeBlock();
     void encode_luma_blocks();
     void encode_chroma_ac_blocks(int component);
-    void encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count, int table);
+    std::uint8_t encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count,
+                                     int table);
 
     // ---- diamond: motion search ----
     void initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel);

@@ -26,17 +26,4 @@ inline int lowest_bit(std::uint32_t value) {
 #endif
 }
 
-// Number of set bits.
-inline int bit_count(std::uint32_t value) {
-#if defined(__GNUC__)
-    return __builtin_popcount(value);
-#else
-    int count = 0;
-    for (; value; value &= value - 1) {
-        ++count;
-    }
-    return count;
-#endif
-}
-
 }  // namespace zolt

@@ -215,6 +215,30 @@ int predicted_count(const std::uint8_t* counts, std::ptrdiff_t stride, bool left
     return left && up ? (n_a + n_b + 1) >> 1 : n_a + n_b;
 }
 
+// Collects codes, so that the NAL buffer is written to once for several of them.
+class CodeGroup {
+public:
+    explicit CodeGroup(CEncoder& encoder) : m_encoder(encoder) {}
+
+    void put(std::uint32_t code, int length) {
+        if (m_length + length > CEncoder::kMaxWrite) {
+            flush();
+        }
+        m_codes = m_codes << length | code;
+        m_length += length;
+    }
+    void flush() {
+        m_encoder.write_bits(m_codes, m_length);
+        m_codes = 0;
+        m_length = 0;
+    }
+
+private:
+    CEncoder& m_encoder;
+    std::uint64_t m_codes = 0;
+    int m_length = 0;
+};
+
 unsigned nonzero_mask(const std::int16_t* levels, int count) {
     unsigned mask = 0;
     for (int n = 0; n < count; ++n) {
@@ -318,18 +342,18 @@ void CEncoder::encode_luma_blocks() {
         encodeCAVLCBlock4x4(g_luma_dc, nonzero_mask(g_luma_dc, 16), 16, coeff_token_table(nC));
     }
     const int first = intra16x16 ? 1 : 0;  // the DC levels have been sent
-    for (int k = 0; k < 16; ++k) {
-        if ((g_coded_block_pattern >> (k >> 2) & 1) == 0) {
-            continue;
+    for (unsigned rest = g_coded_block_pattern & 15; rest != 0; rest &= rest - 1) {
+        const int start = 4 * zolt::lowest_bit(rest);
+        for (int k = start; k < start + 4; ++k) {
+            const int i = zolt::luma_scan_i[k];
+            const int j = zolt::luma_scan_j[k];
+            std::uint8_t* count = counts + j * g_blk_width + i;
+            const int nC =
+                predicted_count(count, g_blk_width, i > 0 || g_mb_left, j > 0 || g_mb_up);
+            const unsigned nonzero = (g_luma_mask >> k & 1) ? g_nonzero[k] >> first : 0u;
+            *count = encodeCAVLCBlock4x4(g_scan_levels + 16 * k + first, nonzero, 16 - first,
+                                         coeff_token_table(nC));
         }
-        const int i = zolt::luma_scan_i[k];
-        const int j = zolt::luma_scan_j[k];
-        std::uint8_t* count = counts + j * g_blk_width + i;
-        const int nC = predicted_count(count, g_blk_width, i > 0 || g_mb_left, j > 0 || g_mb_up);
-        const unsigned nonzero = (g_luma_mask >> k & 1) ? g_nonzero[k] >> first : 0u;
-        *count = static_cast<std::uint8_t>(zolt::bit_count(nonzero));
-        encodeCAVLCBlock4x4(g_scan_levels + 16 * k + first, nonzero, 16 - first,
-                            coeff_token_table(nC));
     }
 }
 
@@ -343,16 +367,16 @@ void CEncoder::encode_chroma_ac_blocks(int component) {
         std::uint8_t* count = counts + j * stride + i;
         const int nC = predicted_count(count, stride, i > 0 || g_mb_left, j > 0 || g_mb_up);
         const int block = 16 + 4 * component + b;
-        const unsigned nonzero = g_nonzero[block] >> 1;
-        *count = static_cast<std::uint8_t>(zolt::bit_count(nonzero));
-        encodeCAVLCBlock4x4(g_scan_levels + 16 * block + 1, nonzero, 15, coeff_token_table(nC));
+        *count = encodeCAVLCBlock4x4(g_scan_levels + 16 * block + 1, g_nonzero[block] >> 1u, 15,
+                                     coeff_token_table(nC));
     }
 }
 
 // residual_block_cavlc(), clauses 7.3.5.3.2 and 9.2: count levels in scan order, of which those in
-// the mask are not 0. Longer than most functions because it is one syntax structure.
-void CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count,
-                                   int table) {
+// the mask are not 0; returns the number of these. Longer than most functions because it is one
+// syntax structure.
+std::uint8_t CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count,
+                                           int table) {
     // Levels that are not 0 and the zeros in front of each, from the highest frequency down.
     int level[16];
     int run[16];
@@ -375,20 +399,22 @@ void CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero,
         ++trailing_ones;
     }
 
+    CodeGroup codes(*this);
     if (table == kChromaDcTable) {
-        write_bits(chroma_dc_token_bits[total][trailing_ones],
-                   chroma_dc_token_length[total][trailing_ones]);
+        codes.put(chroma_dc_token_bits[total][trailing_ones],
+                  chroma_dc_token_length[total][trailing_ones]);
     } else if (table == kFixedLengthTable) {
-        write_bits(total == 0 ? 3u : static_cast<unsigned>((total - 1) << 2 | trailing_ones), 6);
+        codes.put(total == 0 ? 3u : static_cast<unsigned>((total - 1) << 2 | trailing_ones), 6);
     } else {
-        write_bits(coeff_token_bits[table][total][trailing_ones],
-                   coeff_token_length[table][total][trailing_ones]);
+        codes.put(coeff_token_bits[table][total][trailing_ones],
+                  coeff_token_length[table][total][trailing_ones]);
     }
     if (total == 0) {
-        return;
+        codes.flush();
+        return 0;
     }
     if (trailing_ones > 0) {
-        write_bits(signs, trailing_ones);
+        codes.put(signs, trailing_ones);
     }
 
     int suffix_length = total > 10 && trailing_ones < 3 ? 1 : 0;
@@ -399,21 +425,21 @@ void CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero,
         const unsigned sign = level[n] < 0 ? 1 : 0;
         if (suffix_length == 0) {
             if (m <= 7) {
-                write_bits(1, 2 * m - 1 + static_cast<int>(sign));
+                codes.put(1, 2 * m - 1 + static_cast<int>(sign));
             } else if (m <= 15) {
-                write_bits(16u | static_cast<unsigned>(m - 8) << 1 | sign, 19);
+                codes.put(16u | static_cast<unsigned>(m - 8) << 1 | sign, 19);
             } else {
-                write_bits(0x1000u | static_cast<unsigned>(m - 16) << 1 | sign, 28);
+                codes.put(0x1000u | static_cast<unsigned>(m - 16) << 1 | sign, 28);
             }
         } else {
             const int escape = (15 << (suffix_length - 1)) + 1;
             if (m < escape) {
                 const unsigned suffix =
                     static_cast<unsigned>(m - 1) & ((1u << (suffix_length - 1)) - 1);
-                write_bits(1u << suffix_length | suffix << 1 | sign,
-                           ((m - 1) >> (suffix_length - 1)) + suffix_length + 1);
+                codes.put(1u << suffix_length | suffix << 1 | sign,
+                          ((m - 1) >> (suffix_length - 1)) + suffix_length + 1);
             } else {
-                write_bits(0x1000u | static_cast<unsigned>(m - escape) << 1 | sign, 28);
+                codes.put(0x1000u | static_cast<unsigned>(m - escape) << 1 | sign, 28);
             }
         }
         if (magnitude > kSuffixThreshold[suffix_length]) {
@@ -426,17 +452,19 @@ void CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero,
 
     if (total < count) {
         if (table == kChromaDcTable) {
-            write_bits(chroma_dc_total_zeros_bits[total - 1][total_zeros],
-                       chroma_dc_total_zeros_length[total - 1][total_zeros]);
+            codes.put(chroma_dc_total_zeros_bits[total - 1][total_zeros],
+                      chroma_dc_total_zeros_length[total - 1][total_zeros]);
         } else {
-            write_bits(total_zeros_bits[total - 1][total_zeros],
-                       total_zeros_length[total - 1][total_zeros]);
+            codes.put(total_zeros_bits[total - 1][total_zeros],
+                      total_zeros_length[total - 1][total_zeros]);
         }
     }
     int zeros_left = total_zeros;
     for (int n = 0; n < total - 1 && zeros_left > 0; ++n) {
         const int row = std::min(zeros_left, 7) - 1;
-        write_bits(run_before_bits[row][run[n]], run_before_length[row][run[n]]);
+        codes.put(run_before_bits[row][run[n]], run_before_length[row][run[n]]);
         zeros_left -= run[n];
     }
+    codes.flush();
+    return static_cast<std::uint8_t>(total);
 }

@@ -118,9 +118,9 @@ void CEncoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
     std::uint8_t* block =
         g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
-    g_kernels->transform_4x4(block, g_stride_luma, pred, coefs);
-    const bool coded = g_kernels->quantize(coefs, q, g_scan_levels + 16 * k, g_nonzero + k);
-    g_luma_mask |= (coded ? 1u : 0u) << k;
+    const unsigned coded = g_kernels->code_residual_4x4(block, g_stride_luma, pred, q, coefs,
+                                                        g_scan_levels + 16 * k, g_nonzero + k);
+    g_luma_mask |= coded << k;
     if (coded) {
         g_kernels->reconstruct_4x4(coefs, pred, block, g_stride_luma);
     } else {

@@ -42,6 +42,7 @@ struct Arena {
     alignas(64) std::uint16_t nonzero[kMargin + 16 + kMargin];
     alignas(64) std::int32_t values[kMargin + 16 + kMargin];
     alignas(64) std::int32_t numbers[kMargin + 16 + kMargin];
+    std::int16_t dc[16];
     std::uint32_t result;
 
     std::uint8_t* pred() { return samples + kMargin; }
@@ -151,40 +152,27 @@ struct Candidates {
     }
 };
 
-const zolt::Quantizer& any_quantizer(Random& random) {
-    const int qp = random.between(0, 51);
-    return random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
-}
-
-void run_quantize(const Kernels& k, Arena& a, Random random) {
-    const zolt::Quantizer& q = any_quantizer(random);
-    // No residual transforms to more than 36 * 255; beyond, the scaled coefficients need not fit.
-    const bool beyond = random.between(0, 3) == 0;
-    for (int i = 0; i < 16; ++i) {
-        std::int16_t& c = a.coef()[i];
-        const int edge = q.dead_zone[i] + random.between(0, 1);
-        const int limited = beyond ? c : c % 9181;
-        c = static_cast<std::int16_t>(random.between(0, 3) ? limited : c < 0 ? -edge : edge);
-    }
-    a.result = k.quantize(a.coef(), q, a.scan + kMargin, a.nonzero + kMargin);
-    if (beyond) {
-        std::fill(a.coef(), a.coef() + 16, std::int16_t{0});
-    }
-}
-
-// A residual kernel on blocks of `size` x `size` samples. Predictions near the samples leave some
-// blocks without levels.
+// A residual kernel on blocks of `size` x `size` samples, in half of the cases with DC values of
+// their own. Predictions near the samples leave some blocks without levels.
 template <auto kernel, int size>
 void run_residual(const Kernels& k, Arena& a, Random random) {
     const Place src(a.plane[0], random, size);
-    const zolt::Quantizer& q = any_quantizer(random);
-    for (int i = 0; i < size * size && random.between(0, 7); ++i) {
-        a.pred()[i] = src.p[i / size * src.stride + i % size];
+    const int qp = random.between(0, 51);
+    const zolt::Quantizer& q =
+        random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+    const int near = random.between(0, size * size);
+    for (int i = 0; i < near; ++i) {
+        const int sample = src.p[i / size * src.stride + i % size];
+        a.pred()[i] = static_cast<std::uint8_t>(std::clamp(sample + random.between(-4, 4), 0, 255));
     }
-    std::int16_t* const dc =
-        random.between(0, 1) ? reinterpret_cast<std::int16_t*>(a.out()) : nullptr;
-    a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, dc, a.coef(), a.scan + kMargin,
-                           a.nonzero + kMargin);
+    std::int16_t* const scan = a.scan + kMargin;
+    std::uint16_t* const nonzero = a.nonzero + kMargin;
+    if constexpr (size == 4) {
+        a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, a.coef(), scan, nonzero);
+    } else {
+        std::int16_t* const dc = random.between(0, 1) ? a.dc : nullptr;
+        a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, dc, a.coef(), scan, nonzero);
+    }
 }
 
 // Runs a filter with random parameters on the edge whose samples it takes.
@@ -301,14 +289,9 @@ constexpr Case kCases[] = {
          const int fx = random.between(0, 7), fy = random.between(0, 7);
          k.chroma_8x8(a.pred(), src.p, a.plane[1] + (src.p - a.plane[0]), src.stride, fx, fy);
      }},
-    {"transform_4x4",
-     [](const Kernels& k, Arena& a, Random random) {
-         const Place src(a.plane[0], random, 4);
-         k.transform_4x4(src.p, src.stride, a.pred(), a.coef());
-     }},
-    {"quantize", run_quantize},
     {"code_residual_16x16", run_residual<&Kernels::code_residual_16x16, 16>},
     {"code_residual_8x8", run_residual<&Kernels::code_residual_8x8, 8>},
+    {"code_residual_4x4", run_residual<&Kernels::code_residual_4x4, 4>},
     {"reconstruct_16x16",
      [](const Kernels& k, Arena& a, Random random) {
          const Place dst(a.plane[0], random, 16);

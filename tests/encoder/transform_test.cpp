@@ -33,30 +33,19 @@ constexpr Matrix kCore = {{1, 1, 1, 1}, {2, 1, -1, -2}, {1, -1, -1, 1}, {1, -2, 
 // Twice the transposed inverse core transform of clause 8.5.12.2, whose halves these are.
 constexpr Matrix kInverse = {{2, 2, 2, 1}, {2, 1, -2, -2}, {2, -1, -2, 2}, {2, -2, 2, -1}};
 
-TEST(Transform, EqualsMatrixProducts) {
-    const Kernels& k = zolt::scalar_kernels();
+TEST(Transform, InverseEqualsMatrixProducts) {
     Random random(1);
     for (int iteration = 0; iteration < 500; ++iteration) {
-        alignas(32) std::uint8_t src[16], pred[16], dst[16];
+        alignas(32) std::uint8_t pred[16], dst[16];
         alignas(32) std::int16_t coefs[16];
-        Matrix residual, product;
-        for (int i = 0; i < 16; ++i) {
-            src[i] = iteration % 2 ? random.sample() : i % 2 * 255;
-            pred[i] = iteration % 2 ? random.sample() : 255 - src[i];
-            residual[i / 4][i % 4] = src[i] - pred[i];
-        }
-        k.transform_4x4(src, 4, pred, coefs);
-        transform(kCore, residual, product);
-        for (int i = 0; i < 16; ++i) {
-            ASSERT_EQ(coefs[4 * (i % 4) + i / 4], product[i / 4][i % 4]);
-        }
         // With multiples of 4 no half is ever rounded.
-        Matrix scaled;
+        Matrix scaled, product;
         for (int i = 0; i < 16; ++i) {
+            pred[i] = random.sample();
             scaled[i / 4][i % 4] = 4 * random.between(-600, 600);
             coefs[4 * (i % 4) + i / 4] = static_cast<std::int16_t>(scaled[i / 4][i % 4]);
         }
-        k.reconstruct_4x4(coefs, pred, dst, 4);
+        zolt::scalar_kernels().reconstruct_4x4(coefs, pred, dst, 4);
         transform(kInverse, scaled, product);
         for (int i = 0; i < 16; ++i) {
             ASSERT_EQ(dst[i],
@@ -65,7 +54,7 @@ TEST(Transform, EqualsMatrixProducts) {
     }
 }
 
-TEST(Quantizer, LevelsAndScaledLevels) {
+TEST(Residual, LevelsAndScaledLevels) {
     // Forward factors and normAdjust4x4 by QP % 6: rows and columns even, odd, mixed.
     constexpr int kForward[6][3] = {{13107, 5243, 8066}, {11916, 4660, 7490}, {10082, 4194, 6554},
                                     {9362, 3647, 5825},  {8192, 3355, 5243},  {7282, 2893, 4559}};
@@ -75,33 +64,39 @@ TEST(Quantizer, LevelsAndScaledLevels) {
     constexpr int kScan[16][2] = {{0, 0}, {0, 1}, {1, 0}, {2, 0}, {1, 1}, {0, 2}, {0, 3}, {1, 2},
                                   {2, 1}, {3, 0}, {3, 1}, {2, 2}, {1, 3}, {2, 3}, {3, 2}, {3, 3}};
     Random random(2);
-    for (int iteration = 0; iteration < 52 * 40; ++iteration) {
+    for (int iteration = 0; iteration < 52 * 80; ++iteration) {
         const int qp = iteration % 52, bits = 15 + qp / 6;
         const bool intra = iteration / 52 % 2;
         const std::int64_t rounding = (std::int64_t{1} << bits) / (intra ? 3 : 6);
-        alignas(32) std::int16_t coefs[16], scan[16];
-        std::int16_t source[16];
+        const int range = 255 >> random.between(0, 7);
+        alignas(32) std::uint8_t src[16], pred[16];
+        Matrix residual, c;
         for (int i = 0; i < 16; ++i) {
-            // The largest that a residual transforms to: rows and columns of weight 4 or 6.
-            const int largest = 255 * (i % 2 ? 6 : 4) * (i / 4 % 2 ? 6 : 4);
-            coefs[i] = source[i] = static_cast<std::int16_t>(random.between(-largest, largest) /
-                                                             (1 << random.between(0, 10)));
+            src[i] = iteration % 3 ? random.sample() : i % 2 * 255;
+            pred[i] = iteration % 3 ? static_cast<std::uint8_t>(std::clamp(
+                                          src[i] + random.between(-range, range), 0, 255))
+                                    : 255 - src[i];
+            residual[i / 4][i % 4] = src[i] - pred[i];
         }
+        transform(kCore, residual, c);
+
+        alignas(32) std::int16_t coefs[16] = {}, scan[16] = {};
         std::uint16_t nonzero = 0;
-        const bool coded = zolt::scalar_kernels().quantize(
-            coefs, intra ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp), scan, &nonzero);
+        const auto coded = zolt::scalar_kernels().code_residual_4x4(
+            src, 4, pred, intra ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp), coefs,
+            scan, &nonzero);
         for (int n = 0; n < 16; ++n) {
             const auto [row, column] = kScan[n];
-            const int c = source[4 * column + row];
+            const int value = c[row][column];
             const int kind = row % 2 && column % 2 ? 1 : row % 2 || column % 2 ? 2 : 0;
             const std::int64_t magnitude = std::min<std::int64_t>(
-                (std::int64_t{std::abs(c)} * kForward[qp % 6][kind] + rounding) >> bits, 2063);
-            const int level = static_cast<int>(c < 0 ? -magnitude : magnitude);
+                (std::int64_t{std::abs(value)} * kForward[qp % 6][kind] + rounding) >> bits, 2063);
+            const int level = static_cast<int>(value < 0 ? -magnitude : magnitude);
             ASSERT_EQ(scan[n], level) << "QP " << qp;
             ASSERT_EQ(coefs[4 * column + row], level * kNorm[qp % 6][kind] * (1 << qp / 6));
             ASSERT_EQ(nonzero >> n & 1, level != 0);
         }
-        ASSERT_EQ(coded, nonzero != 0);
+        ASSERT_EQ(coded, nonzero != 0 ? 1u : 0u);
     }
 }
 

@@ -111,23 +111,14 @@ struct Kernels {
 
     // ---- Residual ----
 
-    // Prediction error and forward core transform of one 4x4 block.
-    void (*transform_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
-                          std::int16_t* coefs);
-
-    // Quantises the 16 coefficients of a block: level = sign(c) * min((|c| * forward + rounding) >>
-    // shift, kMaxLevel). Writes the levels in zig-zag order (clause 8.5.6, frame) to scan and the
-    // mask of those that are not 0 to *nonzero (bit n: scan position n), and replaces the
-    // coefficients by level * dequant. Returns whether there is a level other than 0. Needs |c| <
-    // 2^15 and |c| * forward + rounding < 2^31.
-    bool (*quantize)(std::int16_t* coefs, const Quantizer& quantizer, std::int16_t* scan,
-                     std::uint16_t* nonzero);
-
-    // Both for the 16 luma blocks of a macroblock in decoding order (Figure 6-10), and for the four
-    // blocks of an 8x8 chroma component in raster order; bit b of the result: block b has a level
-    // other than 0. Of a block that has none only the nonzero mask is written. With dc, which takes
-    // one value a block, the constant coefficients go there and 0 stands in for them, and the
-    // coefficients of blocks without levels are set to 0.
+    // Prediction error, forward core transform and quantiser of the 16 luma blocks of a macroblock
+    // in decoding order (Figure 6-10), of the four blocks of an 8x8 chroma component in raster
+    // order, and of one 4x4 block: level = sign(c) * min((|c| * forward + rounding) >> shift,
+    // kMaxLevel). Bit b of the result: block b has a level other than 0. Writes such a block's
+    // levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to coefs; of every
+    // block, the mask of the levels that are not 0 to nonzero (bit n: scan position n). With dc,
+    // which takes one value a block, the constant coefficients go there and 0 stands in for them,
+    // and the coefficients of blocks without levels are set to 0.
     std::uint32_t (*code_residual_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
                                          const std::uint8_t* pred, const Quantizer& quantizer,
                                          std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
@@ -135,6 +126,10 @@ struct Kernels {
     std::uint32_t (*code_residual_8x8)(const std::uint8_t* src, std::ptrdiff_t stride,
                                        const std::uint8_t* pred, const Quantizer& quantizer,
                                        std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
+                                       std::uint16_t* nonzero);
+    std::uint32_t (*code_residual_4x4)(const std::uint8_t* src, std::ptrdiff_t stride,
+                                       const std::uint8_t* pred, const Quantizer& quantizer,
+                                       std::int16_t* coefs, std::int16_t* scan,
                                        std::uint16_t* nonzero);
 
     // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and

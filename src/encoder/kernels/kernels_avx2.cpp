@@ -459,20 +459,6 @@ struct VectorQuantizer {
     }
 };
 
-bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
-    const __m256i c = load_aligned(coefs);
-    const __m256i coded =
-        _mm256_cmpgt_epi16(_mm256_abs_epi16(c), load_aligned(quantizer.dead_zone));
-    if (_mm256_testz_si256(coded, coded)) {
-        store_32(coefs, _mm256_setzero_si256());
-        store_32(scan, _mm256_setzero_si256());
-        *nonzero = 0;
-        return false;
-    }
-    *nonzero = VectorQuantizer(quantizer).quantize(c, coefs, scan);
-    return true;
-}
-
 // Codes four blocks from the rows of their residual, blocks 0 and 1 in the low lane. kStep: how
 // many blocks after block 0 block 2 stands in coefs, scan, nonzero and dc. Returns the mask of the
 // coded ones, by that order too.
@@ -564,6 +550,55 @@ uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* 
                                 two_rows_of_8(pred + 8 * y, 8));
     }
     return code_four<2>(v, quantizer, dc, coefs, scan, nonzero);
+}
+
+// Rows y and y + 1 of a 4x4 block.
+__m128i two_rows_of_4(const uint8_t* p, ptrdiff_t stride) {
+    int32_t upper, lower;
+    __builtin_memcpy(&upper, p, sizeof upper);
+    __builtin_memcpy(&lower, p + stride, sizeof lower);
+    return _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1));
+}
+
+// The forward transform of the rows or columns 0, 1 and 2, 3 of a block; the same of the transform.
+void forward_butterfly(__m128i* v01, __m128i* v23) {
+    const __m128i v32 = _mm_shuffle_epi32(*v23, _MM_SHUFFLE(1, 0, 3, 2));
+    const __m128i st = _mm_add_epi16(*v01, v32);  // 0 + 3, 1 + 2
+    const __m128i du = _mm_sub_epi16(*v01, v32);  // 0 - 3, 1 - 2
+    const __m128i ss = _mm_unpacklo_epi64(st, du), tu = _mm_unpackhi_epi64(st, du);
+    // s + t and 2d + u; s - t and d - 2u.
+    const __m128i sd = _mm_add_epi16(ss, _mm_slli_si128(_mm_srli_si128(ss, 8), 8));
+    const __m128i twice_u = _mm_add_epi16(tu, _mm_slli_si128(_mm_srli_si128(tu, 8), 8));
+    *v01 = _mm_add_epi16(sd, tu);
+    *v23 = _mm_sub_epi16(ss, twice_u);
+}
+
+// Exchanges rows and columns of a block, two rows a vector.
+void transpose_4x4(__m128i* v01, __m128i* v23) {
+    const __m128i a = _mm_unpacklo_epi16(*v01, *v23);  // rows 0 and 2
+    const __m128i b = _mm_unpackhi_epi16(*v01, *v23);  // rows 1 and 3
+    *v01 = _mm_unpacklo_epi16(a, b);
+    *v23 = _mm_unpackhi_epi16(a, b);
+}
+
+uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    __m128i v01 = _mm_sub_epi16(two_rows_of_4(src, stride), two_rows_of_4(pred, 4));
+    __m128i v23 =
+        _mm_sub_epi16(two_rows_of_4(src + 2 * stride, stride), two_rows_of_4(pred + 8, 4));
+    forward_butterfly(&v01, &v23);
+    transpose_4x4(&v01, &v23);
+    forward_butterfly(&v01, &v23);
+    const __m256i c = join(v01, v23);
+    const __m256i beyond =
+        _mm256_cmpgt_epi16(_mm256_abs_epi16(c), load_aligned(quantizer.dead_zone));
+    if (_mm256_testz_si256(beyond, beyond)) {
+        *nonzero = 0;
+        return 0;
+    }
+    *nonzero = VectorQuantizer(quantizer).quantize(c, coefs, scan);
+    return 1;
 }
 
 // Sums of the magnitudes of 16 coefficients, in eight parts.
@@ -758,14 +793,6 @@ __m256i phase_satds(__m256i src_01, __m256i src_23, __m128i a, __m128i b) {
     return _mm256_shuffle_epi32(_mm256_add_epi16(largest, largest), _MM_SHUFFLE(3, 1, 2, 0));
 }
 
-__m256i two_rows_of_4(const uint8_t* src, ptrdiff_t stride) {
-    int32_t upper, lower;
-    __builtin_memcpy(&upper, src, sizeof upper);
-    __builtin_memcpy(&lower, src + stride, sizeof lower);
-    return _mm256_broadcastsi128_si256(
-        _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1)));
-}
-
 void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighbours_at, int dc,
                      uint8_t* preds, int16_t* distortion) {
     __m128i modes[9];
@@ -773,8 +800,8 @@ void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighb
     for (int mode = 0; mode < 9; ++mode) {
         store_16(preds + 16 * mode, modes[mode]);
     }
-    const __m256i src_01 = two_rows_of_4(src, stride);
-    const __m256i src_23 = two_rows_of_4(src + 2 * stride, stride);
+    const __m256i src_01 = _mm256_broadcastsi128_si256(two_rows_of_4(src, stride));
+    const __m256i src_23 = _mm256_broadcastsi128_si256(two_rows_of_4(src + 2 * stride, stride));
     __m256i d[4];  // modes n and n + 4
     for (int n = 0; n < 4; ++n) {
         d[n] = phase_satds(src_01, src_23, modes[n], modes[n + 4]);
@@ -1042,9 +1069,9 @@ Kernels with_avx2(const Kernels& base) {
     k.average_16x16 = average_16x16;
     k.centre_16x16 = centre_16x16;
     k.chroma_8x8 = chroma_8x8;
-    k.quantize = quantize;
     k.code_residual_16x16 = code_residual_16x16;
     k.code_residual_8x8 = code_residual_8x8;
+    k.code_residual_4x4 = code_residual_4x4;
     k.reconstruct_16x16 = reconstruct_16x16;
     k.reconstruct_8x8 = reconstruct_8x8;
     k.block_sums = block_sums;

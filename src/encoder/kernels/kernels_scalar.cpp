@@ -259,10 +259,8 @@ constexpr int block_y(int k) {
     return 4 * (((k >> 1) & 1) + ((k >> 2) & 2));
 }
 
-void transform_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    transform_block(src, stride, pred, 4, coefs);
-}
-
+// Levels of a block in scan and their mask in nonzero, and the coefficients replaced by what the
+// levels stand for; returns whether there is a level other than 0.
 bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
     unsigned mask = 0;
     for (int n = 0; n < 16; ++n) {
@@ -303,6 +301,12 @@ uint32_t code_residual(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred
         }
     }
     return coded;
+}
+
+uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    return code_residual<1, 4>(src, stride, pred, quantizer, nullptr, coefs, scan, nonzero);
 }
 
 // Inverse core transform of four values with the given input step, written contiguously.
@@ -612,10 +616,9 @@ const Kernels& scalar_kernels() {
         average_16x16,
         centre_16x16,
         chroma_8x8,
-        transform_4x4,
-        quantize,
         code_residual<16, 16>,
         code_residual<4, 8>,
+        code_residual_4x4,
         reconstruct_16x16,
         reconstruct_8x8,
         reconstruct_4x4,

@@ -368,18 +368,6 @@ constexpr int pair_y(int n) {
     return 4 * (n & 1) + 8 * (n >> 2);
 }
 
-void transform_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, int16_t* coefs) {
-    __m128i v[4];
-    for (int y = 0; y < 4; ++y) {
-        v[y] = _mm_sub_epi16(widen_low(load_4(src + y * stride)), widen_low(load_4(pred + 4 * y)));
-    }
-    forward_butterfly(v);
-    transpose_two(v);
-    forward_butterfly(v);
-    store(coefs, _mm_unpacklo_epi64(v[0], v[1]));
-    store(coefs + 8, _mm_unpacklo_epi64(v[2], v[3]));
-}
-
 // Levels and scaled coefficients of eight coefficients.
 void quantize_eight(__m128i c, const int16_t* forward, const int16_t* dequant, __m128i rounding,
                     __m128i shift, __m128i* levels, __m128i* scaled) {
@@ -430,19 +418,6 @@ bool leaves_dead_zone(__m128i c0, __m128i c1, const Quantizer& quantizer) {
 void clear_block(int16_t* block) {
     store(block, _mm_setzero_si128());
     store(block + 8, _mm_setzero_si128());
-}
-
-bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
-    const __m128i c0 = load_aligned(coefs);
-    const __m128i c1 = load_aligned(coefs + 8);
-    if (!leaves_dead_zone(c0, c1, quantizer)) {
-        clear_block(coefs);
-        clear_block(scan);
-        *nonzero = 0;
-        return false;
-    }
-    *nonzero = quantize_block(c0, c1, quantizer, coefs, scan);
-    return true;
 }
 
 // Codes two blocks side by side; dc, coefs, scan and nonzero are those of the first. Returns the
@@ -504,6 +479,25 @@ uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* 
                  << (2 * n);
     }
     return coded;
+}
+
+uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_4(src + y * stride)), widen_low(load_4(pred + 4 * y)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    const __m128i c0 = _mm_unpacklo_epi64(v[0], v[1]), c1 = _mm_unpacklo_epi64(v[2], v[3]);
+    if (!leaves_dead_zone(c0, c1, quantizer)) {
+        *nonzero = 0;
+        return 0;
+    }
+    *nonzero = quantize_block(c0, c1, quantizer, coefs, scan);
+    return 1;
 }
 
 // Whether 16-bit sums are exact for a block: no sum of the inverse transform, rounding included,
@@ -930,10 +924,9 @@ Kernels with_sse2(const Kernels& base) {
     k.average_16x16 = average_16x16;
     k.centre_16x16 = centre_16x16;
     k.chroma_8x8 = chroma_8x8;
-    k.transform_4x4 = transform_4x4;
-    k.quantize = quantize;
     k.code_residual_16x16 = code_residual_16x16;
     k.code_residual_8x8 = code_residual_8x8;
+    k.code_residual_4x4 = code_residual_4x4;
     k.reconstruct_16x16 = reconstruct_16x16;
     k.reconstruct_8x8 = reconstruct_8x8;
     k.reconstruct_4x4 = reconstruct_4x4;
