@@ -525,8 +525,11 @@ void MotionSearch::set_planes(std::ptrdiff_t position) {
 bool MotionSearch::accept(const int* sums, int rate, int first_threshold) {
     const int second_cost = sums[1] + second_share(rate);
     const int third_cost = sums[2] + third_share(rate);
-    if (m_thresholds[0] <= sums[0] + first_share(rate) || m_thresholds[1] <= second_cost ||
-        m_thresholds[2] <= third_cost || sums[3] + rate >= m_best_cost) {
+    // One branch for all of them: most candidates that come here pass.
+    const bool rejected = (m_thresholds[0] <= sums[0] + first_share(rate)) |
+                          (m_thresholds[1] <= second_cost) | (m_thresholds[2] <= third_cost) |
+                          (sums[3] + rate >= m_best_cost);
+    if (rejected) {
         return false;
     }
     m_thresholds[0] = first_threshold;

@@ -102,6 +102,7 @@ struct EdgeFilters {
 struct Macroblock {
     const CEncoder& encoder;
     const int mb;
+    const EdgeParameters luma, chroma;  // of its internal edges
     std::uint8_t* const y;
     std::uint8_t* const u;
     std::uint8_t* const v;
@@ -109,6 +110,8 @@ struct Macroblock {
     Macroblock(const CEncoder& e, int address, int mb_x, int mb_y)
         : encoder(e),
           mb(address),
+          luma(e.g_mb_qp[address], e.g_lf_data[address]),
+          chroma(zolt::QP_SCALE_CR[e.g_mb_qp[address]], e.g_lf_data[address]),
           y(e.g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * e.g_stride_luma + 16 * mb_x),
           u(e.g_cur_u + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x),
           v(e.g_cur_v + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x) {}
@@ -126,27 +129,34 @@ struct Macroblock {
 
     void filter_external_edge(std::uint32_t strengths, int neighbour,
                               const EdgeFilters& filters) const {
-        const lfdata& lf = encoder.g_lf_data[mb];
         const int qp_q = encoder.g_mb_qp[mb];
         const int qp_p = encoder.g_mb_qp[neighbour];
-        const EdgeParameters luma((qp_q + qp_p + 1) >> 1, lf);
-        const EdgeParameters chroma((zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1,
-                                    lf);
-        if (strengths == kAllStrong) {
-            filters.luma_strong(y, encoder.g_stride_luma, luma.alpha, luma.beta);
-            filters.chroma_strong(u, v, encoder.g_stride_chroma, chroma.alpha, chroma.beta);
+        if (qp_q == qp_p) {
+            filter_external_edge(strengths, luma, chroma, filters);
             return;
         }
-        filters.luma(y, encoder.g_stride_luma, luma.alpha, luma.beta,
-                     SegmentTc0(strengths, luma.tc0).values);
-        filters.chroma(u, v, encoder.g_stride_chroma, chroma.alpha, chroma.beta,
-                       SegmentTc0(strengths, chroma.tc0).values);
+        const lfdata& lf = encoder.g_lf_data[mb];
+        const EdgeParameters mean_luma((qp_q + qp_p + 1) >> 1, lf);
+        const EdgeParameters mean_chroma(
+            (zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1, lf);
+        filter_external_edge(strengths, mean_luma, mean_chroma, filters);
+    }
+
+    void filter_external_edge(std::uint32_t strengths, const EdgeParameters& edge_luma,
+                              const EdgeParameters& edge_chroma, const EdgeFilters& filters) const {
+        if (strengths == kAllStrong) {
+            filters.luma_strong(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta);
+            filters.chroma_strong(u, v, encoder.g_stride_chroma, edge_chroma.alpha,
+                                  edge_chroma.beta);
+            return;
+        }
+        filters.luma(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta,
+                     SegmentTc0(strengths, edge_luma.tc0).values);
+        filters.chroma(u, v, encoder.g_stride_chroma, edge_chroma.alpha, edge_chroma.beta,
+                       SegmentTc0(strengths, edge_chroma.tc0).values);
     }
 
     void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
-        const lfdata& lf = encoder.g_lf_data[mb];
-        const int qp = encoder.g_mb_qp[mb];
-        const EdgeParameters luma(qp, lf);
         for (int edge = 1; edge < 4; ++edge) {
             if (strengths[edge] != 0) {
                 filters.luma(y + 4 * edge * filters.luma_step, encoder.g_stride_luma, luma.alpha,
@@ -154,7 +164,6 @@ struct Macroblock {
             }
         }
         if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
-            const EdgeParameters chroma(zolt::QP_SCALE_CR[qp], lf);
             const std::ptrdiff_t offset = 4 * filters.chroma_step;
             filters.chroma(u + offset, v + offset, encoder.g_stride_chroma, chroma.alpha,
                            chroma.beta, SegmentTc0(strengths[2], chroma.tc0).values);

@@ -503,11 +503,10 @@ template <int kStep>
                                _mm256_permute2x128_si256(even_01, even_23, 0x31),
                                _mm256_permute2x128_si256(odd_01, odd_23, 0x31)};
     const VectorQuantizer vectors(quantizer);
-    for (int b = 0; b < 4; ++b) {
-        if (coded >> b & 1) {
-            const int place = kPlace[b];
-            nonzero[place] = vectors.quantize(blocks[b], coefs + 16 * place, scan + 16 * place);
-        }
+    for (unsigned rest = coded; rest != 0; rest &= rest - 1) {
+        const int b = __builtin_ctz(rest);
+        const int place = kPlace[b];
+        nonzero[place] = vectors.quantize(blocks[b], coefs + 16 * place, scan + 16 * place);
     }
     return (coded & 3) | (coded >> 2) << kStep;
 }
@@ -861,19 +860,26 @@ Lanes luma_tc0(const int8_t* tc0) {
     return {_mm256_cvtepi8_epi16(lines)};
 }
 
-// The rows p3..q3 around a horizontal edge.
-struct Rows {
-    uint8_t* row[8];
+// The samples p3..q3 around a luma edge of 16 lines.
+struct LumaLines {
+    Lanes p3, p2, p1, p0, q0, q1, q2, q3;
 
-    Rows(uint8_t* first, ptrdiff_t stride) {
-        for (int i = 0; i < 8; ++i) {
-            row[i] = first + i * stride;
-        }
+    bool filter(int alpha, int beta, const int8_t* tc0) {
+        return filter_luma(p2, p1, p0, q0, q1, q2, alpha, beta, luma_tc0(tc0));
+    }
+    bool filter_strong(int alpha, int beta) {
+        return filter_luma_strong(p3, p2, p1, p0, q0, q1, q2, q3, alpha, beta);
     }
 };
 
-// Transposes 16 rows of 8 samples into 8 rows of 16.
-void transpose_16x8(const uint8_t* src, ptrdiff_t stride, uint8_t* dst) {
+LumaLines luma_rows(const uint8_t* pix, ptrdiff_t stride) {
+    const auto row = [=](int y) { return Lanes::load(pix + y * stride); };
+    return {row(-4), row(-3), row(-2), row(-1), row(0), row(1), row(2), row(3)};
+}
+
+// Eight columns of 16 lines, transposed.
+LumaLines luma_columns(const uint8_t* pix, ptrdiff_t stride) {
+    const uint8_t* src = pix - 4;
     __m128i a[8];  // rows i and i + 8 interleaved
     for (int i = 0; i < 8; ++i) {
         a[i] = _mm_unpacklo_epi8(load_8(src + i * stride), load_8(src + (i + 8) * stride));
@@ -884,65 +890,82 @@ void transpose_16x8(const uint8_t* src, ptrdiff_t stride, uint8_t* dst) {
         b[2 * i + 1] = _mm_unpackhi_epi8(a[i], a[i + 4]);
     }
     // b[2i + h]: rows i, i + 4, i + 8, i + 12 of columns 4h..4h + 3.
+    __m128i columns[8];
     for (int h = 0; h < 2; ++h) {
         const __m128i even_low = _mm_unpacklo_epi8(b[h], b[4 + h]);
         const __m128i even_high = _mm_unpackhi_epi8(b[h], b[4 + h]);
         const __m128i odd_low = _mm_unpacklo_epi8(b[2 + h], b[6 + h]);
         const __m128i odd_high = _mm_unpackhi_epi8(b[2 + h], b[6 + h]);
-        store_16(dst + 64 * h, _mm_unpacklo_epi8(even_low, odd_low));
-        store_16(dst + 64 * h + 16, _mm_unpackhi_epi8(even_low, odd_low));
-        store_16(dst + 64 * h + 32, _mm_unpacklo_epi8(even_high, odd_high));
-        store_16(dst + 64 * h + 48, _mm_unpackhi_epi8(even_high, odd_high));
+        columns[4 * h] = _mm_unpacklo_epi8(even_low, odd_low);
+        columns[4 * h + 1] = _mm_unpackhi_epi8(even_low, odd_low);
+        columns[4 * h + 2] = _mm_unpacklo_epi8(even_high, odd_high);
+        columns[4 * h + 3] = _mm_unpackhi_epi8(even_high, odd_high);
     }
+    const auto lanes = [&](int i) { return Lanes{_mm256_cvtepu8_epi16(columns[i])}; };
+    return {lanes(0), lanes(1), lanes(2), lanes(3), lanes(4), lanes(5), lanes(6), lanes(7)};
 }
 
-// Transposes 8 rows of 16 samples into 16 rows of 8.
-void transpose_8x16(const uint8_t* src, uint8_t* dst, ptrdiff_t stride) {
-    __m128i a[8];  // rows i and i + 4 interleaved, columns 0..7 and 8..15
-    for (int i = 0; i < 4; ++i) {
-        const __m128i upper = load_16(src + 16 * i);
-        const __m128i lower = load_16(src + 16 * (i + 4));
-        a[i] = _mm_unpacklo_epi8(upper, lower);
-        a[4 + i] = _mm_unpackhi_epi8(upper, lower);
-    }
-    for (int h = 0; h < 2; ++h, dst += 8 * stride) {
-        const __m128i* rows = a + 4 * h;
-        const __m128i even_low = _mm_unpacklo_epi8(rows[0], rows[2]);
-        const __m128i even_high = _mm_unpackhi_epi8(rows[0], rows[2]);
-        const __m128i odd_low = _mm_unpacklo_epi8(rows[1], rows[3]);
-        const __m128i odd_high = _mm_unpackhi_epi8(rows[1], rows[3]);
-        const __m128i columns[4] = {
-            _mm_unpacklo_epi8(even_low, odd_low), _mm_unpackhi_epi8(even_low, odd_low),
-            _mm_unpacklo_epi8(even_high, odd_high), _mm_unpackhi_epi8(even_high, odd_high)};
-        for (int i = 0; i < 4; ++i) {
-            store_8(dst + 2 * i * stride, columns[i]);
-            store_8(dst + (2 * i + 1) * stride, _mm_srli_si128(columns[i], 8));
+// The samples of 16 lines at two places of the edge, one in each half.
+__m256i two_samples(Lanes a, Lanes b) {
+    return _mm256_permute4x64_epi64(_mm256_packus_epi16(a.v, b.v), _MM_SHUFFLE(3, 1, 2, 0));
+}
+
+// Stores columns n, n + 1, n + 2 and n + 3 of 16 lines.
+void store_four_columns(uint8_t* p, ptrdiff_t stride, __m256i first, __m256i last) {
+    const __m128i low_01 = _mm_unpacklo_epi8(low_lane(first), high_lane(first));
+    const __m128i high_01 = _mm_unpackhi_epi8(low_lane(first), high_lane(first));
+    const __m128i low_23 = _mm_unpacklo_epi8(low_lane(last), high_lane(last));
+    const __m128i high_23 = _mm_unpackhi_epi8(low_lane(last), high_lane(last));
+    const __m128i lines[4] = {
+        _mm_unpacklo_epi16(low_01, low_23), _mm_unpackhi_epi16(low_01, low_23),
+        _mm_unpacklo_epi16(high_01, high_23), _mm_unpackhi_epi16(high_01, high_23)};
+    for (int i = 0; i < 4; ++i, p += 4 * stride) {
+        const int32_t samples[4] = {_mm_cvtsi128_si32(lines[i]), _mm_extract_epi32(lines[i], 1),
+                                    _mm_extract_epi32(lines[i], 2), _mm_extract_epi32(lines[i], 3)};
+        for (int y = 0; y < 4; ++y) {
+            __builtin_memcpy(p + y * stride, samples + y, sizeof *samples);
         }
     }
 }
 
 void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
                              const int8_t* tc0) {
-    luma_rows(Rows(pix - 4 * stride, stride).row, alpha, beta, luma_tc0(tc0));
+    LumaLines lines = luma_rows(pix, stride);
+    if (lines.filter(alpha, beta, tc0)) {
+        lines.p1.store(pix - 2 * stride);
+        lines.p0.store(pix - stride);
+        lines.q0.store(pix);
+        lines.q1.store(pix + stride);
+    }
 }
 
 void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    luma_rows_strong<Lanes>(Rows(pix - 4 * stride, stride).row, alpha, beta);
+    LumaLines lines = luma_rows(pix, stride);
+    if (lines.filter_strong(alpha, beta)) {
+        lines.p2.store(pix - 3 * stride);
+        lines.p1.store(pix - 2 * stride);
+        lines.p0.store(pix - stride);
+        lines.q0.store(pix);
+        lines.q1.store(pix + stride);
+        lines.q2.store(pix + 2 * stride);
+    }
 }
 
 void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
-    alignas(32) uint8_t block[128];
-    transpose_16x8(pix - 4, stride, block);
-    if (luma_rows(Rows(block, 16).row, alpha, beta, luma_tc0(tc0))) {
-        transpose_8x16(block, pix - 4, stride);
+    LumaLines lines = luma_columns(pix, stride);
+    if (lines.filter(alpha, beta, tc0)) {
+        store_four_columns(pix - 2, stride, two_samples(lines.p1, lines.p0),
+                           two_samples(lines.q0, lines.q1));
     }
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    alignas(32) uint8_t block[128];
-    transpose_16x8(pix - 4, stride, block);
-    if (luma_rows_strong<Lanes>(Rows(block, 16).row, alpha, beta)) {
-        transpose_8x16(block, pix - 4, stride);
+    LumaLines lines = luma_columns(pix, stride);
+    if (lines.filter_strong(alpha, beta)) {
+        store_four_columns(pix - 4, stride, two_samples(lines.p3, lines.p2),
+                           two_samples(lines.p1, lines.p0));
+        store_four_columns(pix, stride, two_samples(lines.q0, lines.q1),
+                           two_samples(lines.q2, lines.q3));
     }
 }
 
