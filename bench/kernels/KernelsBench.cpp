@@ -75,11 +75,12 @@ struct Case {
     void (*run)(const Kernels& k, Arena& a);
 };
 
-constexpr std::int8_t kTc0[4] = {1, 2, -1, 1};
+constexpr std::int8_t kTc0[4] = {-1, 1, 1, 2};
+constexpr std::uint32_t kStrengths = 0x01000201;
 
 template <Kernels::LumaFilter Kernels::*filter>
 void run_luma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, kStride, 40, 10, kTc0);
+    (k.*filter)(a.current, kStride, 40, 10, kTc0, kStrengths);
 }
 
 template <Kernels::StrongLumaFilter Kernels::*filter>
@@ -89,7 +90,7 @@ void run_strong_luma(const Kernels& k, Arena& a) {
 
 template <Kernels::ChromaFilter Kernels::*filter>
 void run_chroma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, a.current + 64, kStride, 40, 10, kTc0);
+    (k.*filter)(a.current, a.current + 64, kStride, 40, 10, kTc0, kStrengths);
 }
 
 template <Kernels::StrongChromaFilter Kernels::*filter>

@@ -78,17 +78,6 @@ struct EdgeParameters {
     }
 };
 
-// tC0 of the four segments of an edge.
-struct SegmentTc0 {
-    std::int8_t values[4];
-
-    SegmentTc0(std::uint32_t strengths, const std::int8_t* tc0) {
-        for (int segment = 0; segment < 4; ++segment) {
-            values[segment] = tc0[strengths >> (8 * segment) & 0xff];
-        }
-    }
-};
-
 // The filters of the vertical or of the horizontal edges, and the steps across an edge, in samples.
 struct EdgeFilters {
     zolt::Kernels::LumaFilter luma;
@@ -150,23 +139,23 @@ struct Macroblock {
                                   edge_chroma.beta);
             return;
         }
-        filters.luma(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta,
-                     SegmentTc0(strengths, edge_luma.tc0).values);
+        filters.luma(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta, edge_luma.tc0,
+                     strengths);
         filters.chroma(u, v, encoder.g_stride_chroma, edge_chroma.alpha, edge_chroma.beta,
-                       SegmentTc0(strengths, edge_chroma.tc0).values);
+                       edge_chroma.tc0, strengths);
     }
 
     void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
         for (int edge = 1; edge < 4; ++edge) {
             if (strengths[edge] != 0) {
                 filters.luma(y + 4 * edge * filters.luma_step, encoder.g_stride_luma, luma.alpha,
-                             luma.beta, SegmentTc0(strengths[edge], luma.tc0).values);
+                             luma.beta, luma.tc0, strengths[edge]);
             }
         }
         if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
             const std::ptrdiff_t offset = 4 * filters.chroma_step;
             filters.chroma(u + offset, v + offset, encoder.g_stride_chroma, chroma.alpha,
-                           chroma.beta, SegmentTc0(strengths[2], chroma.tc0).values);
+                           chroma.beta, chroma.tc0, strengths[2]);
         }
     }
 };

@@ -183,10 +183,12 @@ void run_filter(const Kernels& k, Random& random, std::ptrdiff_t stride, Samples
         (k.*filter)(samples..., stride, alpha, beta);
     } else {
         std::int8_t tc0[4];
-        for (auto& t : tc0) {
-            t = static_cast<std::int8_t>(random.between(-1, 25));
+        std::uint32_t strengths = 0;
+        for (int i = 0; i < 4; ++i) {
+            tc0[i] = static_cast<std::int8_t>(i == 0 ? -1 : random.between(0, 25));
+            strengths = strengths << 8 | static_cast<std::uint32_t>(random.between(0, 3));
         }
-        (k.*filter)(samples..., stride, alpha, beta, tc0);
+        (k.*filter)(samples..., stride, alpha, beta, tc0, strengths);
     }
 }
 

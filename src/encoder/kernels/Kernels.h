@@ -175,11 +175,13 @@ struct Kernels {
 
     // Filters one macroblock edge: pix, u and v are the first samples on the q side; "vertical"
     // edges are crossed horizontally. Luma edges have 16 lines, chroma edges 8 of either component.
-    // tc0 holds tC0 of the edge's four segments (bS 1..3), -1 for a segment that is not filtered.
+    // strengths holds bS 0..3 of the edge's four segments, a byte each, the first lowest; tc0 is
+    // tC0 by bS, -1 for bS 0: a segment that is not filtered.
     using LumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta,
-                                const std::int8_t* tc0);
+                                const std::int8_t* tc0, std::uint32_t strengths);
     using ChromaFilter = void (*)(std::uint8_t* u, std::uint8_t* v, std::ptrdiff_t stride,
-                                  int alpha, int beta, const std::int8_t* tc0);
+                                  int alpha, int beta, const std::int8_t* tc0,
+                                  std::uint32_t strengths);
     // The same with bS 4.
     using StrongLumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha,
                                       int beta);

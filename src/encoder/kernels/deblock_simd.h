@@ -1,9 +1,7 @@
 #pragma once
 
 // Deblocking filters over vectors of 16-bit lanes, one lane per line of the edge. Included by the
-// kernel files, each of which supplies a vector type V of its own with these operations: load(p)
-// widens as many samples as it has lanes, store(p) narrows with clipping, and the static functions
-// used below.
+// kernel files, each of which supplies a vector type V of its own with the operations used below.
 
 #include <cstddef>
 #include <cstdint>
@@ -113,61 +111,6 @@ bool filter_chroma_strong(V p1, V& p0, V& q0, V q1, int alpha, int beta) {
     const V new_q0 = V::shift_right(q1 + q1 + q0 + p1 + two, 2);
     p0 = V::select(lines, new_p0, p0);
     q0 = V::select(lines, new_q0, q0);
-    return true;
-}
-
-// Filters on samples in memory: rows[i] is the address of the row of samples p3, p2, p1, p0, q0,
-// q1, q2, q3 (chroma: p1, p0, q0, q1), one line a lane. They return false when nothing changed.
-template <typename V>
-bool luma_rows(std::uint8_t* const* rows, int alpha, int beta, V tc0) {
-    V p1 = V::load(rows[2]), p0 = V::load(rows[3]);
-    V q0 = V::load(rows[4]), q1 = V::load(rows[5]);
-    if (!filter_luma(V::load(rows[1]), p1, p0, q0, q1, V::load(rows[6]), alpha, beta, tc0)) {
-        return false;
-    }
-    p1.store(rows[2]);
-    p0.store(rows[3]);
-    q0.store(rows[4]);
-    q1.store(rows[5]);
-    return true;
-}
-
-template <typename V>
-bool luma_rows_strong(std::uint8_t* const* rows, int alpha, int beta) {
-    V p2 = V::load(rows[1]), p1 = V::load(rows[2]), p0 = V::load(rows[3]);
-    V q0 = V::load(rows[4]), q1 = V::load(rows[5]), q2 = V::load(rows[6]);
-    if (!filter_luma_strong(V::load(rows[0]), p2, p1, p0, q0, q1, q2, V::load(rows[7]), alpha,
-                            beta)) {
-        return false;
-    }
-    p2.store(rows[1]);
-    p1.store(rows[2]);
-    p0.store(rows[3]);
-    q0.store(rows[4]);
-    q1.store(rows[5]);
-    q2.store(rows[6]);
-    return true;
-}
-
-template <typename V>
-bool chroma_rows(std::uint8_t* const* rows, int alpha, int beta, V tc0) {
-    V p0 = V::load(rows[1]), q0 = V::load(rows[2]);
-    if (!filter_chroma(V::load(rows[0]), p0, q0, V::load(rows[3]), alpha, beta, tc0)) {
-        return false;
-    }
-    p0.store(rows[1]);
-    q0.store(rows[2]);
-    return true;
-}
-
-template <typename V>
-bool chroma_rows_strong(std::uint8_t* const* rows, int alpha, int beta) {
-    V p0 = V::load(rows[1]), q0 = V::load(rows[2]);
-    if (!filter_chroma_strong(V::load(rows[0]), p0, q0, V::load(rows[3]), alpha, beta)) {
-        return false;
-    }
-    p0.store(rows[1]);
-    q0.store(rows[2]);
     return true;
 }
 

@@ -851,21 +851,23 @@ struct Lanes {
     static bool any(Lanes a) { return !_mm256_testz_si256(a.v, a.v); }
 };
 
-// tC0 of four segments, four lines each.
-Lanes luma_tc0(const int8_t* tc0) {
-    const __m128i segments =
-        _mm_setr_epi8(tc0[0], tc0[1], tc0[2], tc0[3], 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0);
-    const __m128i lines =
-        _mm_shuffle_epi8(segments, _mm_setr_epi8(0, 0, 0, 0, 1, 1, 1, 1, 2, 2, 2, 2, 3, 3, 3, 3));
-    return {_mm256_cvtepi8_epi16(lines)};
+// tC0 of 16 lines; lines: the segment of each.
+Lanes line_tc0(const int8_t* tc0, uint32_t strengths, __m128i lines) {
+    int32_t by_strength;
+    __builtin_memcpy(&by_strength, tc0, sizeof by_strength);
+    const __m128i segments = _mm_shuffle_epi8(_mm_cvtsi32_si128(by_strength),
+                                              _mm_cvtsi32_si128(static_cast<int>(strengths)));
+    return {_mm256_cvtepi8_epi16(_mm_shuffle_epi8(segments, lines))};
 }
 
 // The samples p3..q3 around a luma edge of 16 lines.
 struct LumaLines {
     Lanes p3, p2, p1, p0, q0, q1, q2, q3;
 
-    bool filter(int alpha, int beta, const int8_t* tc0) {
-        return filter_luma(p2, p1, p0, q0, q1, q2, alpha, beta, luma_tc0(tc0));
+    bool filter(int alpha, int beta, const int8_t* tc0, uint32_t strengths) {
+        return filter_luma(p2, p1, p0, q0, q1, q2, alpha, beta,
+                           line_tc0(tc0, strengths,
+                                    _mm_setr_epi8(0, 0, 0, 0, 1, 1, 1, 1, 2, 2, 2, 2, 3, 3, 3, 3)));
     }
     bool filter_strong(int alpha, int beta) {
         return filter_luma_strong(p3, p2, p1, p0, q0, q1, q2, q3, alpha, beta);
@@ -928,10 +930,10 @@ void store_four_columns(uint8_t* p, ptrdiff_t stride, __m256i first, __m256i las
     }
 }
 
-void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                             uint32_t strengths) {
     LumaLines lines = luma_rows(pix, stride);
-    if (lines.filter(alpha, beta, tc0)) {
+    if (lines.filter(alpha, beta, tc0, strengths)) {
         lines.p1.store(pix - 2 * stride);
         lines.p0.store(pix - stride);
         lines.q0.store(pix);
@@ -951,9 +953,10 @@ void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, i
     }
 }
 
-void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                           uint32_t strengths) {
     LumaLines lines = luma_columns(pix, stride);
-    if (lines.filter(alpha, beta, tc0)) {
+    if (lines.filter(alpha, beta, tc0, strengths)) {
         store_four_columns(pix - 2, stride, two_samples(lines.p1, lines.p0),
                            two_samples(lines.q0, lines.q1));
     }
@@ -973,12 +976,11 @@ void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int
 struct ChromaLines {
     Lanes p1, p0, q0, q1;
 
-    bool filter(int alpha, int beta, const int8_t* tc0) {
-        const __m128i segments =
-            _mm_setr_epi8(tc0[0], tc0[1], tc0[2], tc0[3], 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0);
-        const __m128i lines = _mm_shuffle_epi8(
-            segments, _mm_setr_epi8(0, 0, 1, 1, 2, 2, 3, 3, 0, 0, 1, 1, 2, 2, 3, 3));
-        return filter_chroma(p1, p0, q0, q1, alpha, beta, Lanes{_mm256_cvtepi8_epi16(lines)});
+    bool filter(int alpha, int beta, const int8_t* tc0, uint32_t strengths) {
+        return filter_chroma(
+            p1, p0, q0, q1, alpha, beta,
+            line_tc0(tc0, strengths,
+                     _mm_setr_epi8(0, 0, 1, 1, 2, 2, 3, 3, 0, 0, 1, 1, 2, 2, 3, 3)));
     }
     bool filter_strong(int alpha, int beta) {
         return filter_chroma_strong(p1, p0, q0, q1, alpha, beta);
@@ -1044,9 +1046,9 @@ void store_chroma_columns(const ChromaLines& lines, uint8_t* u, uint8_t* v, ptrd
 }
 
 void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                               const int8_t* tc0) {
+                               const int8_t* tc0, uint32_t strengths) {
     ChromaLines lines = chroma_rows(u, v, stride);
-    if (lines.filter(alpha, beta, tc0)) {
+    if (lines.filter(alpha, beta, tc0, strengths)) {
         store_chroma_rows(lines, u, v, stride);
     }
 }
@@ -1060,9 +1062,9 @@ void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, 
 }
 
 void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
+                             const int8_t* tc0, uint32_t strengths) {
     ChromaLines lines = chroma_columns(u, v, stride);
-    if (lines.filter(alpha, beta, tc0)) {
+    if (lines.filter(alpha, beta, tc0, strengths)) {
         store_chroma_columns(lines, u, v, stride);
     }
 }

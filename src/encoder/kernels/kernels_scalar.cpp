@@ -540,34 +540,35 @@ void filter_chroma_line_strong(uint8_t* q, ptrdiff_t step, int alpha, int beta) 
 // line to the next.
 template <typename FilterLine>
 void filter_edge(uint8_t* pix, ptrdiff_t along, ptrdiff_t across, int lines_per_segment, int alpha,
-                 int beta, const int8_t* tc0, FilterLine filter_line) {
+                 int beta, const int8_t* tc0, uint32_t strengths, FilterLine filter_line) {
     for (int line = 0; line < 4 * lines_per_segment; ++line) {
-        const int segment_tc0 = tc0[line / lines_per_segment];
+        const int segment_tc0 = tc0[strengths >> (8 * (line / lines_per_segment)) & 0xff];
         if (segment_tc0 >= 0) {
             filter_line(pix + line * along, across, alpha, beta, segment_tc0);
         }
     }
 }
 
-void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
-    filter_edge(pix, stride, 1, 4, alpha, beta, tc0, filter_luma_line);
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                           uint32_t strengths) {
+    filter_edge(pix, stride, 1, 4, alpha, beta, tc0, strengths, filter_luma_line);
 }
 
-void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
-    filter_edge(pix, 1, stride, 4, alpha, beta, tc0, filter_luma_line);
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                             uint32_t strengths) {
+    filter_edge(pix, 1, stride, 4, alpha, beta, tc0, strengths, filter_luma_line);
 }
 
 void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
-    filter_edge(u, stride, 1, 2, alpha, beta, tc0, filter_chroma_line);
-    filter_edge(v, stride, 1, 2, alpha, beta, tc0, filter_chroma_line);
+                             const int8_t* tc0, uint32_t strengths) {
+    filter_edge(u, stride, 1, 2, alpha, beta, tc0, strengths, filter_chroma_line);
+    filter_edge(v, stride, 1, 2, alpha, beta, tc0, strengths, filter_chroma_line);
 }
 
 void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                               const int8_t* tc0) {
-    filter_edge(u, 1, stride, 2, alpha, beta, tc0, filter_chroma_line);
-    filter_edge(v, 1, stride, 2, alpha, beta, tc0, filter_chroma_line);
+                               const int8_t* tc0, uint32_t strengths) {
+    filter_edge(u, 1, stride, 2, alpha, beta, tc0, strengths, filter_chroma_line);
+    filter_edge(v, 1, stride, 2, alpha, beta, tc0, strengths, filter_chroma_line);
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {

@@ -763,12 +763,71 @@ struct Lanes {
     static bool any(Lanes a) { return _mm_movemask_epi8(a.v) != 0; }
 };
 
-// tC0 of two luma segments, four lines each; of four chroma segments, two lines each.
-Lanes luma_tc0(const int8_t* tc0) {
-    return {_mm_set_epi16(tc0[1], tc0[1], tc0[1], tc0[1], tc0[0], tc0[0], tc0[0], tc0[0])};
+// Filters on samples in memory: rows[i] is the address of the row of samples p3, p2, p1, p0, q0,
+// q1, q2, q3 (chroma: p1, p0, q0, q1), one line a lane. They return false when nothing changed.
+bool luma_rows(uint8_t* const* rows, int alpha, int beta, Lanes tc0) {
+    Lanes p1 = Lanes::load(rows[2]), p0 = Lanes::load(rows[3]);
+    Lanes q0 = Lanes::load(rows[4]), q1 = Lanes::load(rows[5]);
+    if (!filter_luma(Lanes::load(rows[1]), p1, p0, q0, q1, Lanes::load(rows[6]), alpha, beta,
+                     tc0)) {
+        return false;
+    }
+    p1.store(rows[2]);
+    p0.store(rows[3]);
+    q0.store(rows[4]);
+    q1.store(rows[5]);
+    return true;
 }
-Lanes chroma_tc0(const int8_t* tc0) {
-    return {_mm_set_epi16(tc0[3], tc0[3], tc0[2], tc0[2], tc0[1], tc0[1], tc0[0], tc0[0])};
+
+bool luma_rows_strong(uint8_t* const* rows, int alpha, int beta) {
+    Lanes p2 = Lanes::load(rows[1]), p1 = Lanes::load(rows[2]), p0 = Lanes::load(rows[3]);
+    Lanes q0 = Lanes::load(rows[4]), q1 = Lanes::load(rows[5]), q2 = Lanes::load(rows[6]);
+    if (!filter_luma_strong(Lanes::load(rows[0]), p2, p1, p0, q0, q1, q2, Lanes::load(rows[7]),
+                            alpha, beta)) {
+        return false;
+    }
+    p2.store(rows[1]);
+    p1.store(rows[2]);
+    p0.store(rows[3]);
+    q0.store(rows[4]);
+    q1.store(rows[5]);
+    q2.store(rows[6]);
+    return true;
+}
+
+bool chroma_rows(uint8_t* const* rows, int alpha, int beta, Lanes tc0) {
+    Lanes p0 = Lanes::load(rows[1]), q0 = Lanes::load(rows[2]);
+    if (!filter_chroma(Lanes::load(rows[0]), p0, q0, Lanes::load(rows[3]), alpha, beta, tc0)) {
+        return false;
+    }
+    p0.store(rows[1]);
+    q0.store(rows[2]);
+    return true;
+}
+
+bool chroma_rows_strong(uint8_t* const* rows, int alpha, int beta) {
+    Lanes p0 = Lanes::load(rows[1]), q0 = Lanes::load(rows[2]);
+    if (!filter_chroma_strong(Lanes::load(rows[0]), p0, q0, Lanes::load(rows[3]), alpha, beta)) {
+        return false;
+    }
+    p0.store(rows[1]);
+    q0.store(rows[2]);
+    return true;
+}
+
+// tC0 of two luma segments, four lines each, of which the strengths are the lowest ones; of four
+// chroma segments, two lines each.
+Lanes luma_tc0(const int8_t* tc0, uint32_t strengths) {
+    const __m128i segments =
+        _mm_set_epi16(0, 0, 0, 0, 0, 0, tc0[strengths >> 8 & 0xff], tc0[strengths & 0xff]);
+    const __m128i pairs = _mm_unpacklo_epi16(segments, segments);
+    return {_mm_unpacklo_epi32(pairs, pairs)};
+}
+Lanes chroma_tc0(const int8_t* tc0, uint32_t strengths) {
+    const __m128i segments =
+        _mm_set_epi16(0, 0, 0, 0, tc0[strengths >> 24], tc0[strengths >> 16 & 0xff],
+                      tc0[strengths >> 8 & 0xff], tc0[strengths & 0xff]);
+    return {_mm_unpacklo_epi16(segments, segments)};
 }
 
 // Transposes an 8x8 block of samples.
@@ -838,53 +897,53 @@ void filter_chroma_columns(uint8_t* pix, ptrdiff_t stride, Filter filter) {
     }
 }
 
-void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                             uint32_t strengths) {
     for (int half = 0; half < 2; ++half) {
         filter_rows(pix + 8 * half, stride, 4, [&](uint8_t* const* rows) {
-            return luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+            return luma_rows(rows, alpha, beta, luma_tc0(tc0, strengths >> (16 * half)));
         });
     }
 }
 
-void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0) {
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
+                           uint32_t strengths) {
     for (int half = 0; half < 2; ++half) {
         filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
-            return luma_rows(rows, alpha, beta, luma_tc0(tc0 + 2 * half));
+            return luma_rows(rows, alpha, beta, luma_tc0(tc0, strengths >> (16 * half)));
         });
     }
 }
 
 void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     for (int half = 0; half < 2; ++half) {
-        filter_rows(pix + 8 * half, stride, 4, [&](uint8_t* const* rows) {
-            return luma_rows_strong<Lanes>(rows, alpha, beta);
-        });
+        filter_rows(pix + 8 * half, stride, 4,
+                    [&](uint8_t* const* rows) { return luma_rows_strong(rows, alpha, beta); });
     }
 }
 
 void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
     for (int half = 0; half < 2; ++half) {
         filter_luma_columns(pix + 8 * half * stride, stride, [&](uint8_t* const* rows) {
-            return luma_rows_strong<Lanes>(rows, alpha, beta);
+            return luma_rows_strong(rows, alpha, beta);
         });
     }
 }
 
 void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                               const int8_t* tc0) {
+                               const int8_t* tc0, uint32_t strengths) {
     for (uint8_t* pix : {u, v}) {
         filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
-            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0, strengths));
         });
     }
 }
 
 void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0) {
+                             const int8_t* tc0, uint32_t strengths) {
     for (uint8_t* pix : {u, v}) {
         filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
-            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0));
+            return chroma_rows(rows, alpha, beta, chroma_tc0(tc0, strengths));
         });
     }
 }
@@ -892,16 +951,15 @@ void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha
 void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha,
                                       int beta) {
     for (uint8_t* pix : {u, v}) {
-        filter_rows(pix, stride, 2, [&](uint8_t* const* rows) {
-            return chroma_rows_strong<Lanes>(rows, alpha, beta);
-        });
+        filter_rows(pix, stride, 2,
+                    [&](uint8_t* const* rows) { return chroma_rows_strong(rows, alpha, beta); });
     }
 }
 
 void deblock_chroma_vertical_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta) {
     for (uint8_t* pix : {u, v}) {
         filter_chroma_columns(pix, stride, [&](uint8_t* const* rows) {
-            return chroma_rows_strong<Lanes>(rows, alpha, beta);
+            return chroma_rows_strong(rows, alpha, beta);
         });
     }
 }
