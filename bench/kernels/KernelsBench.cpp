@@ -115,9 +115,10 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) {
          benchmark::DoNotOptimize(k.first_phases_below_x4(a.block, a.refs, kStride, a.limits));
      }},
-    {"first_phases_below_x8",
+    {"first_phases_below_half",
      [](const Kernels& k, Arena& a) {
-         benchmark::DoNotOptimize(k.first_phases_below_x8(a.block, a.refs, kStride, a.limits));
+         const zolt::HalfSamples at = {a.refs[0], a.refs[1], a.refs[2]};
+         benchmark::DoNotOptimize(k.first_phases_below_half(a.block, at, kStride, a.limits));
      }},
     {"first_phases_below_star",
      [](const Kernels& k, Arena& a) {

@@ -441,13 +441,12 @@ public:
     int g_origin_luma = 0, g_origin_chroma = 0;  // offset of sample (0, 0) in a plane
     int g_size_Y = 0, g_size_U = 0;              // samples of a plane with its borders
     int g_visit_dim = 0;                         // rows and columns of the table of visited vectors
-    // Samples of the half- and quarter-pel candidates: plane (0 reference, then the half-sample
-    // planes below, right, both) and offset in samples. Quarter pels are averages of two, by the
-    // kind of the sample that they surround: integer, right, below, both.
+    // Samples that quarter-pel candidates average with the result's own: plane (0 reference, then
+    // the half-sample planes below, right, both) and offset in samples, by the kind of the result's
+    // sample: integer, right, below, both.
     struct plane_offset_t {
         std::ptrdiff_t plane, offset;
     };
-    plane_offset_t g_half_samples[8];
     plane_offset_t g_quarter_samples[4][8];
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
     zolt::AlignedBuffer<std::uint32_t> g_visit_store;

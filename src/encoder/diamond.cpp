@@ -79,22 +79,20 @@ struct Vector {
     int x, y;
 };
 
-// Half-sample candidates around the integer result, in the order of their evaluation, and their
-// samples relative to it.
+// Half-sample candidates around the integer result, in the order of their evaluation, which is that
+// of zolt::half_candidates().
+constexpr Vector kHalfCandidates[8] = {{0, 1}, {0, -1}, {1, 0},  {-1, 0},
+                                       {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
+
+// Quarter-sample candidates around the half-sample result, in the order of their evaluation.
+constexpr Vector kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
+                                          {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
+
 enum Plane { kFull, kVertical, kHorizontal, kCentre };
 struct PlaneSample {
     Plane plane;
     int x, y;
 };
-constexpr Vector kHalfCandidates[8] = {{0, 1}, {0, -1}, {1, 0},  {-1, 0},
-                                       {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
-constexpr PlaneSample kHalfSamples[8] = {
-    {kVertical, 0, 0}, {kVertical, 0, -1}, {kHorizontal, 0, 0}, {kHorizontal, -1, 0},
-    {kCentre, 0, 0},   {kCentre, -1, 0},   {kCentre, 0, -1},    {kCentre, -1, -1}};
-
-// Quarter-sample candidates around the half-sample result, in the order of their evaluation.
-constexpr Vector kQuarterCandidates[8] = {{1, 0}, {0, 1},  {-1, 0}, {0, -1},
-                                          {1, 1}, {-1, 1}, {1, -1}, {-1, -1}};
 
 // Each of them is the average of two samples (clause 8.4.2.2.1), the result's own and one of these,
 // relative to it in its plane. From an integer sample G or a centre sample j that holds for the
@@ -212,7 +210,6 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
         return plane_offset_t{s.plane, static_cast<std::ptrdiff_t>(s.y) * g_stride_luma + s.x};
     };
     for (int n = 0; n < 8; ++n) {
-        g_half_samples[n] = offset(kHalfSamples[n]);
         for (int kind = 0; kind < 4; ++kind) {
             g_quarter_samples[kind][n] = offset(kQuarterSamples[kind][n]);
         }
@@ -447,11 +444,10 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
 void MotionSearch::half_stage(_mv& result) {
     set_planes(m_best.y * m_stride + m_best.x);
     const Fractions candidates(*this, kHalfCandidates, 4 * m_best.x, 4 * m_best.y, 2);
+    const zolt::HalfSamples at = {m_planes[kVertical], m_planes[kHorizontal], m_planes[kCentre]};
     const std::uint8_t* refs[kFractions];
-    for (int n = 0; n < kFractions; ++n) {
-        refs[n] = sample(m_encoder.g_half_samples[n]);
-    }
-    unsigned passed = m_kernels.first_phases_below_x8(m_block, refs, m_stride, candidates.limits);
+    zolt::half_candidates(at, m_stride, refs);
+    unsigned passed = m_kernels.first_phases_below_half(m_block, at, m_stride, candidates.limits);
     for (; passed != 0; passed &= passed - 1) {
         const int n = zolt::lowest_bit(passed);
         const int rate = candidates.rates[n];

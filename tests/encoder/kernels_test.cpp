@@ -131,8 +131,14 @@ struct Candidates {
         stride = place.stride;
         for (int i = 0; i < 8; ++i) {
             refs[i] = centre + random.between(-8, 8) * stride + random.between(-8, 8);
+        }
+        set_limits(arena, random);
+    }
+
+    void set_limits(const Arena& arena, Random& random) {
+        for (int i = 0; i < 8; ++i) {
             int sums[4];
-            zolt::scalar_kernels().phase_sads(arena.pred(), refs[i], stride, sums);
+            zolt::scalar_kernels().phase_sads(arena.samples + kMargin, refs[i], stride, sums);
             const int choices[4] = {sums[1], sums[1] + 1, sums[1] + random.between(-300, 300),
                                     random.between(0, 1) ? 0xffffff : -5};
             limits[i] = choices[random.between(0, 3)];
@@ -228,11 +234,14 @@ constexpr Case kCases[] = {
          const Candidates c(a, random);
          a.result = k.first_phases_below_x4(a.pred(), c.refs, c.stride, c.limits);
      }},
-    {"first_phases_below_x8",
+    {"first_phases_below_half",
      [](const Kernels& k, Arena& a, Random random) {
          arrange_current(a, random);
-         const Candidates c(a, random);
-         a.result = k.first_phases_below_x8(a.pred(), c.refs, c.stride, c.limits);
+         Candidates c(a, random);
+         const zolt::HalfSamples at = {c.refs[0], c.refs[1], c.refs[2]};
+         zolt::half_candidates(at, c.stride, c.refs);
+         c.set_limits(a, random);
+         a.result = k.first_phases_below_half(a.pred(), at, c.stride, c.limits);
      }},
     {"first_phases_below_star",
      [](const Kernels& k, Arena& a, Random random) {

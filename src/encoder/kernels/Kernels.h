@@ -25,6 +25,23 @@ constexpr int kMaxLevel = 2063;
 // Bytes of a block as arrange_block leaves it.
 constexpr int kArrangedBlock = 384;
 
+// The half samples below, right and below right of an integer sample, in planes of one stride.
+struct HalfSamples {
+    const std::uint8_t *vertical, *horizontal, *centre;
+};
+
+// Blocks at the eight half-sample positions around a block: below, above, right, left, then below
+// right, below left, above right and above left.
+inline void half_candidates(const HalfSamples& at, std::ptrdiff_t stride,
+                            const std::uint8_t** blocks) {
+    const std::uint8_t* const all[8] = {
+        at.vertical, at.vertical - stride, at.horizontal,      at.horizontal - 1,
+        at.centre,   at.centre - 1,        at.centre - stride, at.centre - stride - 1};
+    for (int n = 0; n < 8; ++n) {
+        blocks[n] = all[n];
+    }
+}
+
 // The pairs of blocks whose averages are candidates 4..7 of first_phases_below_cross.
 constexpr int kCrossPairs[4][2] = {{0, 1}, {2, 1}, {0, 3}, {2, 3}};
 
@@ -68,15 +85,14 @@ struct Kernels {
                                const std::uint8_t* b, std::ptrdiff_t stride, int* sums);
 
     // Which candidates have a SAD of phases 0 and 1 below their limit: bit n of the result,
-    // candidate n. x4, x8: the candidates are the blocks at refs. Star: the averages of centre and
-    // each of eight. Cross: the averages of centre and each of four, then those of refs 0 and 1, 2
-    // and 1, 0 and 3, 2 and 3 (kCrossPairs).
+    // candidate n. x4: the candidates are the blocks at refs. Half: those of half_candidates().
+    // Star: the averages of centre and each of eight. Cross: the averages of centre and each of
+    // four, then those of refs 0 and 1, 2 and 1, 0 and 3, 2 and 3 (kCrossPairs).
     std::uint32_t (*first_phases_below_x4)(const std::uint8_t* block,
                                            const std::uint8_t* const* refs, std::ptrdiff_t stride,
                                            const std::int32_t* limits);
-    std::uint32_t (*first_phases_below_x8)(const std::uint8_t* block,
-                                           const std::uint8_t* const* refs, std::ptrdiff_t stride,
-                                           const std::int32_t* limits);
+    std::uint32_t (*first_phases_below_half)(const std::uint8_t* block, const HalfSamples& at,
+                                             std::ptrdiff_t stride, const std::int32_t* limits);
     std::uint32_t (*first_phases_below_star)(const std::uint8_t* block, const std::uint8_t* centre,
                                              const std::uint8_t* const* refs, std::ptrdiff_t stride,
                                              const std::int32_t* limits);

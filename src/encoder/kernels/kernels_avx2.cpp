@@ -160,16 +160,46 @@ uint32_t first_phases_below_x4(const uint8_t* block, const uint8_t* const* refs,
         _mm_movemask_ps(_mm_castsi128_ps(_mm_cmpgt_epi32(load_16(limits), totals))));
 }
 
-uint32_t first_phases_below_x8(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
-                               const int32_t* limits) {
+// The checkerboards of a block and of the block one row above, n = 0, 1, 2, 3 in turn: rows that
+// both have are read once.
+class CheckerboardPair {
+public:
+    CheckerboardPair(const uint8_t* block, ptrdiff_t stride)
+        : m_row(block), m_stride(stride), m_above(two_rows(block - stride, stride)) {}
+
+    void next(__m256i* here, __m256i* above) {
+        const __m256i even = two_rows(m_row, m_stride);
+        const __m256i odd = two_rows(m_row + m_stride, m_stride);
+        *here = _mm256_blendv_epi8(even, odd, odd_columns());
+        *above = _mm256_blendv_epi8(m_above, even, odd_columns());
+        m_above = odd;
+        m_row += 2 * m_stride;
+    }
+
+private:
+    const uint8_t* m_row;
+    ptrdiff_t m_stride;
+    __m256i m_above;
+};
+
+uint32_t first_phases_below_half(const uint8_t* block, const HalfSamples& at, ptrdiff_t stride,
+                                 const int32_t* limits) {
     __m256i sums[8];
     for (__m256i& sum : sums) {
         sum = _mm256_setzero_si256();
     }
+    CheckerboardPair vertical(at.vertical, stride);
+    CheckerboardPair right(at.centre, stride), left(at.centre - 1, stride);
     for (int n = 0; n < 4; ++n) {
+        __m256i boards[8];  // in the order of half_candidates()
+        vertical.next(boards, boards + 1);
+        boards[2] = checkerboard(at.horizontal + 2 * n * stride, stride);
+        boards[3] = checkerboard(at.horizontal - 1 + 2 * n * stride, stride);
+        right.next(boards + 4, boards + 6);
+        left.next(boards + 5, boards + 7);
         const __m256i current = arranged_checkerboard(block, n);
         for (int i = 0; i < 8; ++i) {
-            add_sad(sums + i, current, checkerboard(refs[i] + 2 * n * stride, stride));
+            add_sad(sums + i, current, boards[i]);
         }
     }
     return below_limits(sums, limits);
@@ -1085,7 +1115,7 @@ Kernels with_avx2(const Kernels& base) {
     k.phase_sads = phase_sads;
     k.phase_sads_average = phase_sads_average;
     k.first_phases_below_x4 = first_phases_below_x4;
-    k.first_phases_below_x8 = first_phases_below_x8;
+    k.first_phases_below_half = first_phases_below_half;
     k.first_phases_below_star = first_phases_below_star;
     k.first_phases_below_cross = first_phases_below_cross;
     k.half_vertical_row = half_vertical_row;

@@ -104,6 +104,13 @@ uint32_t first_phases_below(const uint8_t* block, const uint8_t* const* refs, pt
     return below;
 }
 
+uint32_t first_phases_below_half(const uint8_t* block, const HalfSamples& at, ptrdiff_t stride,
+                                 const int32_t* limits) {
+    const uint8_t* refs[8];
+    half_candidates(at, stride, refs);
+    return first_phases_below<8>(block, refs, stride, limits);
+}
+
 // The averages of centre and each of kCount blocks.
 template <int kCount>
 uint32_t averages_below(const uint8_t* block, const uint8_t* centre, const uint8_t* const* refs,
@@ -607,7 +614,7 @@ const Kernels& scalar_kernels() {
         phase_sads,
         phase_sads_average,
         first_phases_below<4>,
-        first_phases_below<8>,
+        first_phases_below_half,
         averages_below<8>,
         first_phases_below_cross,
         extend_edges,

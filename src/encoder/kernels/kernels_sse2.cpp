@@ -148,6 +148,13 @@ uint32_t first_phases_below(const uint8_t* block, const uint8_t* const* refs, pt
     return below;
 }
 
+uint32_t first_phases_below_half(const uint8_t* block, const HalfSamples& at, ptrdiff_t stride,
+                                 const int32_t* limits) {
+    const uint8_t* refs[8];
+    half_candidates(at, stride, refs);
+    return first_phases_below<8>(block, refs, stride, limits);
+}
+
 void gather_checkerboard(const uint8_t* src, ptrdiff_t stride, __m128i* rows) {
     for (int n = 0; n < 8; ++n) {
         rows[n] = checkerboard(src + 2 * n * stride, stride);
@@ -973,7 +980,7 @@ Kernels with_sse2(const Kernels& base) {
     k.phase_sads = phase_sads;
     k.phase_sads_average = phase_sads_average;
     k.first_phases_below_x4 = first_phases_below<4>;
-    k.first_phases_below_x8 = first_phases_below<8>;
+    k.first_phases_below_half = first_phases_below_half;
     k.first_phases_below_star = first_phases_below_star;
     k.first_phases_below_cross = first_phases_below_cross;
     k.half_vertical_row = half_vertical_row;
