@@ -20,6 +20,9 @@ __m128i load_16(const void* p) {
 __m512i load_64(const void* p) {
     return _mm512_loadu_si512(p);
 }
+void store_16(void* p, __m128i v) {
+    _mm_storeu_si128(static_cast<__m128i*>(p), v);
+}
 void store_64(void* p, __m512i v) {
     _mm512_storeu_si512(p, v);
 }
@@ -35,6 +38,11 @@ __m256i low_half(__m512i v) {
 }
 __m256i high_half(__m512i v) {
     return _mm512_extracti64x4_epi64(v, 1);
+}
+
+// Clipped to samples.
+__m256i to_samples(__m512i v) {
+    return _mm512_cvtusepi16_epi8(_mm512_max_epi16(v, _mm512_setzero_si512()));
 }
 
 // ---- Distortion of the motion search ----
@@ -200,6 +208,92 @@ void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
     });
 }
 
+// ---- Inter prediction ----
+
+// Unrounded vertical sums from six rows, as 16-bit lanes.
+__m512i vertical_sums(const __m512i* r) {
+    const __m512i t = _mm512_sub_epi16(_mm512_slli_epi16(_mm512_add_epi16(r[2], r[3]), 2),
+                                       _mm512_add_epi16(r[1], r[4]));
+    return _mm512_add_epi16(_mm512_add_epi16(_mm512_add_epi16(r[0], r[5]), t),
+                            _mm512_slli_epi16(t, 2));
+}
+
+// (outer - 5 * middle + 20 * inner + 512) >> 10 with 32-bit sums.
+__m512i centre_samples(__m512i outer, __m512i middle, __m512i inner) {
+    const __m512i ones = _mm512_set1_epi16(1);
+    const __m512i outer_middle = _mm512_set1_epi32(static_cast<int>(0xfffb0001u));  // 1, -5
+    const __m512i inner_rounding = _mm512_set1_epi32(512 << 16 | 20);
+    const __m512i low =
+        _mm512_add_epi32(_mm512_madd_epi16(_mm512_unpacklo_epi16(outer, middle), outer_middle),
+                         _mm512_madd_epi16(_mm512_unpacklo_epi16(inner, ones), inner_rounding));
+    const __m512i high =
+        _mm512_add_epi32(_mm512_madd_epi16(_mm512_unpackhi_epi16(outer, middle), outer_middle),
+                         _mm512_madd_epi16(_mm512_unpackhi_epi16(inner, ones), inner_rounding));
+    return _mm512_packs_epi32(_mm512_srai_epi32(low, 10), _mm512_srai_epi32(high, 10));
+}
+
+void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
+    // Rows y and y + 8 in the halves: columns -2..13, and columns 6..21, from six rows that move
+    // down.
+    __m512i left[6], right[6];
+    const auto load_row = [&](int slot, int y) {
+        const uint8_t* row = src + y * stride;
+        const uint8_t* later = row + 8 * stride;
+        left[slot] = _mm512_cvtepu8_epi16(join(load_16(row - 2), load_16(later - 2)));
+        right[slot] = _mm512_cvtepu8_epi16(join(load_16(row + 6), load_16(later + 6)));
+    };
+    for (int i = 0; i < 5; ++i) {
+        load_row(i, i - 2);
+    }
+    for (int y = 0; y < 8; ++y) {
+        load_row(5, y + 3);
+        const __m512i a = vertical_sums(left);
+        const __m512i b = vertical_sums(right);
+        // Sums that start n columns later.
+        const __m512i a1 = _mm512_alignr_epi8(b, a, 2), a2 = _mm512_alignr_epi8(b, a, 4);
+        const __m512i a3 = _mm512_alignr_epi8(b, a, 6), a4 = _mm512_alignr_epi8(b, a, 8);
+        const __m512i a5 = _mm512_alignr_epi8(b, a, 10);
+        const __m512i samples = centre_samples(_mm512_add_epi16(a, a5), _mm512_add_epi16(a1, a4),
+                                               _mm512_add_epi16(a2, a3));
+        const __m256i rows = to_samples(samples);
+        store_16(pred + 16 * y, _mm256_castsi256_si128(rows));
+        store_16(pred + 16 * y + 128, _mm256_extracti128_si256(rows, 1));
+        for (int i = 0; i < 5; ++i) {
+            left[i] = left[i + 1];
+            right[i] = right[i + 1];
+        }
+    }
+}
+
+void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t stride, int fx,
+                int fy) {
+    const __m512i columns = _mm512_set1_epi16(static_cast<short>((8 - fx) | fx << 8));
+    const __m512i upper_weight = _mm512_set1_epi16(static_cast<short>(8 - fy));
+    const __m512i lower_weight = _mm512_set1_epi16(static_cast<short>(fy));
+    const __m512i pairs =
+        _mm512_broadcast_i32x4(_mm_setr_epi8(0, 1, 1, 2, 2, 3, 3, 4, 4, 5, 5, 6, 6, 7, 7, 8));
+    // Rows y of Cb and Cr, then rows y + 4.
+    __m512i row[5];
+    for (int y = 0; y < 5; ++y) {
+        const ptrdiff_t at = y * stride, later = (y + 4) * stride;
+        const __m512i samples = join(join(load_16(u + at), load_16(v + at)),
+                                     join(load_16(u + later), load_16(v + later)));
+        row[y] = _mm512_maddubs_epi16(_mm512_shuffle_epi8(samples, pairs), columns);
+    }
+    const auto between = [=](__m512i upper, __m512i lower) {
+        const __m512i sum = _mm512_add_epi16(_mm512_mullo_epi16(upper, upper_weight),
+                                             _mm512_mullo_epi16(lower, lower_weight));
+        return _mm512_srli_epi16(_mm512_add_epi16(sum, _mm512_set1_epi16(32)), 6);
+    };
+    // Rows 0 and 1 of Cb, of Cr, rows 4 and 5 of either; then the rows two below.
+    const __m512i first = _mm512_packus_epi16(between(row[0], row[1]), between(row[1], row[2]));
+    const __m512i second = _mm512_packus_epi16(between(row[2], row[3]), between(row[3], row[4]));
+    store_64(pred,
+             _mm512_permutex2var_epi64(first, _mm512_setr_epi64(0, 1, 8, 9, 4, 5, 12, 13), second));
+    store_64(pred + 64, _mm512_permutex2var_epi64(
+                            first, _mm512_setr_epi64(2, 3, 10, 11, 6, 7, 14, 15), second));
+}
+
 }  // namespace
 
 Kernels with_avx512(const Kernels& base) {
@@ -210,6 +304,8 @@ Kernels with_avx512(const Kernels& base) {
     k.first_phases_below_cross = first_phases_below_cross;
     k.half_vertical_row = half_vertical_row;
     k.half_horizontal_row = half_horizontal_row;
+    k.centre_16x16 = centre_16x16;
+    k.chroma_8x8 = chroma_8x8;
     return k;
 }
 
