@@ -13,7 +13,7 @@ const Kernels& best_kernels() {
 
 KernelTables kernel_tables() {
     struct Tables {
-        Kernels table[3] = {scalar_kernels()};
+        Kernels table[4] = {scalar_kernels()};
         int count = 1;
 
         Tables() {
@@ -25,6 +25,12 @@ KernelTables kernel_tables() {
             }
             if (__builtin_cpu_supports("avx2")) {
                 table[count] = with_avx2_color(with_avx2(table[count - 1]));
+                ++count;
+            }
+            // Processors with VBMI do not lower their clock for 512-bit vectors as older ones do.
+            if (__builtin_cpu_supports("avx512bw") && __builtin_cpu_supports("avx512vl") &&
+                __builtin_cpu_supports("avx512dq") && __builtin_cpu_supports("avx512vbmi")) {
+                table[count] = with_avx512(table[count - 1]);
                 ++count;
             }
 #endif

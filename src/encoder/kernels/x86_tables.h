@@ -7,6 +7,7 @@ namespace zolt {
 
 Kernels with_sse2(const Kernels& base);
 Kernels with_avx2(const Kernels& base);
+Kernels with_avx512(const Kernels& base);
 
 // Their colour conversions.
 Kernels with_sse2_color(const Kernels& base);
