@@ -23,8 +23,7 @@ constexpr std::ptrdiff_t kStride = kWidth + 2 * kBorder;
 constexpr std::ptrdiff_t kPlaneSize = kStride * (kHeight + 2 * kBorder);
 constexpr int kQp = 28;
 
-// What kernels read and write. Kernels that work in place see their own results again: levels
-// quantise to themselves, and edges that are filtered once are filtered again.
+// What kernels read and write. Deblocking works in place: it filters its own results again.
 struct Arena {
     alignas(64) std::uint8_t planes[2][kPlaneSize];
     alignas(64) std::uint8_t block[zolt::kArrangedBlock];
@@ -37,7 +36,7 @@ struct Arena {
     std::int16_t dc[16];
     std::uint8_t* current;  // a macroblock
     const std::uint8_t* refs[8];
-    alignas(32) std::int32_t limits[8] = {};
+    std::int32_t limits[8] = {};
 
     Arena() {
         std::minstd_rand random(1);

@@ -50,7 +50,9 @@ public:
     void Convert(const unsigned char* source);
 
     // Whether the output is the source as it stands, so that Convert only copies it.
-    bool KeepsPictures() const { return sourceFormat == resultFormat && !NeedsCropping(); }
+    bool KeepsPictures() const {
+        return conversion != nullptr && sourceFormat == resultFormat && !NeedsCropping();
+    }
 
     int GetOutputWidth() const { return outputWidth; }
     int GetOutputHeight() const { return outputHeight; }

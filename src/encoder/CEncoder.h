@@ -242,11 +242,12 @@ public:
     // with status 104.
     static void ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up, int left,
                        int mode);
-    static int ipred4_dc(const std::uint8_t* neighbours, int up, int left);
     static void ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
                         int left, int mode);
     static void ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
                         int left, int mode);
+    // The DC value of a 4x4 block (clause 8.3.1.2.3).
+    static int ipred4_dc(const std::uint8_t* neighbours, int up, int left);
 
     // ---- learn: learned intra decisions ----
     int learn16_4();
@@ -414,10 +415,12 @@ public:
 
     // Prediction samples: luma 16x16, Cb 8x8, Cr 8x8.
     alignas(64) std::uint8_t g_mb_pred[384] = {};
-    // Coefficients, then scaled coefficients, of luma blocks 0..15 in decoding order and of the
-    // four blocks of Cb and of Cr; inside a block column by column.
+    // Scaled coefficients (level * dequant) of luma blocks 0..15 in decoding order and of the four
+    // blocks of Cb and of Cr; inside a block column by column. Those of a block without levels are
+    // left over from others, or 0 where the DC coefficients have a transform of their own.
     alignas(64) std::int16_t g_mb_coefs[24 * 16] = {};
-    // Levels of the same blocks in zig-zag order, and masks of the levels that are not 0.
+    // Levels of the same blocks in zig-zag order, left over from others where a block has none, and
+    // masks of the levels that are not 0.
     alignas(64) std::int16_t g_scan_levels[24 * 16] = {};
     std::uint16_t g_nonzero[24] = {};
     // DC levels: intra 16x16 in zig-zag order, chroma in raster order.

@@ -156,7 +156,7 @@ private:
     // their rates, and the limits of their first phases.
     struct Fractions {
         int rates[kFractions];
-        alignas(32) std::int32_t limits[kFractions];
+        std::int32_t limits[kFractions];
 
         Fractions(const MotionSearch& search, const Vector* directions, int x, int y, int step) {
             int horizontal[3], vertical[3];
@@ -181,7 +181,7 @@ private:
     const int m_px, m_py;       // the macroblock's position, samples
     const Vector m_pmv;         // predicted vector, quarter pels
     const int m_lambda;         // rate weight
-    const std::uint8_t* m_ref;  // its samples in the reference
+    const std::uint8_t* m_ref;  // the macroblock's samples in the reference
     std::uint32_t* m_visited;   // stamp of the zero vector
     int m_thresholds[3] = {kNoCost, kNoCost, kNoCost};
     int m_best_cost = kNoCost;

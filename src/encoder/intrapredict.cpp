@@ -80,7 +80,6 @@ void CEncoder::ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up
     zolt::predict_4x4(pred, neighbours, ipred4_dc(neighbours, up, left), mode);
 }
 
-// The DC value of clause 8.3.1.2.3.
 int CEncoder::ipred4_dc(const std::uint8_t* neighbours, int up, int left) {
     const int above_sum = up ? sum(neighbours + 5, 1, 4) : 0;
     const int left_sum = left ? sum(neighbours, 1, 4) : 0;

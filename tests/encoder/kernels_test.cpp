@@ -42,11 +42,15 @@ struct Arena {
     alignas(64) std::uint16_t nonzero[kMargin + 16 + kMargin];
     alignas(64) std::int32_t values[kMargin + 16 + kMargin];
     alignas(64) std::int32_t numbers[kMargin + 16 + kMargin];
-    std::int16_t dc[16];
+    std::int16_t dc[1 + 16];
     std::uint32_t result;
 
-    std::uint8_t* pred() { return samples + kMargin; }
-    std::int16_t* coef() { return coefs + kMargin; }
+    // Aligned as the engine's are and no better.
+    std::uint8_t* pred() { return samples + kMargin + 32; }
+    std::uint8_t* pred_4x4() { return samples + kMargin + 16; }
+    std::int16_t* coef() { return coefs + kMargin + 16; }
+    std::int16_t* levels() { return scan + kMargin + 16; }
+    std::uint16_t* masks() { return nonzero + kMargin + 1; }
     std::int32_t* out() { return numbers + kMargin; }
 };
 
@@ -123,7 +127,7 @@ struct Candidates {
     const std::uint8_t* centre;
     const std::uint8_t* refs[8];
     std::ptrdiff_t stride;
-    alignas(32) std::int32_t limits[8];
+    std::int32_t limits[8];
 
     Candidates(Arena& arena, Random& random) {
         const Place place(arena.plane[1], random);
@@ -135,10 +139,10 @@ struct Candidates {
         set_limits(arena, random);
     }
 
-    void set_limits(const Arena& arena, Random& random) {
+    void set_limits(Arena& arena, Random& random) {
         for (int i = 0; i < 8; ++i) {
             int sums[4];
-            zolt::scalar_kernels().phase_sads(arena.samples + kMargin, refs[i], stride, sums);
+            zolt::scalar_kernels().phase_sads(arena.pred(), refs[i], stride, sums);
             const int choices[4] = {sums[1], sums[1] + 1, sums[1] + random.between(-300, 300),
                                     random.between(0, 1) ? 0xffffff : -5};
             limits[i] = choices[random.between(0, 3)];
@@ -146,13 +150,13 @@ struct Candidates {
     }
 
     // Limits at which the distortions of averages decide.
-    void average(const Arena& arena, bool cross, Random& random) {
+    void average(Arena& arena, bool cross, Random& random) {
         for (int i = 0; i < 8; ++i) {
             const bool diagonal = cross && i >= 4;
             const std::uint8_t* a = diagonal ? refs[zolt::kCrossPairs[i - 4][0]] : centre;
             const std::uint8_t* b = refs[diagonal ? zolt::kCrossPairs[i - 4][1] : i];
             int sums[4];
-            zolt::scalar_kernels().phase_sads_average(arena.samples + kMargin, a, b, stride, sums);
+            zolt::scalar_kernels().phase_sads_average(arena.pred(), a, b, stride, sums);
             limits[i] = sums[1] + random.between(-1, 2);
         }
     }
@@ -166,18 +170,17 @@ void run_residual(const Kernels& k, Arena& a, Random random) {
     const int qp = random.between(0, 51);
     const zolt::Quantizer& q =
         random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+    std::uint8_t* const pred = size == 4 ? a.pred_4x4() : a.pred();
     const int near = random.between(0, size * size);
     for (int i = 0; i < near; ++i) {
         const int sample = src.p[i / size * src.stride + i % size];
-        a.pred()[i] = static_cast<std::uint8_t>(std::clamp(sample + random.between(-4, 4), 0, 255));
+        pred[i] = static_cast<std::uint8_t>(std::clamp(sample + random.between(-4, 4), 0, 255));
     }
-    std::int16_t* const scan = a.scan + kMargin;
-    std::uint16_t* const nonzero = a.nonzero + kMargin;
     if constexpr (size == 4) {
-        a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, a.coef(), scan, nonzero);
+        a.result = (k.*kernel)(src.p, src.stride, pred, q, a.coef(), a.levels(), a.masks());
     } else {
-        std::int16_t* const dc = random.between(0, 1) ? a.dc : nullptr;
-        a.result = (k.*kernel)(src.p, src.stride, a.pred(), q, dc, a.coef(), scan, nonzero);
+        std::int16_t* const dc = random.between(0, 1) ? a.dc + 1 : nullptr;
+        a.result = (k.*kernel)(src.p, src.stride, pred, q, dc, a.coef(), a.levels(), a.masks());
     }
 }
 
@@ -317,7 +320,7 @@ constexpr Case kCases[] = {
     {"reconstruct_4x4",
      [](const Kernels& k, Arena& a, Random random) {
          const Place dst(a.plane[0], random, 4);
-         k.reconstruct_4x4(a.coef(), a.pred(), dst.p, dst.stride);
+         k.reconstruct_4x4(a.coef(), a.pred_4x4(), dst.p, dst.stride);
      }},
     {"block_sums",
      [](const Kernels& k, Arena& a, Random random) {
@@ -346,7 +349,7 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random, 4);
          const std::uint8_t* neighbours = a.plane[1] + random.between(0, 100);
-         k.intra_4x4_modes(src.p, src.stride, neighbours, random.sample(), a.pred(), a.coef());
+         k.intra_4x4_modes(src.p, src.stride, neighbours, random.sample(), a.pred_4x4(), a.coef());
      }},
     {"deblock_luma_vertical", run_luma_filter<&Kernels::deblock_luma_vertical, false>},
     {"deblock_luma_horizontal", run_luma_filter<&Kernels::deblock_luma_horizontal, false>},

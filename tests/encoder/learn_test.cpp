@@ -8,7 +8,9 @@
 #include <cstdlib>
 #include <vector>
 
+#include "common/Random.h"
 #include "encoder/CEncoder.h"
+#include "encoder/tables.h"
 
 namespace {
 
@@ -128,7 +130,7 @@ class ModeSearch : public testing::Test {
 protected:
     // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) around it.
     template <typename Draw>
-    void start(int mb, Draw draw) {
+    void start(int mb, Draw draw, int qp = 12) {
         for (int y = 0; y < 48; ++y) {
             for (int x = 0; x < 48; ++x) {
                 const auto value = static_cast<std::uint8_t>(draw(x, y));
@@ -137,7 +139,7 @@ protected:
                 engine_.g_cur_v[y / 2 * engine_.g_stride_chroma + x / 2] = value;
             }
         }
-        engine_.g_mbQp = 12;  // rate weight 1
+        engine_.g_mbQp = qp;  // 12: rate weight 1
         engine_.g_mapMBNumber = mb;
         engine_.setMBOffsets();
         engine_.set_block_availability();
@@ -174,6 +176,83 @@ TEST_F(ModeSearch, KeepsThePredicted4x4Mode) {
     }
     start(0, [](int x, int y) { return 13 * x * y % 256; });
     EXPECT_EQ(engine_.learn4_mode(0, 2, pred), 2) << "no other candidate";
+}
+
+// The elimination mode by mode: a candidate that is dropped takes no further part.
+int plain_4x4_mode(const CEncoder& e, int k, int predicted) {
+    const std::uint8_t* src =
+        e.g_mb_src_y + 4 * zolt::luma_scan_j[k] * e.g_stride_luma + 4 * zolt::luma_scan_i[k];
+    const bool up = e.g_blk_up[k], left = e.g_blk_left[k];
+    std::uint8_t neighbours[16];
+    CEncoder::gather_neighbours4(neighbours, src, e.g_stride_luma, up, left, e.g_blk_up_right[k],
+                                 e.g_blk_up_left[k]);
+    int distortion[9][4];
+    for (int mode = 0; mode < 9; ++mode) {
+        std::uint8_t pred[16];
+        CEncoder::ipred4(pred, neighbours, up, left, mode);
+        for (int step = 0; step < 4; ++step) {
+            const auto d = [&](int x, int y) {
+                x += step % 2, y += step / 2;
+                return src[y * e.g_stride_luma + x] - pred[4 * y + x];
+            };
+            const int a = d(0, 0), b = d(2, 0), c = d(0, 2), f = d(2, 2);
+            distortion[mode][step] = std::abs(a + b + c + f) + std::abs(a - b + c - f) +
+                                     std::abs(a + b - c - f) + std::abs(a - b - c + f);
+        }
+    }
+    const int* p = distortion[predicted];
+    const int reference = p[0] + p[1] + p[2] + p[3];
+    if (reference <= 8 * e.g_intra_lambda + 64) {
+        return predicted;
+    }
+    constexpr double kFactors[3] = {2.0, 1.25, 1.0};
+    int best = predicted;
+    int best_cost = 4 * (reference / 4);
+    for (int mode = 0; mode < 9; ++mode) {
+        const bool needs_up = mode == 0 || mode == 3 || mode == 7;
+        const bool needs_left = mode == 1 || mode == 8;
+        const bool possible = mode == 2 || (needs_up ? up : needs_left ? left : up && left);
+        int cost = 0;
+        bool kept = possible && mode != predicted;
+        for (int step = 0; step < 4 && kept; ++step) {
+            cost += distortion[mode][step] + 2 * e.g_intra_lambda;
+            kept = step == 3 || !(cost > (step + 1) * (reference / 4) * kFactors[step]);
+        }
+        if (kept && cost < best_cost) {
+            best = mode;
+            best_cost = cost;
+        }
+    }
+    return best;
+}
+
+TEST_F(ModeSearch, Equals4x4EliminationModeByMode) {
+    zolt_test::Random random(4);
+    int changed = 0;
+    for (int iteration = 0; iteration < 600; ++iteration) {
+        const int slope_x = random.between(-20, 20), slope_y = random.between(-20, 20);
+        const int noise = 1 << random.between(0, 7);
+        constexpr int kQps[] = {0, 12, 28, 40, 51};
+        constexpr int kMacroblocks[] = {0, 1, 3, 4, 5};
+        start(
+            kMacroblocks[random.between(0, 4)],
+            [&](int x, int y) {
+                return std::clamp(128 + (slope_x * (x % 9) + slope_y * (y % 9)) / 2 +
+                                      random.between(-noise, noise),
+                                  0, 255);
+            },
+            kQps[random.between(0, 4)]);
+        for (int k = 0; k < 16; ++k) {
+            const bool up = engine_.g_blk_up[k], left = engine_.g_blk_left[k];
+            const int predicted = up && left ? random.between(0, 8) : 2;
+            alignas(16) std::uint8_t pred[16];
+            const int mode = engine_.learn4_mode(k, predicted, pred);
+            ASSERT_EQ(mode, plain_4x4_mode(engine_, k, predicted))
+                << "block " << k << ", predicted " << predicted << ", QP " << engine_.g_mbQp;
+            changed += mode != predicted;
+        }
+    }
+    EXPECT_GT(changed, 600 * 16 / 10) << "hardly any mode search was decided";
 }
 
 }  // namespace

@@ -7,6 +7,7 @@
 
 std::vector<std::string> FakeEngine::calls;
 std::vector<unsigned char> FakeEngine::frame;
+const void* FakeEngine::address = nullptr;
 int FakeEngine::alive = 0;
 
 std::string FakeEngine::take_calls() {
@@ -89,6 +90,7 @@ void CEncoder::encode_pps() {
 
 void CEncoder::encode_frame(const void* frame) {
     note("encode");
+    FakeEngine::address = frame;
     const auto* bytes = static_cast<const unsigned char*>(frame);
     FakeEngine::frame.assign(bytes, bytes + g_width * g_height * 3 / 2);
     g_nal_buf[0] = g_frame_counter % g_intra_period == 0 ? 0x65 : 0x41;

@@ -9,6 +9,7 @@
 struct FakeEngine {
     static std::vector<std::string> calls;    // "bit_rate 200000", "encode", ...
     static std::vector<unsigned char> frame;  // the picture that was last encoded
+    static const void* address;               // where it stood
     static int alive;                         // engines that exist
 
     // The calls since the last one of this, each with a blank behind it.

@@ -62,6 +62,25 @@ TEST_F(SessionTest, BuildsWhenBothConfigurationAndConsumerAreThere) {
     EXPECT_EQ(take_errors(), "");
 }
 
+TEST_F(SessionTest, CodesPicturesWhereTheyStandThatNeedNoConversion) {
+    const struct {
+        int width, height;
+        int format;
+        bool in_place;
+    } cases[] = {{48, 32, zolt::fourcc("IYUV"), true},
+                 {50, 32, zolt::fourcc("IYUV"), false},
+                 {48, 32, zolt::fourcc("YUY2"), false}};
+    for (const auto& c : cases) {
+        InputConfig other(c.width, c.height, 25.0, c.format);
+        session.PutStreamConfig(other.stream());
+        session.Connect(&consumer);
+        Frame frame(0, Bytes(50 * 40 * 2, 100));
+        session.PutSample(&frame);
+        EXPECT_EQ(FakeEngine::address == frame.GetSampleData(), c.in_place)
+            << "format " << c.format << ", width " << c.width;
+    }
+}
+
 TEST_F(SessionTest, DescribesItsOutputStream) {
     build();
     EXPECT_EQ(session.GetWidth(), 48);

@@ -15,8 +15,8 @@ constexpr int luma_part(int sample, int percent) {
 // these differences (0.89 and 0.7 to either side) fill that of a sample.
 constexpr int kStepPercentU = 178, kStepPercentV = 140;
 
-// 128 + difference / step, rounded to nearest (no quotient lies halfway) and clipped, to 0 whatever
-// way the division rounds negative quotients.
+// 128 + difference / step, rounded to nearest (no quotient lies halfway) and clipped. Negative
+// quotients become 0 whichever way they are rounded.
 constexpr int chroma(int difference, int step_percent) {
     const int rounded = (257 * step_percent + 200 * difference) / (2 * step_percent);
     return rounded < 0 ? 0 : rounded > 255 ? 255 : rounded;

@@ -1,7 +1,7 @@
 #pragma once
 
 // Deblocking filters over vectors of 16-bit lanes, one lane per line of the edge. Included by the
-// kernel files, each of which supplies a vector type V of its own with the operations used below.
+// SSE2 and AVX2 kernels, each of which supplies a vector type V with the operations used below.
 
 #include <cstddef>
 #include <cstdint>

@@ -78,8 +78,8 @@ void arrange_block(const uint8_t* src, ptrdiff_t stride, uint8_t* block) {
     }
 }
 
-// Adds up four vectors of 64-bit sums that are each below 2^14: sum n in 16-bit lane n of either
-// half of a lane.
+// Packs four vectors of 64-bit sums: sum n in 16-bit lane n of every 64 bits. They are below 2^14,
+// so that the four of a vector, added later, stay below 2^16.
 __m256i pack_sums(const __m256i* sums) {
     const __m256i pair = _mm256_or_si256(sums[0], _mm256_slli_epi64(sums[1], 16));
     return _mm256_or_si256(
@@ -589,7 +589,8 @@ __m128i two_rows_of_4(const uint8_t* p, ptrdiff_t stride) {
     return _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1));
 }
 
-// The forward transform of the rows or columns 0, 1 and 2, 3 of a block; the same of the transform.
+// Forward core transform across the rows or the columns of a block: v01 holds 0 and 1, v23 holds 2
+// and 3, before and after.
 void forward_butterfly(__m128i* v01, __m128i* v23) {
     const __m128i v32 = _mm_shuffle_epi32(*v23, _MM_SHUFFLE(1, 0, 3, 2));
     const __m128i st = _mm_add_epi16(*v01, v32);  // 0 + 3, 1 + 2

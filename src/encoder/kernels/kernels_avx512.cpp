@@ -128,8 +128,8 @@ __m512i sad_of_average(const Checkerboard& block, const Checkerboard& a, const C
                             _mm512_sad_epu8(block.second, _mm512_avg_epu8(a.second, b.second)));
 }
 
-// Adds up four vectors of 64-bit sums that are each below 2^13: sum n in 16-bit lane n of either
-// half of a lane.
+// Packs four vectors of 64-bit sums: sum n in 16-bit lane n of every 64 bits. They are below 2^13,
+// so that the eight of a vector, added later, stay below 2^16.
 __m512i pack_sums(const __m512i* sums) {
     return _mm512_or_si512(
         _mm512_or_si512(sums[0], _mm512_slli_epi64(sums[1], 16)),

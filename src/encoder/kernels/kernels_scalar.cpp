@@ -24,7 +24,8 @@ uint8_t clip_sample(int value) {
 
 // ---- Distortion of the motion search ----
 
-// Row 0..7 of the two halves of an arranged block, and where it stands there.
+// Where a row stands among the `rows` of an arranged block, in which those of the upper and of the
+// lower half alternate.
 constexpr int arranged_position(int row, int rows) {
     return 2 * (row % (rows / 2)) + row / (rows / 2);
 }

@@ -853,7 +853,8 @@ void transpose_8x8(const uint8_t* src, ptrdiff_t src_stride, uint8_t* dst, ptrdi
     }
 }
 
-// Runs filter on the rows around a horizontal edge: samples each side, first q sample at pix.
+// Runs filter on the rows around a horizontal edge: `side` samples on each side, first q sample at
+// pix.
 template <typename Filter>
 void filter_rows(uint8_t* pix, ptrdiff_t stride, int side, Filter filter) {
     uint8_t* rows[8];

@@ -2,7 +2,8 @@
 
 #include "encoder/kernels/Kernels.h"
 
-// The tables of x86 processors: each the one given with the entries replaced that are faster.
+// The tables of x86 processors: each takes a table and replaces the entries that it has faster
+// functions for.
 namespace zolt {
 
 Kernels with_sse2(const Kernels& base);
