@@ -143,6 +143,8 @@ uint32_t below_limits(const __m256i* sums, const int32_t* limits) {
         _mm256_movemask_ps(_mm256_castsi256_ps(_mm256_cmpgt_epi32(load_32(limits), totals))));
 }
 
+// The sums below are cleared one by one: g++ 12 keeps an array that `= {}` clears in memory.
+
 uint32_t first_phases_below_x4(const uint8_t* block, const uint8_t* const* refs, ptrdiff_t stride,
                                const int32_t* limits) {
     __m256i sums[4] = {_mm256_setzero_si256(), _mm256_setzero_si256(), _mm256_setzero_si256(),
