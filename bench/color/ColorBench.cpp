@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "color/ColorConverter.h"
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 // Time to convert a 1280x720 picture of every source format to IYUV: by the kernels of every table
 // ("format/table"), and by the converter with its own table ("format/converter").

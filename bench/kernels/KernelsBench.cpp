@@ -6,8 +6,8 @@
 #include <random>
 #include <string>
 
-#include "encoder/kernels/Kernels.h"
 #include "encoder/tables.h"
+#include "kernels/Kernels.h"
 
 // Time of one call of every kernel of the engine, by table ("name/table"), on data in the cache.
 // Strides and alignments are those of a 1280x720 session; references of the motion search are

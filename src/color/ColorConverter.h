@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 #include "media/fourcc.h"
 
 namespace zolt {

@@ -4,7 +4,7 @@
 #include <cstdint>
 
 #include "encoder/AlignedBuffer.h"
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 // Values of slice_type that the engine writes (ITU-T H.264 Table 7-6).
 enum SliceType : std::uint8_t { P_SLICE = 0, I_SLICE = 2 };

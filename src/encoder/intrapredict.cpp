@@ -2,7 +2,7 @@
 #include <cstring>
 
 #include "encoder/CEncoder.h"
-#include "encoder/kernels/predict_4x4.h"
+#include "kernels/predict_4x4.h"
 
 namespace {
 

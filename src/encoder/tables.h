@@ -2,7 +2,7 @@
 
 #include <cstdint>
 
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 // Constant tables that more than one unit of the engine reads.
 namespace zolt {

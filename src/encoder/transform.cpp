@@ -3,8 +3,8 @@
 
 #include "encoder/CEncoder.h"
 #include "encoder/bitops.h"
-#include "encoder/kernels/zigzag.h"
 #include "encoder/tables.h"
+#include "kernels/zigzag.h"
 
 namespace {
 

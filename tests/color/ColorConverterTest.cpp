@@ -12,7 +12,7 @@
 #include "HostErrors.h"
 #include "ReferenceConverter.h"
 #include "color/color_tables.h"
-#include "encoder/kernels/color_rules.h"
+#include "kernels/color_rules.h"
 #include "support/Util.h"
 
 namespace {

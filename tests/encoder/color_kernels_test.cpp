@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "common/Random.h"
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 namespace {
 

@@ -11,8 +11,8 @@
 #include <vector>
 
 #include "common/Random.h"
-#include "encoder/kernels/Kernels.h"
 #include "encoder/tables.h"
+#include "kernels/Kernels.h"
 
 namespace {
 

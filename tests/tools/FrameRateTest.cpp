@@ -1,10 +1,10 @@
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 #include <gtest/gtest.h>
 
-#include "common/PictureFormat.h"
-#include "common/SyntheticSource.h"
-#include "common/ToolError.h"
+#include "io/PictureFormat.h"
+#include "io/SyntheticSource.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 namespace {

@@ -1,4 +1,4 @@
-#include "common/Y4mReader.h"
+#include "io/Y4mReader.h"
 
 #include <gtest/gtest.h>
 #include <unistd.h>
@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 namespace {

@@ -2,7 +2,7 @@
 
 #include <CLI/CLI.hpp>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 

@@ -3,7 +3,7 @@
 #include <optional>
 #include <string>
 
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 namespace zolt {
 

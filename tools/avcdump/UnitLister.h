@@ -5,7 +5,7 @@
 
 #include "avcdump/ParameterSets.h"
 #include "avcdump/SliceHeader.h"
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 namespace zolt {
 

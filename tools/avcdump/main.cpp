@@ -14,8 +14,8 @@
 #include "avcdump/Options.h"
 #include "avcdump/RowFormat.h"
 #include "avcdump/UnitLister.h"
-#include "common/ByteReader.h"
-#include "common/ToolError.h"
+#include "io/ByteReader.h"
+#include "io/ToolError.h"
 
 namespace {
 

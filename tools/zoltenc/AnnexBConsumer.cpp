@@ -3,7 +3,7 @@
 #include <exception>
 #include <utility>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 #include "media/IConfigVideoAvc.h"
 #include "media/ISample.h"
 #include "media/ISampleStreamConfig.h"

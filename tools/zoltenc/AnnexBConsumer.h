@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "common/OutputFile.h"
+#include "io/OutputFile.h"
 #include "media/ISampleConsumer.h"
 
 class IConfigVideoAvc;

@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "common/RawReader.h"
-#include "common/StopSignal.h"
-#include "common/ToolError.h"
+#include "io/RawReader.h"
+#include "io/StopSignal.h"
+#include "io/ToolError.h"
 #include "media/IConfigVideoAvc.h"
 #include "zoltenc/EncoderLibrary.h"
 #include "zoltenc/EncoderSession.h"

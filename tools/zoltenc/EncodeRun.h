@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "common/FrameSource.h"
-#include "common/OutputFile.h"
+#include "io/FrameSource.h"
+#include "io/OutputFile.h"
 #include "zoltenc/AnnexBConsumer.h"
 #include "zoltenc/Options.h"
 #include "zoltenc/PictureStats.h"

@@ -2,7 +2,7 @@
 
 #include <dlfcn.h>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 #include "media/IMediaEncoder.h"
 #include "media/MediaType.h"
 

@@ -1,6 +1,6 @@
 #include "zoltenc/EncoderSession.h"
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
 #include "media/MediaType.h"

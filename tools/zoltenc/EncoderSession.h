@@ -4,8 +4,8 @@
 #include <memory>
 #include <vector>
 
-#include "common/FrameRate.h"
-#include "common/PictureFormat.h"
+#include "io/FrameRate.h"
+#include "io/PictureFormat.h"
 #include "media/IConfigVideoUncompressed.h"
 #include "media/MediaSample.h"
 #include "media/MediaStreamConfig.h"

@@ -4,9 +4,9 @@
 #include <iostream>
 #include <limits>
 
-#include "common/SyntheticSource.h"
-#include "common/ToolError.h"
-#include "common/numbers.h"
+#include "io/SyntheticSource.h"
+#include "io/ToolError.h"
+#include "io/numbers.h"
 
 namespace zolt {
 namespace {

@@ -5,7 +5,7 @@
 #include <string>
 
 #include "avcdump/ParameterSets.h"
-#include "common/OutputFile.h"
+#include "io/OutputFile.h"
 
 class IConfigVideoAvc;
 

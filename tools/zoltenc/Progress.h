@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 namespace zolt {
 

@@ -7,8 +7,8 @@
 #include <exception>
 #include <optional>
 
-#include "common/StopSignal.h"
-#include "common/ToolError.h"
+#include "io/StopSignal.h"
+#include "io/ToolError.h"
 #include "zoltenc/EncodeRun.h"
 #include "zoltenc/Options.h"
 

@@ -2,10 +2,10 @@
 
 #include <utility>
 
-#include "common/RawReader.h"
-#include "common/SyntheticSource.h"
-#include "common/ToolError.h"
-#include "common/Y4mReader.h"
+#include "io/RawReader.h"
+#include "io/SyntheticSource.h"
+#include "io/ToolError.h"
+#include "io/Y4mReader.h"
 
 namespace zolt {
 

@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "common/FrameSource.h"
+#include "io/FrameSource.h"
 #include "zoltenc/Options.h"
 
 namespace zolt {

@@ -1,9 +1,9 @@
-#include "common/SyntheticSource.h"
+#include "io/SyntheticSource.h"
 
 #include <algorithm>
 
-#include "common/ToolError.h"
-#include "common/numbers.h"
+#include "io/ToolError.h"
+#include "io/numbers.h"
 
 namespace zolt {
 namespace {

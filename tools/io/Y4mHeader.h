@@ -4,7 +4,7 @@
 #include <string>
 #include <string_view>
 
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 namespace zolt {
 

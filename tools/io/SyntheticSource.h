@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "common/FrameSource.h"
+#include "io/FrameSource.h"
 
 namespace zolt {
 

@@ -4,8 +4,8 @@
 #include <optional>
 #include <string>
 
-#include "common/FrameRate.h"
-#include "common/PictureFormat.h"
+#include "io/FrameRate.h"
+#include "io/PictureFormat.h"
 
 namespace zolt {
 

@@ -2,10 +2,10 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "encoder/kernels/Kernels.h"
-#include "encoder/kernels/color_scalar.h"
-#include "encoder/kernels/predict_4x4.h"
-#include "encoder/kernels/zigzag.h"
+#include "kernels/Kernels.h"
+#include "kernels/color_scalar.h"
+#include "kernels/predict_4x4.h"
+#include "kernels/zigzag.h"
 
 namespace zolt {
 namespace {

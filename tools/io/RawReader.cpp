@@ -1,8 +1,8 @@
-#include "common/RawReader.h"
+#include "io/RawReader.h"
 
 #include <utility>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 

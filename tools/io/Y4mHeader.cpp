@@ -1,10 +1,10 @@
-#include "common/Y4mHeader.h"
+#include "io/Y4mHeader.h"
 
 #include <algorithm>
 
-#include "common/PictureFormat.h"
-#include "common/ToolError.h"
-#include "common/numbers.h"
+#include "io/PictureFormat.h"
+#include "io/ToolError.h"
+#include "io/numbers.h"
 
 namespace zolt {
 namespace {

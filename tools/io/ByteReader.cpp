@@ -1,4 +1,4 @@
-#include "common/ByteReader.h"
+#include "io/ByteReader.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -9,8 +9,8 @@
 #include <cstring>
 #include <utility>
 
-#include "common/StopSignal.h"
-#include "common/ToolError.h"
+#include "io/StopSignal.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 

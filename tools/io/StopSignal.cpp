@@ -1,4 +1,4 @@
-#include "common/StopSignal.h"
+#include "io/StopSignal.h"
 
 #include <signal.h>
 

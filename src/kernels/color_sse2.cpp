@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <cstring>
 
-#include "encoder/kernels/color_rules.h"
-#include "encoder/kernels/color_scalar.h"
-#include "encoder/kernels/x86_tables.h"
+#include "kernels/color_rules.h"
+#include "kernels/color_scalar.h"
+#include "kernels/x86_tables.h"
 
 namespace zolt {
 namespace {

@@ -2,8 +2,8 @@
 // that other files share is emitted with instructions that an older processor lacks.
 #include <immintrin.h>
 
-#include "encoder/kernels/deblock_simd.h"
-#include "encoder/kernels/x86_tables.h"
+#include "kernels/deblock_simd.h"
+#include "kernels/x86_tables.h"
 
 namespace zolt {
 namespace {

@@ -1,8 +1,8 @@
 #pragma once
 
-#include "common/ByteReader.h"
-#include "common/FrameSource.h"
-#include "common/Y4mHeader.h"
+#include "io/ByteReader.h"
+#include "io/FrameSource.h"
+#include "io/Y4mHeader.h"
 
 namespace zolt {
 

@@ -3,9 +3,9 @@
 // of color_rules.h are evaluated at compile time only.
 #include <immintrin.h>
 
-#include "encoder/kernels/color_rules.h"
-#include "encoder/kernels/color_scalar.h"
-#include "encoder/kernels/x86_tables.h"
+#include "kernels/color_rules.h"
+#include "kernels/color_scalar.h"
+#include "kernels/x86_tables.h"
 
 namespace zolt {
 namespace {

@@ -1,8 +1,8 @@
-#include "common/Y4mReader.h"
+#include "io/Y4mReader.h"
 
 #include <utility>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 namespace {

@@ -1,8 +1,8 @@
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 #if defined(__x86_64__) || defined(__i386__)
 #define ZOLT_X86 1
-#include "encoder/kernels/x86_tables.h"
+#include "kernels/x86_tables.h"
 #endif
 
 namespace zolt {

@@ -1,6 +1,6 @@
-#include "encoder/kernels/color_scalar.h"
+#include "kernels/color_scalar.h"
 
-#include "encoder/kernels/color_rules.h"
+#include "kernels/color_rules.h"
 
 namespace zolt {
 namespace {

@@ -4,8 +4,8 @@
 // those whose time is that of loading their candidates, 16 samples at a time.
 #include <immintrin.h>
 
-#include "encoder/kernels/x86_tables.h"
-#include "encoder/kernels/zigzag.h"
+#include "kernels/x86_tables.h"
+#include "kernels/zigzag.h"
 
 namespace zolt {
 namespace {

@@ -1,4 +1,4 @@
-#include "common/PictureFormat.h"
+#include "io/PictureFormat.h"
 
 #include <algorithm>
 #include <cctype>

@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "common/ByteReader.h"
+#include "io/ByteReader.h"
 #include "media/fourcc.h"
 
 namespace zolt {

@@ -1,10 +1,10 @@
-#include "common/FrameRate.h"
+#include "io/FrameRate.h"
 
 #include <algorithm>
 #include <limits>
 #include <numeric>
 
-#include "common/numbers.h"
+#include "io/numbers.h"
 
 namespace zolt {
 namespace {

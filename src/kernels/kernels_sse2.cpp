@@ -3,10 +3,10 @@
 #include <cstring>
 #include <initializer_list>
 
-#include "encoder/kernels/deblock_simd.h"
-#include "encoder/kernels/predict_4x4.h"
-#include "encoder/kernels/x86_tables.h"
-#include "encoder/kernels/zigzag.h"
+#include "kernels/deblock_simd.h"
+#include "kernels/predict_4x4.h"
+#include "kernels/x86_tables.h"
+#include "kernels/zigzag.h"
 
 namespace zolt {
 namespace {

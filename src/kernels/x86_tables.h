@@ -1,6 +1,6 @@
 #pragma once
 
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 // The tables of x86 processors: each takes a table and replaces the entries that it has faster
 // functions for.

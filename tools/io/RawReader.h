@@ -1,7 +1,7 @@
 #pragma once
 
-#include "common/ByteReader.h"
-#include "common/FrameSource.h"
+#include "io/ByteReader.h"
+#include "io/FrameSource.h"
 
 namespace zolt {
 

@@ -1,4 +1,4 @@
-#include "common/OutputFile.h"
+#include "io/OutputFile.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -9,7 +9,7 @@
 #include <filesystem>
 #include <set>
 
-#include "common/ToolError.h"
+#include "io/ToolError.h"
 
 namespace zolt {
 namespace {

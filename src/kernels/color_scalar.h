@@ -1,6 +1,6 @@
 #pragma once
 
-#include "encoder/kernels/Kernels.h"
+#include "kernels/Kernels.h"
 
 // The colour conversions of the scalar table, for the tables that leave narrow rows to them too.
 namespace zolt {
