@@ -97,7 +97,8 @@ struct frame_buffer_t {
 // A state that the engine cannot go on from ends the process: exitOnError().
 class CEncoder {
 public:
-    // width, height: luma samples, at least 16 each (else exitOnError, status -1). Sizes that are
+    // width, height: luma samples, from 16 to 16880 each, at most 139264 macroblocks in all (else
+    // exitOnError, status -1). Sizes that are
     // not multiples of 16 are accepted; the picture coded is the top left part of the size rounded
     // down. kernels: the table of sample loops to use, borrowed; null: the fastest of this
     // processor.
@@ -157,8 +158,9 @@ public:
 
     // ---- bits: bit writer, NAL units, parameter sets ----
     // Writes the low `length` (1..kMaxWrite) bits of value, most significant first; the other bits
-    // of value must be 0. Clears the bits that follow up to the eighth byte.
-    static constexpr int kMaxWrite = 57;
+    // of value must be 0. Clears at least the bit that follows and the rest of its byte, which is
+    // what the next write builds on.
+    static constexpr int kMaxWrite = 56;
     void write_bits(std::uint64_t value, int length) {
         std::uint8_t* byte = g_nal_buf + (g_nal_bitpos >> 3);
         const std::uint64_t window =
@@ -187,6 +189,9 @@ public:
     void UpdateFrameLevelRateControl();
     void SetMADParameter();
     void SetRDQParameter();
+    void start_rate_control();
+    unsigned pictures_left() const;
+    int bit_budget(unsigned pictures) const;
     void choose_qp_I();
     void choose_qp_P();
     void fit_rate_model(int first, int window, const bool* rejected, int n);
@@ -325,8 +330,8 @@ public:
     std::uint8_t g_pic_type = 0;        // I_SLICE or P_SLICE
     std::uint8_t g_idr_flag = 0;        // 1: IDR picture
     int g_gop_pos = 0;                  // frame counter mod intra period
-    int g_frame_num = -1;               // frame_num before reduction to 16 bits
-    int g_poc = 0;                      // pictures since the last IDR picture
+    int g_frame_num = -1;               // frame_num, 16 bits
+    int g_poc = 0;                      // pictures since the last IDR picture, 16 bits
     int g_coded_frames = 0;             // pictures coded since initialize_encoder
     int g_mbQp = 10;                    // QP of the current picture, 0..51
     int g_mapMBNumber = 0;              // address of the current macroblock, raster order
@@ -463,7 +468,9 @@ public:
     std::uint32_t bs_hor[4] = {};
 
     // ---- Rate control ----
-    bool g_rc_initialized = false;            // InitRateControl has run since initialize_encoder
+    bool g_rc_initialized = false;  // InitRateControl has run since initialize_encoder
+    // Intra period of the previous picture in frames; 0: it was not coded under rate control.
+    unsigned g_rc_period = 0;
     unsigned g_rc_target_rate = 200000;       // bit/s
     double g_rc_frame_rate = 25.0;            // frames/s of the per-picture budget
     double g_rc_bpp = 0;                      // bits per pixel

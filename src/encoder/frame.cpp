@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <cstring>
+#include <limits>
 
 #include "encoder/CEncoder.h"
 
@@ -22,6 +23,10 @@ void copy_plane(std::uint8_t* dst, std::ptrdiff_t dst_stride, const std::uint8_t
     for (int y = 0; y < height; ++y) {
         std::memcpy(dst + y * dst_stride, src + y * src_stride, static_cast<std::size_t>(width));
     }
+}
+
+int next_in_16_bits(int count) {
+    return (count + 1) & 0xffff;
 }
 
 }  // namespace
@@ -75,6 +80,7 @@ void CEncoder::initialize_encoder() {
 
     g_prev_idr = 0;
     g_rc_initialized = false;
+    g_rc_period = 0;
     g_inter_period = 1;
     g_coded_frames = 0;
     g_frame_num = -1;
@@ -100,8 +106,8 @@ void CEncoder::encode_frame(const void* frame) {
         g_poc = 0;
         doFrameI();
     } else {
-        ++g_frame_num;
-        ++g_poc;
+        g_frame_num = next_in_16_bits(g_frame_num);
+        g_poc = next_in_16_bits(g_poc);
         doFrameP();
     }
     g_frame.data = nullptr;
@@ -168,10 +174,11 @@ void CEncoder::code_picture() {
     if (g_rc_enable) {
         UpdateFrameLevelRateControl();
     } else {
+        g_rc_period = 0;
         g_mbQp = picture_qp;
     }
     manageRefBuffers();
-    ++g_coded_frames;
+    g_coded_frames = std::min(g_coded_frames, std::numeric_limits<int>::max() - 1) + 1;
 }
 
 // slice_data(), clause 7.3.4, and deblocking. Works in macroblock rows so that what a row needs is
@@ -221,12 +228,12 @@ void CEncoder::writeSliceHeader() {
     write_uvlc_unsigned(0);  // first_mb_in_slice
     write_uvlc_unsigned(g_slp->sliceType);
     write_uvlc_unsigned(g_slp->ppsId);
-    write_bits(static_cast<unsigned>(g_frame_num) & 0xffff,
+    write_bits(static_cast<unsigned>(g_frame_num),
                static_cast<int>(g_sps->log2_max_frame_num_minus4) + 4);
     if (g_idr_flag) {
         write_uvlc_unsigned(g_slp->idr_pic_id);
     }
-    write_bits(static_cast<unsigned>(g_poc) & 0xffff,
+    write_bits(static_cast<unsigned>(g_poc),
                static_cast<int>(g_sps->log2_max_pic_order_cnt_lsb_minus4) + 4);
     if (g_slp->sliceType == P_SLICE) {
         write_bits(0, 1);  // num_ref_idx_active_override_flag

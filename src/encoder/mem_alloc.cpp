@@ -23,6 +23,23 @@ constexpr std::size_t size(int count) {
 // Room behind the NAL buffer and the planes for accesses wider than the last element.
 constexpr std::size_t kSlack = 64;
 
+// The largest picture that any level allows, and its longest side: sqrt(8 * MaxFS) macroblocks
+// (Table A-1, clause A.3.1).
+constexpr int kMaxMacroblocks = 139264;
+constexpr int kMaxSide = 16880;
+
+// Ends the process unless a picture of this size can be coded; returns the width.
+int checked_width(int width, int height) {
+    if (width < 16 || height < 16) {
+        CEncoder::exitOnError("Picture size must be at least 16x16", -1);
+    }
+    if (width > kMaxSide || height > kMaxSide || (width / 16) * (height / 16) > kMaxMacroblocks) {
+        CEncoder::exitOnError(
+            "Picture size must be at most 139264 macroblocks and 16880 samples a side", -1);
+    }
+    return width;
+}
+
 // Keeps bit positions inside 31 bits, whatever the picture size.
 constexpr std::int64_t kMaxNalBytes = 1 << 27;
 
@@ -30,7 +47,7 @@ constexpr std::int64_t kMaxNalBytes = 1 << 27;
 
 CEncoder::CEncoder(int width, int height, const zolt::Kernels* kernels)
     : g_kernels(kernels ? kernels : &zolt::best_kernels()),
-      g_width(width),
+      g_width(checked_width(width, height)),
       g_height(height),
       g_mb_width(width / 16),
       g_mb_height(height / 16),
@@ -41,9 +58,6 @@ CEncoder::CEncoder(int width, int height, const zolt::Kernels* kernels)
       g_num_mbs(g_mb_width * g_mb_height),
       g_blk_width(g_width16 / 4),
       g_blk_height(g_height16 / 4) {
-    if (width < 16 || height < 16) {
-        exitOnError("Picture size must be at least 16x16", -1);
-    }
     initDiamond(16, 1, 1);
     allocate_memory();
 }

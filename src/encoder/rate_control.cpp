@@ -55,6 +55,16 @@ int saturate(std::int64_t value) {
                                                      std::numeric_limits<int>::max()));
 }
 
+void increment(int& count) {
+    count = saturate(std::int64_t{count} + 1);
+}
+
+// How far QPs may drift from the I picture's in intra periods of so many frames.
+std::int16_t qp_range(unsigned intra_period) {
+    return static_cast<std::int16_t>(
+        std::clamp(intra_period / 10 + 2, 3u, unsigned{std::numeric_limits<std::int16_t>::max()}));
+}
+
 }  // namespace
 
 void CEncoder::InitRateControl() {
@@ -97,7 +107,7 @@ void CEncoder::InitRateControl() {
     g_rc_upper = g_rc_max_cpb;
     g_rc_lower = 0;
     g_rc_target_level = g_rc_max_cpb / 2;
-    g_rc_qp_range = static_cast<std::int16_t>(std::max(3u, g_intra_period / 10 + 2));
+    g_rc_qp_range = qp_range(g_intra_period);
     g_rc_buffer = 0;
     g_rc_remaining_bits = 0;
     g_rc_prev_bits = 0;
@@ -120,23 +130,54 @@ void CEncoder::UpdateRateControlFrameRate(double fps) {
 
 // Chooses g_mbQp of the picture about to be coded.
 void CEncoder::FrameLevelRateControl() {
-    if (!g_rc_initialized) {  // switched on in mid-stream
-        InitRateControl();
-        g_rc_buffer = g_rc_target_level;
-        g_rc_prev_qp = g_mbQp;
-        g_rc_i_qp = static_cast<std::int16_t>(g_mbQp);
+    const bool inter = g_pic_type == P_SLICE;
+    if (g_rc_period == 0) {
+        start_rate_control();
+    } else if (g_rc_period != g_intra_period) {
+        g_rc_qp_range = qp_range(g_intra_period);
+        if (inter) {
+            g_rc_i_qp = static_cast<std::int16_t>(g_rc_prev_qp);
+        }
     }
-    if (g_pic_type == I_SLICE) {
-        choose_qp_I();
-    } else {
+    if (inter) {
         choose_qp_P();
+    } else {
+        choose_qp_I();
     }
 }
 
+// Puts the controller into its first state where the picture before was not coded under it.
+void CEncoder::start_rate_control() {
+    if (g_coded_frames == 0) {
+        if (!g_rc_initialized) {
+            InitRateControl();
+        }
+        return;
+    }
+    InitRateControl();
+    g_rc_buffer = g_rc_target_level;
+    g_rc_prev_qp = g_mbQp;
+    g_rc_i_qp = static_cast<std::int16_t>(g_mbQp);
+}
+
+// Pictures of the intra period that are not coded yet, the coming one included.
+unsigned CEncoder::pictures_left() const {
+    return g_intra_period - static_cast<unsigned>(g_gop_pos);
+}
+
+// The bits of so many pictures, less what the buffer holds above its target.
+int CEncoder::bit_budget(unsigned pictures) const {
+    return truncate(g_rc_target_rate / g_rc_frame_rate * pictures -
+                    (g_rc_buffer - g_rc_target_level));
+}
+
 void CEncoder::choose_qp_I() {
+    // The first intra period is as long as it was when the controller was initialised.
+    unsigned pictures = pictures_left();
     int qp;
     if (g_coded_frames == 0) {
         g_rc_buffer = g_rc_target_level;
+        pictures = static_cast<unsigned>(g_rc_gop_len);
         if (g_qp >= 1) {
             qp = g_qp;
         } else {
@@ -151,8 +192,7 @@ void CEncoder::choose_qp_I() {
         }
         qp = std::clamp(qp, kMinQp, kMaxQp);
     }
-    g_rc_remaining_bits = truncate(g_rc_target_rate / g_rc_frame_rate * g_rc_gop_len -
-                                   (g_rc_buffer - g_rc_target_level));
+    g_rc_remaining_bits = bit_budget(pictures);
     g_rc_prev_qp = qp;
     g_rc_i_qp = static_cast<std::int16_t>(qp);
     g_rc_coded_p = g_rc_coded_b = 0;
@@ -163,21 +203,23 @@ void CEncoder::choose_qp_I() {
 }
 
 void CEncoder::choose_qp_P() {
-    g_rc_remaining_bits = saturate(std::int64_t{g_rc_remaining_bits} - g_rc_prev_bits);
-    ++g_rc_coded_p;
-    ++g_rc_np;
-    ++g_rc_gop_len;
+    // A start and a change of the intra period make a new budget; at a start the buffer is at its
+    // target.
+    g_rc_remaining_bits = g_rc_period == g_intra_period
+                              ? saturate(std::int64_t{g_rc_remaining_bits} - g_rc_prev_bits)
+                              : bit_budget(pictures_left());
+    increment(g_rc_coded_p);
+    increment(g_rc_np);
+    increment(g_rc_gop_len);
     if (g_rc_first_p) {
         return;  // the I picture's QP
     }
 
     const int from_buffer = truncate((g_rc_target_level - g_rc_buffer) * g_rc_gamma +
                                      g_rc_target_rate / g_rc_frame_rate + 0.5);
-    const int pictures_left =
-        static_cast<int>(std::max<std::int64_t>(std::int64_t{g_intra_period} - g_rc_coded_p, 1));
     const int from_budget =
         truncate(g_rc_remaining_bits * g_rc_xp /
-                 ((g_rc_nb - g_rc_coded_b) * g_rc_xb + g_rc_xp * pictures_left + 1.0));
+                 ((g_rc_nb - g_rc_coded_b) * g_rc_xb + g_rc_xp * pictures_left() + 1.0));
     int target = truncate(g_rc_beta * from_budget + (1 - g_rc_beta) * from_buffer);
     target = std::max(std::min(target, g_rc_upper), g_rc_lower);
     g_rc_target_bits = target;
@@ -213,6 +255,7 @@ void CEncoder::choose_qp_P() {
 void CEncoder::UpdateFrameLevelRateControl() {
     const int bits = static_cast<int>(g_slice_bits);
     const int qp = g_mbQp;
+    g_rc_period = g_intra_period;
     g_rc_prev_bits = bits;
     g_rc_buffer = truncate(std::int64_t{g_rc_buffer} + bits - g_rc_target_rate / g_rc_frame_rate);
     g_rc_buffer = std::min(std::max(g_rc_buffer, 0), g_rc_max_cpb);

@@ -61,6 +61,27 @@ TEST(Bits, FieldsAndExpGolombCodesReadBack) {
               engine.g_nal_buf_size);
 }
 
+// Nothing but what was written counts, whatever stood in the buffer.
+TEST(Bits, WritesOverOldContent) {
+    CEncoder engine(16, 16);
+    for (int position = 0; position < 8; ++position) {
+        for (int length = 1; length <= CEncoder::kMaxWrite; ++length) {
+            std::fill(engine.g_nal_buf, engine.g_nal_buf + 32, std::uint8_t{0xff});
+            engine.g_nal_buf[0] = 0;
+            engine.g_nal_bitpos = static_cast<unsigned>(position);
+            engine.write_bits(0, length);
+            engine.write_bits(0, 9);
+            engine.write_bits(1, 1);
+            BitReader reader(engine.g_nal_buf, 32);
+            ASSERT_EQ(reader.u(position), 0u);
+            for (int i = 0; i < length + 9; ++i) {
+                ASSERT_EQ(reader.u(1), 0u) << "bit " << i << " of " << length << " at " << position;
+            }
+            ASSERT_EQ(reader.u(1), 1u);
+        }
+    }
+}
+
 TEST(Bits, LengthsOfExpGolombCodes) {
     CEncoder engine(16, 16);
     const auto length = [&](unsigned v) {

@@ -66,6 +66,11 @@ TEST(EngineDeath, StatesThatEndTheProcess) {
     const auto exits = [](int status) { return testing::ExitedWithCode(status & 255); };
     EXPECT_EXIT(CEncoder(15, 16), exits(-1), "^Picture size must be at least 16x16\n$");
     EXPECT_EXIT(CEncoder(16, 15), exits(-1), "^Picture size must be at least 16x16\n$");
+    const char* too_large =
+        "^Picture size must be at most 139264 macroblocks and 16880 samples a side\n$";
+    EXPECT_EXIT(CEncoder(16, 53687040), exits(-1), too_large);
+    EXPECT_EXIT(CEncoder(16881, 16), exits(-1), too_large);
+    EXPECT_EXIT(CEncoder(5984, 5968), exits(-1), too_large);  // 374 x 373 macroblocks
     EXPECT_EXIT(CEncoder::memError("a plane"), exits(106),
                 "^Memory allocation failed for: a plane\n$");
 

@@ -5,12 +5,15 @@
 #include <limits>
 #include <vector>
 
+#include "common/Encoding.h"
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
 
 namespace {
 
+using zolt_test::Encoding;
+using zolt_test::generated;
 using zolt_test::Random;
+using zolt_test::Sequence;
 
 TEST(RateControl, QuantiserSteps) {
     for (int qp = 0; qp <= 51; ++qp) {
@@ -94,6 +97,270 @@ TEST(RateControl, KeepsItsLimits) {
             EXPECT_GE(engine.g_rc_buffer, 0);
             EXPECT_LE(engine.g_rc_buffer, engine.g_rc_max_cpb);
         }
+    }
+}
+
+// ---- Settings that change ----
+
+// A second controller beside the engine's: what it must hold after every picture, worked out from
+// the settings and from the coded pictures. The fitted models are the engine's own.
+struct Controller {
+    int rate = 0;  // bit/s, 0: off
+    double frame_rate = 30;
+    int period = 30, old_period = 0;  // old: of the picture before, 0 where it was not controlled
+    bool initialized = false;
+    int pictures = 0;  // since the start of the stream
+    int first_length = 0;
+    int range = 0, i_qp = 0, qp = 28, buffer = 0, level = 0, bits = 0, target = 0;
+    double remaining = 0, xp = 0;
+    bool first_p = true;
+
+    void initialize() {
+        initialized = true;
+        first_length = period;
+        range = std::min(std::max(3, period / 10 + 2), 32767);
+        i_qp = buffer = bits = target = 0;
+        level = 2000000;
+        remaining = xp = 0;
+        first_p = true;
+    }
+    static double in_int(double value) {
+        return std::min(std::max(std::trunc(value), -2147483648.0), 2147483647.0);
+    }
+    double budget(int count) const { return in_int(rate / frame_rate * count - (buffer - level)); }
+    // The QP of the coming picture; x1, x2, mad: the engine's models before it.
+    void choose(bool intra, double x1, double x2, double mad) {
+        const int left = period - pictures % period;
+        const bool starts = old_period == 0, changes = !starts && old_period != period;
+        if (starts && (pictures > 0 || !initialized)) {
+            initialize();
+            buffer = level;
+            i_qp = qp;
+        }
+        if (changes) {
+            range = std::min(std::max(3, period / 10 + 2), 32767);
+        }
+        if (intra) {
+            if (pictures == 0) {
+                buffer = level;
+                remaining = budget(first_length);
+            } else {
+                const int step = buffer < 2400000 ? -1 : buffer > 3200000 ? 1 : 0;
+                qp = std::min(std::max(qp + step, 18), 45);
+                remaining = budget(left);
+            }
+            i_qp = qp;
+            return;
+        }
+        if (changes) {
+            i_qp = qp;
+        }
+        remaining = starts || changes ? budget(left) : in_int(remaining - bits);
+        if (first_p) {
+            return;
+        }
+        const double t1 = std::trunc((level - buffer) * 0.5 + rate / frame_rate + 0.5);
+        const double t2 = in_int(remaining * xp / (xp * left + 1.0));
+        target = static_cast<int>(std::min(std::max(std::trunc(0.5 * t2 + 0.5 * t1), 0.0), 4e6));
+        int next = 51;
+        if (target >= 1) {
+            const double d = x1 * x1 * (mad * mad) + 4 * x2 * mad * target;
+            const bool linear = d < 0 || x1 * mad + d <= 0;
+            next = CEncoder::Qstep2QP(linear ? x1 * mad / target
+                                             : (x1 * mad + std::sqrt(d)) / (2.0 * target));
+        }
+        next = std::min(std::max(next, qp - 2), qp + 2);
+        next = std::min(std::max(next, i_qp - 2 * range), i_qp + range);
+        qp = std::min(std::max(next, 18), 45);
+    }
+    void coded(bool intra, int picture_bits) {
+        ++pictures;
+        old_period = rate > 0 ? period : 0;
+        if (rate == 0) {
+            return;
+        }
+        bits = picture_bits;
+        buffer = static_cast<int>(
+            std::min(std::max(std::trunc(buffer + bits - rate / frame_rate), 0.0), 4e6));
+        if (intra) {
+            level = buffer;
+        } else {
+            xp = 7 * xp * 0.125 + static_cast<double>(bits) * qp * 0.125;
+            first_p = false;
+        }
+    }
+};
+
+// An engine whose settings change, and the controller that follows it.
+class ChangingStream {
+public:
+    ChangingStream(int bit_rate, int period)
+        : sequence_(generated("cut", 64, 64, 400)),
+          encoding_(64, 64, {28, bit_rate, period, 30}),
+          picture_(sequence_.picture_size()) {
+        expected_.rate = bit_rate;
+        expected_.period = period;
+        if (bit_rate > 0) {
+            expected_.initialize();
+        }
+    }
+    CEncoder& engine() { return encoding_.engine(); }
+    void set_bit_rate(int rate) {
+        engine().set_bit_rate(rate);
+        expected_.rate = rate;
+    }
+    void set_frame_rate(double rate) {
+        engine().set_frame_rate(rate);
+        expected_.frame_rate = rate;
+    }
+    void set_period(int period) {
+        engine().set_intra_period(period);
+        expected_.period = period;
+    }
+    // Codes pictures and checks the controller's numbers at each; returns their bits.
+    std::int64_t code(int pictures) {
+        std::int64_t sum = 0;
+        for (int k = 0; k < pictures; ++k) {
+            const int n = expected_.pictures;
+            const bool intra = n % expected_.period == 0;
+            if (expected_.rate > 0) {
+                const double mad =
+                    engine().g_rc_mad_c1 * engine().g_rc_cur_mad + engine().g_rc_mad_c2;
+                expected_.choose(intra, engine().g_rc_x1, engine().g_rc_x2, mad);
+            }
+            sequence_.draw(n % sequence_.pictures, picture_.data());
+            sum += 8 * static_cast<std::int64_t>(encoding_.encode(picture_.data()).size());
+            check(n);
+            expected_.coded(intra, static_cast<int>(engine().g_slice_bits));
+            if (testing::Test::HasFailure()) {
+                break;
+            }
+        }
+        return sum;
+    }
+
+private:
+    void check(int n) {
+        EXPECT_EQ(engine().g_mb_qp[0], expected_.qp) << "picture " << n;
+        if (expected_.rate > 0) {
+            EXPECT_EQ(engine().g_rc_remaining_bits, expected_.remaining) << "picture " << n;
+            EXPECT_EQ(engine().g_rc_i_qp, expected_.i_qp) << "picture " << n;
+            EXPECT_EQ(engine().g_rc_qp_range, expected_.range) << "picture " << n;
+            EXPECT_EQ(engine().g_rc_target_bits, expected_.target) << "picture " << n;
+        }
+    }
+
+    Sequence sequence_;
+    Encoding encoding_;
+    std::vector<std::uint8_t> picture_;
+    Controller expected_;
+};
+
+// That so many pictures at 30 a second came near the rate.
+void expect_rate(std::int64_t bits, int pictures, int bit_rate) {
+    const double rate = static_cast<double>(bits) / pictures * 30;
+    EXPECT_GT(rate, 0.6 * bit_rate);
+    EXPECT_LT(rate, 1.6 * bit_rate);
+}
+
+TEST(ChangingSettings, IntraPeriodLoweredBelowThePositionInIt) {
+    ChangingStream stream(200000, 300);
+    stream.code(100);
+    stream.set_period(30);
+    expect_rate(stream.code(240), 240, 200000);
+}
+
+TEST(ChangingSettings, RateControlOffAndOnAgain) {
+    ChangingStream stream(200000, 30);
+    stream.set_bit_rate(0);
+    stream.set_bit_rate(200000);  // as it was initialised, but for the interval
+    stream.set_period(90);
+    stream.code(45);
+    stream.set_bit_rate(0);  // no picture without it
+    stream.set_bit_rate(150000);
+    stream.code(20);
+    stream.set_bit_rate(0);
+    stream.code(50);
+    stream.set_bit_rate(200000);
+    stream.code(100);
+}
+
+TEST(ChangingSettings, RateControlSwitchedOnInMidStream) {
+    for (const int pictures : {0, 1, 17, 30}) {  // 0 and 30: at an I picture
+        ChangingStream stream(0, 30);
+        stream.code(pictures);
+        stream.set_bit_rate(200000);
+        stream.code(15);
+        expect_rate(stream.code(150), 150, 200000);
+    }
+}
+
+TEST(ChangingSettings, AtRandom) {
+    Random random(4);
+    for (int run = 0; run < 8; ++run) {
+        ChangingStream stream(run % 3 == 0 ? 0 : 100000, random.between(1, 40));
+        for (int change = 0; change < 40 && !HasFailure(); ++change) {
+            switch (random.between(0, 5)) {
+                case 0:
+                    stream.set_bit_rate(0);
+                    break;
+                case 1:
+                case 2:
+                    stream.set_bit_rate(1000 * random.between(20, 900));
+                    break;
+                case 3:
+                    stream.set_frame_rate(random.between(1, 240) / 4.0);
+                    break;
+                default:
+                    stream.set_period(random.between(1, 50));
+            }
+            if (random.between(0, 3) != 0) {
+                stream.code(random.between(1, 12));
+            }
+        }
+    }
+}
+
+TEST(ChangingSettings, LongestIntraPeriods) {
+    constexpr int kLongest = std::numeric_limits<int>::max();
+    for (const int period : {327659, 327660, 1000000, kLongest}) {
+        ChangingStream stream(100000, period);
+        stream.code(60);
+        EXPECT_EQ(stream.engine().g_rc_qp_range, std::min(period / 10 + 2, 32767));
+    }
+    // Counters and budget stay at their ends.
+    ChangingStream stream(100000, kLongest);
+    stream.code(2);
+    CEncoder& engine = stream.engine();
+    engine.g_pic_type = P_SLICE;
+    engine.g_gop_pos = kLongest - 1;
+    engine.g_rc_coded_p = engine.g_rc_np = engine.g_rc_gop_len = kLongest;
+    engine.g_rc_remaining_bits = std::numeric_limits<int>::min() + 1;
+    engine.g_rc_prev_bits = 2;
+    engine.FrameLevelRateControl();
+    EXPECT_EQ(engine.g_rc_coded_p, kLongest);
+    EXPECT_EQ(engine.g_rc_np, kLongest);
+    EXPECT_EQ(engine.g_rc_gop_len, kLongest);
+    EXPECT_EQ(engine.g_rc_remaining_bits, std::numeric_limits<int>::min());
+}
+
+// A model that is not a number anywhere gives the Qstep that falls through every comparison, QP 5,
+// which the limits bring to the last QP less 2.
+TEST(ChangingSettings, NotANumberStaysInsideTheLimits) {
+    ChangingStream stream(100000, 300);
+    stream.code(5);
+    CEncoder& engine = stream.engine();
+    engine.g_pic_type = P_SLICE;
+    engine.g_gop_pos = 5;
+    for (double* number : {&engine.g_rc_x1, &engine.g_rc_cur_mad, &engine.g_rc_x2}) {
+        engine.g_rc_prev_qp = 30;
+        engine.g_rc_i_qp = 30;
+        engine.g_rc_buffer = engine.g_rc_target_level;  // a target of some bits
+        const double kept = *number;
+        *number = NAN;
+        engine.FrameLevelRateControl();
+        EXPECT_EQ(engine.g_mbQp, 28);
+        *number = kept;
     }
 }
 
