@@ -184,6 +184,34 @@ TEST(SliceHeaders, CountersGoRound) {
 
 // ---- Pictures that do not fit the NAL buffer ----
 
+// Bits of a picture at a QP, coded by an engine whose buffer holds it.
+std::size_t bits_in_a_large_buffer(const Sequence& sequence, const Bytes& picture, int qp) {
+    Encoding encoding(sequence.width, sequence.height, {qp, 0, 3});
+    Bytes large(4 * sequence.picture_size());
+    encoding.engine().g_nal_buf = large.data();
+    encoding.engine().g_nal_buf_size = static_cast<int>(large.size()) - 64;
+    return 8 * encoding.encode(picture.data()).size();
+}
+
+TEST(Recoding, TakesTheFirstQpThatFits) {
+    constexpr std::size_t kMacroblockBits =
+        11265;  // most that one can take, kept free for the last
+    const Sequence sequence = generated("noise", 176, 144, 1);
+    for (const int start : {0, 1, 2, 3}) {
+        const auto check = [&](CEncoder& engine, int, const Bytes& picture, const Bytes& nal,
+                               const Bytes&) {
+            const int qp = slice_header(nal).qp;
+            const std::size_t capacity = 8 * static_cast<std::size_t>(engine.g_nal_buf_size);
+            ASSERT_GT(qp, start);
+            EXPECT_EQ((qp - start) % 4, 0);
+            EXPECT_GT(bits_in_a_large_buffer(sequence, picture, qp - 4) + kMacroblockBits,
+                      capacity);
+            EXPECT_EQ(bits_in_a_large_buffer(sequence, picture, qp), 8 * nal.size());
+        };
+        EXPECT_EQ(check_stream(sequence, {start, 0, 3}, {nullptr, check}), "");
+    }
+}
+
 TEST(Recoding, ReachesAQpThatFits) {
     const Sequence sequence = generated("noise", 176, 144, 4);
     for (const int bit_rate : {0, 4000000}) {
@@ -195,7 +223,6 @@ TEST(Recoding, ReachesAQpThatFits) {
             EXPECT_EQ(qp, engine.g_mb_qp[0]);
             if (bit_rate == 0) {
                 EXPECT_GT(qp, 0);
-                EXPECT_EQ(qp % 4, 0);
                 EXPECT_EQ(engine.g_mbQp, 0) << "the next picture starts from the QP that was set";
             } else if (n == 0) {
                 EXPECT_GT(qp, 1);
@@ -220,6 +247,29 @@ TEST(Recoding, LeavesNoTraceOfTheFirstTry) {
         direct.engine().set_qp(slice_header(nal).qp);
         EXPECT_EQ(nal, direct.encode(picture.data())) << "picture " << n;
         EXPECT_EQ(recoding.reconstruction(), direct.reconstruction()) << "picture " << n;
+    }
+}
+
+// ---- Stamps of visited vectors ----
+
+// A search after the stamps have gone round does not take old stamps for its own.
+TEST(VisitStamps, GoRound) {
+    const Sequence sequence = generated("pan", 64, 64, 4);
+    const Settings settings = {28, 0, 30};
+    Encoding around(64, 64, settings), plain(64, 64, settings);
+    Bytes picture(sequence.picture_size());
+    for (int n = 0; n < sequence.pictures; ++n) {
+        CEncoder& engine = around.engine();
+        if (n == 2) {
+            engine.g_visit_stamp = 0xffffffff - 5;
+            const std::size_t dimension = static_cast<std::size_t>(engine.g_visit_dim);
+            std::fill(engine.g_visit_L0, engine.g_visit_L0 + dimension * dimension, 3u);
+        }
+        sequence.draw(n, picture.data());
+        EXPECT_EQ(around.encode(picture.data()), plain.encode(picture.data())) << "picture " << n;
+        if (n == 2) {
+            EXPECT_EQ(engine.g_visit_stamp, 11u) << "the sixth of 16 searches takes stamp 1";
+        }
     }
 }
 
