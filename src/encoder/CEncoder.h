@@ -78,14 +78,6 @@ struct _mv {
     std::uint32_t cost;  // sad + rate term; 0xffffff: no candidate
 };
 
-// What the picture-type decision says about the frame being coded.
-struct frame_buffer_t {
-    std::uint8_t type;         // I_SLICE or P_SLICE
-    std::uint8_t idr;          // 1: first picture of an intra period
-    int gop_pos;               // frame counter mod intra period
-    const std::uint8_t* data;  // the caller's frame, borrowed while it is coded
-};
-
 // H.264/AVC encoder engine: Main profile, level 2.2, CAVLC, one reference frame, one slice and one
 // NAL unit per picture. One object per encoding session, used by one thread at a time; different
 // objects share nothing but constant tables. All memory is allocated by the constructor.
@@ -326,22 +318,22 @@ public:
     unsigned g_inter_period = 1;   // frames
 
     // ---- Picture state, written per frame by encode_frame and the picture coder ----
-    unsigned g_frame_counter = 0;       // input frames since initialize_encoder
-    std::uint8_t g_pic_type = 0;        // I_SLICE or P_SLICE
-    std::uint8_t g_idr_flag = 0;        // 1: IDR picture
-    int g_gop_pos = 0;                  // frame counter mod intra period
-    int g_frame_num = -1;               // frame_num, 16 bits
-    int g_poc = 0;                      // pictures since the last IDR picture, 16 bits
-    int g_coded_frames = 0;             // pictures coded since initialize_encoder
-    int g_mbQp = 10;                    // QP of the current picture, 0..51
-    int g_mapMBNumber = 0;              // address of the current macroblock, raster order
-    std::uint8_t g_prev_idr = 0;        // the previous picture was an IDR picture
-    std::uint8_t g_num_ref_active = 1;  // active list-0 references
-    int g_skip_run = 0;                 // mb_skip_run: skipped macroblocks since the last coded one
+    unsigned g_frame_counter = 0;           // input frames since initialize_encoder
+    std::uint8_t g_pic_type = 0;            // I_SLICE or P_SLICE
+    std::uint8_t g_idr_flag = 0;            // 1: IDR picture
+    const std::uint8_t* g_frame = nullptr;  // the caller's frame, borrowed while it is coded
+    int g_gop_pos = 0;                      // frame counter mod intra period
+    int g_frame_num = -1;                   // frame_num, 16 bits
+    int g_poc = 0;                          // pictures since the last IDR picture, 16 bits
+    int g_coded_frames = 0;                 // pictures coded since initialize_encoder
+    int g_mbQp = 10;                        // QP of the current picture, 0..51
+    int g_mapMBNumber = 0;                  // address of the current macroblock, raster order
+    std::uint8_t g_prev_idr = 0;            // the previous picture was an IDR picture
+    std::uint8_t g_num_ref_active = 1;      // active list-0 references
+    int g_skip_run = 0;         // mb_skip_run: skipped macroblocks since the last coded one
     unsigned g_slice_bits = 0;  // NAL header, slice header and slice data of the last picture
 
     // ---- Records ----
-    frame_buffer_t g_frame = {};
     zolt::AlignedBuffer<seq_par_set_t> g_sps_store;
     zolt::AlignedBuffer<pic_par_set_t> g_pps_store;
     zolt::AlignedBuffer<slice_par_t> g_slp_store;

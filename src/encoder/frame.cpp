@@ -93,14 +93,10 @@ void CEncoder::initialize_encoder() {
 
 void CEncoder::encode_frame(const void* frame) {
     const unsigned position = g_frame_counter % g_intra_period;
-    g_frame.type = position == 0 ? I_SLICE : P_SLICE;
-    g_frame.idr = position == 0;
-    g_frame.gop_pos = static_cast<int>(position);
-    g_frame.data = static_cast<const std::uint8_t*>(frame);
-
-    g_pic_type = g_frame.type;
-    g_idr_flag = g_frame.idr;
-    g_gop_pos = g_frame.gop_pos;
+    g_frame = static_cast<const std::uint8_t*>(frame);
+    g_pic_type = position == 0 ? I_SLICE : P_SLICE;
+    g_idr_flag = position == 0;
+    g_gop_pos = static_cast<int>(position);
     if (g_pic_type == I_SLICE) {
         g_frame_num = 0;
         g_poc = 0;
@@ -110,7 +106,7 @@ void CEncoder::encode_frame(const void* frame) {
         g_poc = next_in_16_bits(g_poc);
         doFrameP();
     }
-    g_frame.data = nullptr;
+    g_frame = nullptr;
     ++g_frame_counter;
 }
 
@@ -118,7 +114,7 @@ void CEncoder::encode_frame(const void* frame) {
 void CEncoder::load_row(int mb_y) {
     const std::ptrdiff_t width = g_width;
     const std::ptrdiff_t chroma_width = g_width / 2;
-    const std::uint8_t* y = g_frame.data;
+    const std::uint8_t* y = g_frame;
     const std::uint8_t* u = y + width * g_height;
     const std::uint8_t* v = u + chroma_width * (g_height / 2);
     const std::ptrdiff_t row = 16 * mb_y;
