@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <climits>
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
+#include <limits>
 
 #include "media/ISampleConsumer.h"
 #include "media/MediaType.h"
@@ -20,18 +22,62 @@ constexpr int kIdrSlice = 5;
 constexpr int kSeqParSet = 7;
 constexpr int kPicParSet = 8;
 
-// Time of a sample in microseconds, truncated; saturates, and is 0 for what is not a number. The
-// extended precision is what makes the fourth sample at 30 frames per second 99999.
+// Adds a * factor to sum, numbers of n and n + 1 digits of 32 bits, the lowest first. The sum has
+// to fit.
+void add_product(std::uint32_t* sum, const std::uint32_t* a, int n, std::uint32_t factor) {
+    std::uint32_t carry = 0;
+    for (int i = 0; i < n; ++i) {
+        const std::uint64_t digit = std::uint64_t{a[i]} * factor + sum[i] + carry;
+        sum[i] = static_cast<std::uint32_t>(digit);
+        carry = static_cast<std::uint32_t>(digit >> 32);
+    }
+    sum[n] += carry;
+}
+
+// Time of a sample in microseconds: the exact product count * period * 1000000, truncated;
+// saturates, and is 0 for what is not a number. In integers, because a host may have set the
+// floating-point unit to another rounding or precision.
 long long sample_time(long long count, double period) {
-    constexpr long double kLimit = 9223372036854775808.0L;  // 2^63
-    const long double time = static_cast<long double>(count) * period * 1000000;
-    if (time >= kLimit) {
-        return LLONG_MAX;
+    static_assert(std::numeric_limits<double>::is_iec559, "the period is taken apart by its bits");
+    std::uint64_t bits;
+    std::memcpy(&bits, &period, sizeof bits);
+    std::uint64_t mantissa = bits & ((std::uint64_t{1} << 52) - 1);
+    int exponent = static_cast<int>(bits >> 52 & 0x7ff);
+    const bool negative = (count < 0) != (bits >> 63 != 0);
+    const long long limit = negative ? LLONG_MIN : LLONG_MAX;
+    if (exponent == 0x7ff) {
+        return count == 0 || mantissa != 0 ? 0 : limit;
     }
-    if (time < -kLimit) {
-        return LLONG_MIN;
+    if (exponent > 0) {
+        mantissa |= std::uint64_t{1} << 52;
+    } else {
+        exponent = 1;
     }
-    return time == time ? static_cast<long long>(time) : 0;
+    exponent -= 1023 + 52;
+
+    const std::uint64_t magnitude =
+        count < 0 ? 0 - static_cast<std::uint64_t>(count) : static_cast<std::uint64_t>(count);
+    const std::uint32_t digits[2] = {static_cast<std::uint32_t>(mantissa),
+                                     static_cast<std::uint32_t>(mantissa >> 32)};
+    std::uint32_t scaled[3] = {};
+    add_product(scaled, digits, 2, 1000000);
+    std::uint32_t product[5] = {};
+    add_product(product, scaled, 3, static_cast<std::uint32_t>(magnitude));
+    add_product(product + 1, scaled, 3, static_cast<std::uint32_t>(magnitude >> 32));
+
+    std::uint64_t time = 0;
+    for (int i = 0; i < 5; ++i) {
+        const std::uint64_t digit = product[i];
+        const int shift = 32 * i + exponent;
+        if (digit == 0 || shift <= -32) {
+            continue;
+        }
+        if (shift >= 63 || (shift > 0 && digit >> (63 - shift) != 0)) {
+            return limit;
+        }
+        time += shift < 0 ? digit >> -shift : digit << shift;
+    }
+    return negative ? -static_cast<long long>(time) : static_cast<long long>(time);
 }
 
 }  // namespace

@@ -181,6 +181,12 @@ int ColorConverter::GetBufferSize(int width, int height, int format) {
     return bytes > INT_MAX ? 0 : static_cast<int>(bytes);
 }
 
+int ColorConverter::GetReadSize(int width, int height, int format) {
+    const int bytes = GetBufferSize(width, height, format);
+    // Planes of odd size are rounded down one by one, the picture as a whole.
+    return format == kIYUV && bytes > 0 ? width * height + 2 * ((width / 2) * (height / 2)) : bytes;
+}
+
 int ColorConverter::RoundDownWidth(int width, int format) {
     const int multiple = GetMinWidthMultiple(format);
     return multiple == 0 ? 0 : Util::RoundDown(width, multiple);

@@ -72,6 +72,8 @@ public:
     // Bytes of a picture; 0 for an undefined format, a size that is not positive, and a picture
     // beyond the range of int.
     static int GetBufferSize(int width, int height, int format);
+    // Bytes of a picture that are read of it, at most GetBufferSize: its planes.
+    static int GetReadSize(int width, int height, int format);
     // The value rounded down to the format's minimum multiple; 0 for an undefined format.
     static int RoundDownWidth(int width, int format);
     static int RoundDownHeight(int height, int format);

@@ -26,6 +26,14 @@ int bits_per_second(int kbs) {
     return static_cast<int>(std::clamp<long long>(kbs * 1000LL, INT_MIN, INT_MAX));
 }
 
+// Beyond what any level allows (ITU-T H.264 Table A-1), which the engine does not take.
+bool is_too_large(int width, int height) {
+    constexpr int kMaxSide = 16880;
+    constexpr int kMaxMacroblocks = 139264;
+    return width > kMaxSide || height > kMaxSide ||
+           (static_cast<long long>(width) / 16) * (height / 16) > kMaxMacroblocks;
+}
+
 // Seconds from `earlier` to `later`, whatever the two times are.
 double seconds_between(long long earlier, long long later) {
     const auto difference = static_cast<std::uint64_t>(later) - static_cast<std::uint64_t>(earlier);
@@ -65,9 +73,16 @@ int VideoH264ZoltEnc::PutStreamConfig(ISampleStreamConfig* config) {
         ErrMgr::AddErr(kClassName, kMethodName, nullptr, "Media config may not be NULL");
         return 1;
     }
+    const int newWidth = video->GetWidth();
+    const int newHeight = video->GetHeight();
+    if (is_too_large(newWidth, newHeight)) {
+        ErrMgr::AddErr(kClassName, kMethodName, nullptr, "Source dimensions (%d,%d) are too large",
+                       newWidth, newHeight);
+        return 1;
+    }
     const zolt::MutexLock lock(mutex);
-    inputWidth = video->GetWidth();
-    inputHeight = video->GetHeight();
+    inputWidth = newWidth;
+    inputHeight = newHeight;
     inputColorFormat = video->GetColorFormat();
     const double rate = video->GetFrameRate();
     frameRate = std::isfinite(rate) && rate > 0.0 ? rate : kDefaultFrameRate;
@@ -157,21 +172,25 @@ void VideoH264ZoltEnc::SetKeyFrameInt(int frames) {
 // known, and sends the stream configuration. Called with the mutex held; returns a status flag.
 int VideoH264ZoltEnc::InitEncAndPutConfig() {
     TearDown();
-    width = inputWidth;
-    height = inputHeight;
+    // Getters do not wait for the lock, so the size is stored once, when it is known.
+    const auto set_size = [this](int newWidth, int newHeight) {
+        width = newWidth;
+        height = newHeight;
+    };
     if (consumer == nullptr || inputWidth == 0 || inputHeight == 0) {
+        set_size(inputWidth, inputHeight);
         return 0;
     }
     converter.reset(ColorConverter::GetNewColorConverter(inputWidth, inputHeight, inputColorFormat,
                                                          ColorConverter::kIYUV, kSizeMultiple,
                                                          kSizeMultiple));
     if (converter == nullptr) {
+        set_size(inputWidth, inputHeight);
         ErrMgr::AddErr(kClassName, "InitEncAndPutConfig", nullptr,
                        "Error constructing a new color converter");
         return 1;
     }
-    width = converter->GetOutputWidth();
-    height = converter->GetOutputHeight();
+    set_size(converter->GetOutputWidth(), converter->GetOutputHeight());
 
     encoder = std::make_unique<CEncH>(width, height);
     engine().set_bit_rate(bits_per_second(bitRateKbs));
@@ -223,7 +242,7 @@ bool VideoH264ZoltEnc::SampleIsUsable(const unsigned char* data, long size) cons
         ErrMgr::AddErr(kClassName, "PutSample", nullptr, "Sample data may not be NULL");
         return false;
     }
-    const int needed = ColorConverter::GetBufferSize(inputWidth, inputHeight, inputColorFormat);
+    const int needed = ColorConverter::GetReadSize(inputWidth, inputHeight, inputColorFormat);
     if (size > 0 && size < needed) {
         ErrMgr::AddErr(kClassName, "PutSample", nullptr,
                        "Sample of %ld bytes is shorter than a picture of %d bytes", size, needed);

@@ -4,8 +4,10 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <memory>
 #include <string>
+#include <system_error>
 
 #include "support/ErrMgr.h"
 #include "support/ErrnoKeeper.h"
@@ -20,8 +22,14 @@ constexpr size_t kExtensionLength = sizeof zolt::kDllExtension - 1;
 
 using Directory = std::unique_ptr<DIR, int (*)(DIR*)>;
 
+// Opening anything else may wait for ever, as a pipe does that nobody writes to.
+bool is_regular_file(const std::string& path) {
+    std::error_code error;
+    return std::filesystem::is_regular_file(std::filesystem::u8path(path), error);
+}
+
 bool is_readable_file(const std::string& path) {
-    std::FILE* file = Util::IsDir(path.c_str()) ? nullptr : Util::Win32FileOpen(path.c_str(), "rb");
+    std::FILE* file = is_regular_file(path) ? Util::Win32FileOpen(path.c_str(), "rb") : nullptr;
     if (file == nullptr) {
         return false;
     }
@@ -129,7 +137,7 @@ int DllUtils::LoadAllDlls(const char* dir, int n, const char* const* funcNames, 
         }
         const std::string name = entry->d_name;
         const std::string path = std::string(dir) + zolt::kDirSeparator + name;
-        if (!is_library_name(name) || Util::IsDir(path.c_str())) {
+        if (!is_library_name(name) || !is_regular_file(path)) {
             continue;
         }
         void* handle = LoadDll(path.c_str(), n, funcNames, funcPtrs + count * n);

@@ -24,7 +24,11 @@ public:
     // to outlive this object.
     constexpr HostLibrary(const char* get_object, const char* delete_object)
         : DllFunctionNameList{get_object, delete_object} {}
-    ~HostLibrary() { delete[] dllName; }
+    // The library stays loaded: other static objects may still use the object.
+    ~HostLibrary() {
+        ended = true;
+        delete[] dllName;
+    }
     HostLibrary(const HostLibrary&) = delete;
     HostLibrary& operator=(const HostLibrary&) = delete;
 
@@ -35,8 +39,12 @@ public:
     // which is found out once and for all, or this is a call made by the search itself.
     bool load();
 
-    // Gives a loaded object back to its library and unloads that; the next use loads again.
+    // Gives a loaded object back to its library and unloads that; the next use loads again. Does
+    // nothing after the destructor.
     void unload();
+
+    // The destructor has run.
+    static bool has_ended() { return ended; }
 
 private:
     bool load_object();
@@ -48,6 +56,8 @@ private:
     std::atomic<Host*> object{nullptr};
     bool loadError = false;
     bool inLoad = false;
+    // Outside the object, whose own fields are no longer there when it is asked for.
+    static inline std::atomic<bool> ended{false};
 };
 
 template <class Host>
@@ -97,7 +107,7 @@ template <class Host>
 void HostLibrary<Host>::unload() {
     const ErrnoKeeper keep_errno;
     const MutexLock lock(host_library_mutex());
-    if (object.load(std::memory_order_relaxed) == nullptr) {
+    if (ended || object.load(std::memory_order_relaxed) == nullptr) {
         return;
     }
     // A report made on the way out must neither reach the object nor load it again.

@@ -35,6 +35,9 @@ bool Logger::StartLoggingToStdout() {
 }
 
 void Logger::EndLogging() {
+    if (zolt::HostLibrary<ILogger>::has_ended()) {
+        return;
+    }
     if (ILogger* host = logger.get()) {
         host->EndLogging();
         logger.unload();

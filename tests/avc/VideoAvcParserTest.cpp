@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cfenv>
 #include <climits>
 #include <cmath>
 #include <cstdint>
@@ -201,6 +202,31 @@ TEST(VideoAvcParser, CountsTimeInFramePeriods) {
             times.push_back(sample.time);
         }
         EXPECT_EQ(times, c.times) << c.rate;
+    }
+}
+
+// The floating-point unit of a host may round otherwise, and to fewer digits.
+TEST(VideoAvcParser, CountsTimeWhateverTheFloatingPointUnitIsSetTo) {
+    for (const int rounding : {FE_DOWNWARD, FE_UPWARD, FE_TOWARDZERO, FE_TONEAREST}) {
+        for (const bool x87_doubles : {false, true}) {
+            RecordingConsumer consumer;
+            VideoAvcParser parser(&consumer, 30);
+            std::fenv_t before;
+            std::fegetenv(&before);
+            std::fesetround(rounding);
+#if defined(__i386__) || defined(__x86_64__)
+            if (x87_doubles) {
+                std::uint16_t control;
+                asm volatile("fnstcw %0" : "=m"(control));
+                control = static_cast<std::uint16_t>((control & ~0x300) | 0x200);  // 53 bits
+                asm volatile("fldcw %0" : : "m"(control));
+            }
+#endif
+            put(parser, kSps + kPps + kIdr + kSlice + kSlice + kSlice + kSlice + kAud);
+            std::fesetenv(&before);
+            ASSERT_EQ(consumer.samples.size(), 5u);
+            EXPECT_EQ(consumer.samples[3].time, 99999) << rounding << " " << x87_doubles;
+        }
     }
 }
 

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <atomic>
 #include <climits>
 #include <cmath>
 #include <limits>
@@ -115,6 +116,14 @@ TEST_F(SessionTest, RefusesWhatIsNoUncompressedVideo) {
     EXPECT_EQ(take_errors(), "VideoH264ZoltEnc.PutStreamConfig: Media config may not be NULL\n");
     EXPECT_EQ(session.PutStreamConfig(nullptr), 1);
     EXPECT_EQ(take_errors(), "VideoH264ZoltEnc.PutStreamConfig: Stream config may not be NULL\n");
+    for (const auto& [width, height] :
+         {std::pair{16881, 16}, {16, 16881}, {16, 53687040}, {5984, 5968}, {INT_MAX, INT_MAX}}) {
+        InputConfig large(width, height);
+        EXPECT_EQ(session.PutStreamConfig(large.stream()), 1);
+        EXPECT_EQ(take_errors(), "VideoH264ZoltEnc.PutStreamConfig: Source dimensions (" +
+                                     std::to_string(width) + "," + std::to_string(height) +
+                                     ") are too large\n");
+    }
     // The session is as before.
     EXPECT_EQ(FakeEngine::take_calls(), "");
     put_frame(0);
@@ -295,6 +304,36 @@ TEST_F(SessionTest, DropsWhatIsNoPicture) {
     }
     EXPECT_EQ(consumer.units.size(), 4u);
     EXPECT_EQ(take_errors(), "");
+}
+
+TEST_F(SessionTest, TakesSamplesThatHoldTheirPlanes) {
+    InputConfig odd(51, 39);
+    session.PutStreamConfig(odd.stream());
+    session.Connect(&consumer);
+    Frame frame(0, Bytes(51 * 39 + 2 * 25 * 19, 1));
+    session.PutSample(&frame);
+    EXPECT_EQ(consumer.units.size(), 1u);
+    frame.SetSampleSize(51 * 39 + 2 * 25 * 19 - 1);
+    session.PutSample(&frame);
+    EXPECT_EQ(consumer.units.size(), 1u);
+    EXPECT_NE(take_errors(), "");
+}
+
+TEST_F(SessionTest, ShowsNoOtherSizeWhileItIsRebuilt) {
+    build();
+    std::atomic<bool> done{false};
+    std::thread rebuilding([&] {
+        for (int i = 0; i < 2000; ++i) {
+            session.PutStreamConfig(input.stream());
+        }
+        done = true;
+    });
+    int others = 0;
+    while (!done) {
+        others += session.GetWidth() != 48 || session.GetHeight() != 32;
+    }
+    rebuilding.join();
+    EXPECT_EQ(others, 0);
 }
 
 TEST_F(SessionTest, ServesOneConsumerAtATime) {

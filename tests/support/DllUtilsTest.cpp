@@ -1,6 +1,7 @@
 #include "support/DllUtils.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <cstdlib>
@@ -131,7 +132,11 @@ TEST_F(DllUtilsTest, LoadsAllFittingLibrariesOfADirectory) {
     std::ofstream(dir.path("text.so")) << "not a library";
     fs::create_directory(dir.path("d.so"));
     fs::create_directory_symlink(dir.path("d.so"), dir.path("e.so"));
+    ASSERT_EQ(0, mkfifo(dir.path("f.so").c_str(), 0600));  // opening it would wait for a writer
+    char found[288];
     DllUtils::SetDllDir(dir.path().c_str());
+
+    EXPECT_EQ(1, DllUtils::ConstructDllFullPathName(found, "f"));
 
     char* names[4] = {};
     void* handles[4] = {};

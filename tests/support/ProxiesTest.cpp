@@ -309,6 +309,26 @@ TEST_F(ProxiesWithHost, TheListenerHearsOfEveryError) {
     EXPECT_EQ((Lines{"one", "two"}), listener.messages);
 }
 
+// Constructed before the proxies' objects and so destroyed after them.
+struct LateUser {
+    bool unloads = false;
+    ~LateUser() {
+        if (unloads) {
+            ErrMgr::Unload();
+            Logger::EndLogging();
+            Logger::Unload();
+        }
+    }
+};
+[[gnu::init_priority(101)]] LateUser late_user;
+
+TEST_F(ProxiesWithHost, StayAsTheyAreAfterTheirEnd) {
+    in_own_process([] {
+        ErrMgr::AddErr("class", "method", nullptr, "message");
+        late_user.unloads = true;
+    });
+}
+
 TEST_F(ProxiesWithHost, UnloadedProxiesLoadAgain) {
     for (int round = 0; round < 3; round++) {
         EXPECT_EQ(nullptr, ErrMgr::GetError());  // a new object each time
