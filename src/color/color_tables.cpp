@@ -1,7 +1,7 @@
 #include "color/color_tables.h"
 
-#include <cmath>
-#include <mutex>
+#include <algorithm>
+#include <iterator>
 
 namespace zolt {
 
@@ -11,41 +11,32 @@ std::int32_t TableE02xCr[256], TableE11xCb[256], TableE12xCr[256], TableE21xCb[2
 
 namespace {
 
-std::once_flag tablesRGB2YUVAreFilled, tablesYUV2RGBAreFilled;
-
-std::uint8_t floor_half_up(double value) {
-    return static_cast<std::uint8_t>(std::floor(value + 0.5));
-}
-
-int round_half_away(double value) {
-    return static_cast<int>(value < 0.0 ? value - 0.5 : value + 0.5);
+template <typename T, std::size_t kCount>
+void fill(T (&table)[kCount], const T (&rule)[kCount]) {
+    std::copy(std::begin(rule), std::end(rule), table);
 }
 
 }  // namespace
 
 void fill_tables_rgb_to_yuv() {
-    std::call_once(tablesRGB2YUVAreFilled, [] {
-        for (int i = 0; i < 256; ++i) {
-            TableCr[i] = floor_half_up(0.3 * i);
-            TableCg[i] = floor_half_up(0.59 * i);
-            TableCb[i] = floor_half_up(0.11 * i);
-        }
-        for (int d = -255; d <= 255; ++d) {
-            TableCu[d + 255] = clamp255(round_half_away(128 + d * 0.5617977528089888));  // 1 / 1.78
-            TableCv[d + 255] = clamp255(round_half_away(128 + d * 0.7142857142857143));  // 1 / 1.4
-        }
-    });
+    [[maybe_unused]] static const bool tablesRGB2YUVAreFilled = [] {
+        fill(TableCr, kColorRules.luma_of_r);
+        fill(TableCg, kColorRules.luma_of_g);
+        fill(TableCb, kColorRules.luma_of_b);
+        fill(TableCu, kColorRules.u);
+        fill(TableCv, kColorRules.v);
+        return true;
+    }();
 }
 
 void fill_tables_yuv_to_rgb() {
-    std::call_once(tablesYUV2RGBAreFilled, [] {
-        for (int c = -128; c <= 127; ++c) {
-            TableE02xCr[c + 128] = round_half_away(1.4 * c);
-            TableE11xCb[c + 128] = round_half_away(-0.33186440677966106 * c);  // 0.11 * 1.78 / 0.59
-            TableE12xCr[c + 128] = round_half_away(-0.711864406779661 * c);    // 0.3 * 1.4 / 0.59
-            TableE21xCb[c + 128] = round_half_away(1.78 * c);
-        }
-    });
+    [[maybe_unused]] static const bool tablesYUV2RGBAreFilled = [] {
+        fill(TableE02xCr, kColorRules.r_of_v);
+        fill(TableE11xCb, kColorRules.g_of_u);
+        fill(TableE12xCr, kColorRules.g_of_v);
+        fill(TableE21xCb, kColorRules.b_of_u);
+        return true;
+    }();
 }
 
 }  // namespace zolt

@@ -1,10 +1,12 @@
 #pragma once
 
-#include <algorithm>
+#include <cstddef>
 #include <cstdint>
 
-// The colour rules, as look-ups and additions. Samples are 8 bits, full range; luma weighs R, G and
-// B by 0.3, 0.59 and 0.11.
+#include "kernels/clip.h"
+#include "kernels/color_rules.h"
+
+// The rules of color_rules.h under the converter's names.
 namespace zolt {
 
 // RGB to YUV: luma parts by R, G and B; chroma by B - Y + 255 (U) and R - Y + 255 (V).
@@ -17,10 +19,6 @@ extern std::int32_t TableE02xCr[256], TableE11xCb[256], TableE12xCr[256], TableE
 // Fill the tables of a direction, once per process; safe from any thread.
 void fill_tables_rgb_to_yuv();
 void fill_tables_yuv_to_rgb();
-
-inline std::uint8_t clamp255(int value) {
-    return static_cast<std::uint8_t>(std::clamp(value, 0, 255));
-}
 
 inline int luma(int r, int g, int b) {
     return TableCr[r] + TableCg[g] + TableCb[b];
@@ -35,15 +33,15 @@ inline std::uint8_t chroma_v(int r, int y) {
 }
 
 inline std::uint8_t red(int y, int v) {
-    return clamp255(y + TableE02xCr[v]);
+    return clip_sample(y + TableE02xCr[v]);
 }
 
 inline std::uint8_t green(int y, int u, int v) {
-    return clamp255(y + TableE11xCb[u] + TableE12xCr[v]);
+    return clip_sample(y + TableE11xCb[u] + TableE12xCr[v]);
 }
 
 inline std::uint8_t blue(int y, int u) {
-    return clamp255(y + TableE21xCb[u]);
+    return clip_sample(y + TableE21xCb[u]);
 }
 
 }  // namespace zolt

@@ -1,16 +1,12 @@
-#include <algorithm>
 #include <cstring>
 
 #include "encoder/CEncoder.h"
+#include "kernels/clip.h"
 #include "kernels/predict_4x4.h"
 
 namespace {
 
 constexpr int kIllegalMode = 104;
-
-std::uint8_t clip_sample(int value) {
-    return static_cast<std::uint8_t>(std::clamp(value, 0, 255));
-}
 
 int sum(const std::uint8_t* p, std::ptrdiff_t step, int count) {
     int total = 0;
@@ -25,7 +21,8 @@ void predict_plane(std::uint8_t* pred, int n, int a, int b, int c) {
     const int centre = n / 2 - 1;
     for (int y = 0; y < n; ++y) {
         for (int x = 0; x < n; ++x) {
-            pred[n * y + x] = clip_sample((a + b * (x - centre) + c * (y - centre) + 16) >> 5);
+            pred[n * y + x] =
+                zolt::clip_sample((a + b * (x - centre) + c * (y - centre) + 16) >> 5);
         }
     }
 }

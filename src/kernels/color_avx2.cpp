@@ -1,32 +1,16 @@
-// Compiled for AVX2: nothing but intrinsics and functions of this file, so that no inline function
-// that other files share is emitted with instructions that an older processor lacks. The functions
-// of color_rules.h are evaluated at compile time only.
-#include <immintrin.h>
-
+// Compiled for AVX2: nothing but intrinsics and functions of this file and of avx2.h, so that no
+// inline function that other files share is emitted with instructions that an older processor
+// lacks. The functions of color_rules.h are evaluated at compile time only.
+#include "kernels/avx2.h"
 #include "kernels/color_rules.h"
 #include "kernels/color_scalar.h"
-#include "kernels/x86_tables.h"
+#include "kernels/families.h"
 
 namespace zolt {
 namespace {
 
 using std::uint8_t;
 
-__m128i load_16(const void* p) {
-    return _mm_loadu_si128(static_cast<const __m128i*>(p));
-}
-__m256i load_32(const void* p) {
-    return _mm256_loadu_si256(static_cast<const __m256i*>(p));
-}
-void store_16(void* p, __m128i v) {
-    _mm_storeu_si128(static_cast<__m128i*>(p), v);
-}
-void store_8(void* p, __m128i v) {
-    _mm_storel_epi64(static_cast<__m128i*>(p), v);
-}
-__m256i join(__m128i low, __m128i high) {
-    return _mm256_inserti128_si256(_mm256_castsi128_si256(low), high, 1);
-}
 // A pair of 16-bit numbers, not negative, in every 32 bits.
 __m256i pairs_of(int first, int second) {
     return _mm256_set1_epi32(static_cast<int>(static_cast<unsigned>(second) << 16) | first);
@@ -202,13 +186,11 @@ void yuy2_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRows to, 
 
 }  // namespace
 
-Kernels with_avx2_color(const Kernels& base) {
-    Kernels k = base;
-    k.rgb32_rows_to_iyuv = rgb32_rows_to_iyuv;
-    k.rgb24_rows_to_iyuv = rgb24_rows_to_iyuv;
-    k.ayuv_rows_to_iyuv = ayuv_rows_to_iyuv;
-    k.yuy2_rows_to_iyuv = yuy2_rows_to_iyuv;
-    return k;
+void avx2::fill_color(Kernels& table) {
+    table.rgb32_rows_to_iyuv = rgb32_rows_to_iyuv;
+    table.rgb24_rows_to_iyuv = rgb24_rows_to_iyuv;
+    table.ayuv_rows_to_iyuv = ayuv_rows_to_iyuv;
+    table.yuy2_rows_to_iyuv = yuy2_rows_to_iyuv;
 }
 
 }  // namespace zolt

@@ -1,41 +1,23 @@
 #include "kernels/color_scalar.h"
 
 #include "kernels/color_rules.h"
+#include "kernels/families.h"
 
 namespace zolt {
 namespace {
 
 using std::uint8_t;
 
-constexpr uint8_t sample(int value) {
+uint8_t sample(int value) {
     return static_cast<uint8_t>(value);
 }
-
-// The rules as look-ups: chroma by difference + 255.
-struct RuleTables {
-    uint8_t red[256], green[256], blue[256];
-    uint8_t u[511], v[511];
-
-    constexpr RuleTables() : red(), green(), blue(), u(), v() {
-        for (int i = 0; i < 256; ++i) {
-            red[i] = sample(luma_part(i, kRedPercent));
-            green[i] = sample(luma_part(i, kGreenPercent));
-            blue[i] = sample(luma_part(i, kBluePercent));
-        }
-        for (int i = 0; i < 511; ++i) {
-            u[i] = sample(chroma(i - 255, kStepPercentU));
-            v[i] = sample(chroma(i - 255, kStepPercentV));
-        }
-    }
-};
-constexpr RuleTables kRules;
 
 // Luma of one pixel, adding its R and B to the sums.
 int luma_and_sums(const uint8_t* pixel, RgbOffsets at, int& r_sum, int& b_sum) {
     const int r = pixel[at.r], g = pixel[at.g], b = pixel[at.b];
     r_sum += r;
     b_sum += b;
-    return kRules.red[r] + kRules.green[g] + kRules.blue[b];
+    return kColorRules.luma_of_r[r] + kColorRules.luma_of_g[g] + kColorRules.luma_of_b[b];
 }
 
 template <int kBytes>
@@ -52,8 +34,8 @@ void rgb_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, RgbOffsets at,
         to.upper[x + 1] = sample(y01);
         to.lower[x] = sample(y10);
         to.lower[x + 1] = sample(y11);
-        to.u[x / 2] = kRules.u[(b_sum >> 2) - y_mean + 255];
-        to.v[x / 2] = kRules.v[(r_sum >> 2) - y_mean + 255];
+        to.u[x / 2] = kColorRules.u[(b_sum >> 2) - y_mean + 255];
+        to.v[x / 2] = kColorRules.v[(r_sum >> 2) - y_mean + 255];
     }
 }
 
@@ -94,6 +76,13 @@ void scalar_yuy2_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRo
         to.u[x / 2] = sample((upper[kU] + lower[kU]) >> 1);
         to.v[x / 2] = sample((upper[kV] + lower[kV]) >> 1);
     }
+}
+
+void scalar::fill_color(Kernels& table) {
+    table.rgb32_rows_to_iyuv = scalar_rgb32_rows_to_iyuv;
+    table.rgb24_rows_to_iyuv = scalar_rgb24_rows_to_iyuv;
+    table.ayuv_rows_to_iyuv = scalar_ayuv_rows_to_iyuv;
+    table.yuy2_rows_to_iyuv = scalar_yuy2_rows_to_iyuv;
 }
 
 }  // namespace zolt

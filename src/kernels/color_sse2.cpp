@@ -1,27 +1,15 @@
-#include <emmintrin.h>
-
 #include <algorithm>
-#include <cstring>
 
 #include "kernels/color_rules.h"
 #include "kernels/color_scalar.h"
-#include "kernels/x86_tables.h"
+#include "kernels/families.h"
+#include "kernels/sse2.h"
 
 namespace zolt {
 namespace {
 
 using std::uint8_t;
 
-__m128i load_16(const void* p) {
-    return _mm_loadu_si128(static_cast<const __m128i*>(p));
-}
-void store_8(void* p, __m128i v) {
-    _mm_storel_epi64(static_cast<__m128i*>(p), v);
-}
-void store_4(void* p, __m128i v) {
-    const int bytes = _mm_cvtsi128_si32(v);
-    std::memcpy(p, &bytes, sizeof bytes);
-}
 // A pair of 16-bit numbers, not negative, in every 32 bits.
 __m128i pairs_of(int first, int second) {
     return _mm_set1_epi32(static_cast<int>(static_cast<unsigned>(second) << 16) | first);
@@ -83,9 +71,9 @@ void store_chroma(__m128i chroma, uint8_t* first, uint8_t* second) {
 template <int kBytes>
 __m128i load_pixels(const uint8_t* row, int half) {
     if (kBytes == 4) {
-        return load_16(row + 16 * half);
+        return load(row + 16 * half);
     }
-    const __m128i v = half == 0 ? load_16(row) : _mm_srli_si128(load_16(row + 8), 4);
+    const __m128i v = half == 0 ? load(row) : _mm_srli_si128(load(row + 8), 4);
     const __m128i first = _mm_unpacklo_epi32(v, _mm_srli_si128(v, 3));
     const __m128i last = _mm_unpacklo_epi32(_mm_srli_si128(v, 6), _mm_srli_si128(v, 9));
     return _mm_unpacklo_epi64(first, last);
@@ -174,7 +162,7 @@ void ayuv_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRows to, 
         __m128i luma[2], u[2], v[2];
         const uint8_t* rows[2] = {upper + 4 * x, lower + 4 * x};
         for (int row = 0; row < 2; ++row) {
-            const __m128i left = load_16(rows[row]), right = load_16(rows[row] + 16);
+            const __m128i left = load(rows[row]), right = load(rows[row] + 16);
             luma[row] = _mm_packs_epi32(second_byte(left), second_byte(right));
             const __m128i uv = _mm_packs_epi32(_mm_srai_epi32(left, 16), _mm_srai_epi32(right, 16));
             u[row] = even_bytes(uv);
@@ -193,7 +181,7 @@ void ayuv_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRows to, 
 
 void yuy2_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRows to, int width) {
     const auto convert = [&](int x) {
-        const __m128i first = load_16(upper + 2 * x), second = load_16(lower + 2 * x);
+        const __m128i first = load(upper + 2 * x), second = load(lower + 2 * x);
         store_luma(even_bytes(first), even_bytes(second), to, x);
         const __m128i sums = _mm_add_epi16(odd_bytes(first), odd_bytes(second));
         store_chroma(_mm_srli_epi16(sums, 1), to.u + x / 2, to.v + x / 2);
@@ -205,13 +193,11 @@ void yuy2_rows_to_iyuv(const uint8_t* upper, const uint8_t* lower, IyuvRows to, 
 
 }  // namespace
 
-Kernels with_sse2_color(const Kernels& base) {
-    Kernels k = base;
-    k.rgb32_rows_to_iyuv = rgb32_rows_to_iyuv;
-    k.rgb24_rows_to_iyuv = rgb24_rows_to_iyuv;
-    k.ayuv_rows_to_iyuv = ayuv_rows_to_iyuv;
-    k.yuy2_rows_to_iyuv = yuy2_rows_to_iyuv;
-    return k;
+void sse2::fill_color(Kernels& table) {
+    table.rgb32_rows_to_iyuv = rgb32_rows_to_iyuv;
+    table.rgb24_rows_to_iyuv = rgb24_rows_to_iyuv;
+    table.ayuv_rows_to_iyuv = ayuv_rows_to_iyuv;
+    table.yuy2_rows_to_iyuv = yuy2_rows_to_iyuv;
 }
 
 }  // namespace zolt

@@ -2,7 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <climits>
+#include <cmath>
 #include <cstring>
 #include <memory>
 #include <numeric>
@@ -12,7 +14,6 @@
 #include "HostErrors.h"
 #include "ReferenceConverter.h"
 #include "color/color_tables.h"
-#include "kernels/color_rules.h"
 #include "support/Util.h"
 
 namespace {
@@ -160,19 +161,24 @@ TEST(ColorConverter, ConvertsKnownColours) {
     }
 }
 
-// What the converter looks up is what its kernels compute.
-TEST(ColorConverter, TablesHoldTheRulesOfTheKernels) {
+// Tables made of integers against the rules in real numbers.
+TEST(ColorConverter, TablesHoldTheRules) {
     ColorConverter::FillTablesRGB2YUV();
+    ColorConverter::FillTablesYUV2RGB();
     for (int i = 0; i < 256; ++i) {
-        EXPECT_EQ(zolt::TableCr[i], zolt::luma_part(i, zolt::kRedPercent)) << i;
-        EXPECT_EQ(zolt::TableCg[i], zolt::luma_part(i, zolt::kGreenPercent)) << i;
-        EXPECT_EQ(zolt::TableCb[i], zolt::luma_part(i, zolt::kBluePercent)) << i;
+        EXPECT_EQ(zolt::TableCr[i], std::floor(0.3 * i + 0.5)) << i;
+        EXPECT_EQ(zolt::TableCg[i], std::floor(0.59 * i + 0.5)) << i;
+        EXPECT_EQ(zolt::TableCb[i], std::floor(0.11 * i + 0.5)) << i;
+        const int c = i - 128;
+        EXPECT_EQ(zolt::TableE02xCr[i], std::round(1.4 * c)) << c;
+        EXPECT_EQ(zolt::TableE11xCb[i], std::round(-0.33186440677966106 * c)) << c;
+        EXPECT_EQ(zolt::TableE12xCr[i], std::round(-0.711864406779661 * c)) << c;
+        EXPECT_EQ(zolt::TableE21xCb[i], std::round(1.78 * c)) << c;
     }
-    for (int difference = -255; difference <= 255; ++difference) {
-        EXPECT_EQ(zolt::TableCu[difference + 255], zolt::chroma(difference, zolt::kStepPercentU))
-            << difference;
-        EXPECT_EQ(zolt::TableCv[difference + 255], zolt::chroma(difference, zolt::kStepPercentV))
-            << difference;
+    const auto clamped = [](double value) { return std::clamp(value, 0.0, 255.0); };
+    for (int d = -255; d <= 255; ++d) {
+        EXPECT_EQ(zolt::TableCu[d + 255], clamped(std::round(128 + d * 0.5617977528089888))) << d;
+        EXPECT_EQ(zolt::TableCv[d + 255], clamped(std::round(128 + d * 0.7142857142857143))) << d;
     }
 }
 

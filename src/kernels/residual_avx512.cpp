@@ -1,0 +1,249 @@
+// Compiled for AVX-512 (F, BW, VL, DQ, VBMI): nothing but intrinsics and functions of this file and
+// of avx512.h, so that no inline function that other files share is emitted with instructions that
+// an older processor lacks.
+#include "kernels/avx512.h"
+#include "kernels/families.h"
+#include "kernels/zigzag.h"
+
+namespace zolt {
+namespace {
+
+using std::int16_t;
+using std::ptrdiff_t;
+using std::uint16_t;
+using std::uint32_t;
+using std::uint8_t;
+
+// Samples of rows y and y + 4 of a 16x16 block, in the halves.
+__m512i two_rows(const uint8_t* row, ptrdiff_t stride) {
+    return _mm512_cvtepu8_epi16(join(load_16(row), load_16(row + 4 * stride)));
+}
+
+// Forward core transform across four vectors.
+void forward_butterfly(__m512i* v) {
+    const __m512i s = _mm512_add_epi16(v[0], v[3]);
+    const __m512i d = _mm512_sub_epi16(v[0], v[3]);
+    const __m512i t = _mm512_add_epi16(v[1], v[2]);
+    const __m512i u = _mm512_sub_epi16(v[1], v[2]);
+    v[0] = _mm512_add_epi16(s, t);
+    v[1] = _mm512_add_epi16(_mm512_add_epi16(d, d), u);
+    v[2] = _mm512_sub_epi16(s, t);
+    v[3] = _mm512_sub_epi16(d, _mm512_add_epi16(u, u));
+}
+
+// Inverse core transform across four vectors.
+void inverse_butterfly(__m512i* v) {
+    const __m512i e = _mm512_add_epi16(v[0], v[2]);
+    const __m512i f = _mm512_sub_epi16(v[0], v[2]);
+    const __m512i g = _mm512_sub_epi16(_mm512_srai_epi16(v[1], 1), v[3]);
+    const __m512i h = _mm512_add_epi16(v[1], _mm512_srai_epi16(v[3], 1));
+    v[0] = _mm512_add_epi16(e, h);
+    v[1] = _mm512_add_epi16(f, g);
+    v[2] = _mm512_sub_epi16(f, g);
+    v[3] = _mm512_sub_epi16(e, h);
+}
+
+// Transposes the eight 4x4 blocks that stand side by side in four vectors.
+void transpose_eight(__m512i* v) {
+    const __m512i a = _mm512_unpacklo_epi16(v[0], v[1]);
+    const __m512i b = _mm512_unpackhi_epi16(v[0], v[1]);
+    const __m512i c = _mm512_unpacklo_epi16(v[2], v[3]);
+    const __m512i d = _mm512_unpackhi_epi16(v[2], v[3]);
+    const __m512i even_01 = _mm512_unpacklo_epi32(a, c);
+    const __m512i even_23 = _mm512_unpackhi_epi32(a, c);
+    const __m512i odd_01 = _mm512_unpacklo_epi32(b, d);
+    const __m512i odd_23 = _mm512_unpackhi_epi32(b, d);
+    v[0] = _mm512_unpacklo_epi64(even_01, odd_01);
+    v[1] = _mm512_unpackhi_epi64(even_01, odd_01);
+    v[2] = _mm512_unpacklo_epi64(even_23, odd_23);
+    v[3] = _mm512_unpackhi_epi64(even_23, odd_23);
+}
+
+// Two blocks in zig-zag order, taken from a vector of their columns 0 and 1 and one of their
+// columns 2 and 3, which have the blocks in lanes 0 and 2: indices of 16-bit values.
+struct ZigzagIndices {
+    alignas(64) int16_t index[32];
+};
+constexpr ZigzagIndices zigzag_indices() {
+    ZigzagIndices indices{};
+    for (int i = 0; i < 32; ++i) {
+        const int block = i / 16, position = kZigzag[i % 16];
+        indices.index[i] = static_cast<int16_t>(32 * (position / 8) + 16 * block + position % 8);
+    }
+    return indices;
+}
+constexpr ZigzagIndices kZigzagIndices = zigzag_indices();
+
+// Column j of a quantiser's 16 values, for every block.
+__m512i column(const int16_t* values, int j) {
+    return _mm512_broadcastq_epi64(
+        _mm_loadl_epi64(reinterpret_cast<const __m128i*>(values + 4 * j)));
+}
+
+// Levels of column j of the blocks.
+__m512i quantize(__m512i c, const Quantizer& quantizer, int j) {
+    const __m512i forward = column(quantizer.forward, j);
+    const __m512i rounding = _mm512_set1_epi32(quantizer.rounding);
+    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
+    const __m512i magnitude = _mm512_abs_epi16(c);
+    const __m512i low = _mm512_mullo_epi16(magnitude, forward);
+    const __m512i high = _mm512_mulhi_epu16(magnitude, forward);
+    const __m512i first =
+        _mm512_srl_epi32(_mm512_add_epi32(_mm512_unpacklo_epi16(low, high), rounding), shift);
+    const __m512i second =
+        _mm512_srl_epi32(_mm512_add_epi32(_mm512_unpackhi_epi16(low, high), rounding), shift);
+    const __m512i level =
+        _mm512_min_epi16(_mm512_packs_epi32(first, second), _mm512_set1_epi16(kMaxLevel));
+    return _mm512_mask_sub_epi16(level, _mm512_movepi16_mask(c), _mm512_setzero_si512(), level);
+}
+
+// Codes the eight blocks of two block rows from the rows of their residual. Returns the mask of the
+// coded ones. In decoding order (Figure 6-10) the blocks of the upper row, in the low half, are 0,
+// 1, 4, 5, those of the lower one 2, 3, 6, 7.
+uint32_t code_eight(__m512i* v, const Quantizer& quantizer, int16_t* dc, int16_t* coefs,
+                    int16_t* scan, uint16_t* nonzero) {
+    forward_butterfly(v);
+    transpose_eight(v);
+    forward_butterfly(v);  // now vector j holds column j, 64 bits a block
+    if (dc) {
+        store_16(dc, _mm_shuffle_epi32(_mm512_cvtepi64_epi16(v[0]), _MM_SHUFFLE(3, 1, 2, 0)));
+        v[0] = _mm512_maskz_mov_epi16(0xeeeeeeee, v[0]);
+        for (int b = 0; b < 8; b += 2) {
+            store_64(coefs + 16 * b, _mm512_setzero_si512());
+        }
+    }
+    store_16(nonzero, _mm_setzero_si128());
+    __mmask32 beyond = 0;
+    for (int j = 0; j < 4; ++j) {
+        beyond |= _mm512_cmpgt_epi16_mask(_mm512_abs_epi16(v[j]), column(quantizer.dead_zone, j));
+    }
+    if (beyond == 0) {
+        return 0;
+    }
+    __m512i levels[4], scaled[4];
+    for (int j = 0; j < 4; ++j) {
+        levels[j] = quantize(v[j], quantizer, j);
+        scaled[j] = _mm512_mullo_epi16(levels[j], column(quantizer.dequant, j));
+    }
+    uint32_t coded = 0;
+    const auto store_block = [&](int b, uint32_t mask, __m256i block_coefs, __m256i block_scan) {
+        if (mask != 0) {
+            nonzero[b] = static_cast<uint16_t>(mask);
+            store_32(coefs + 16 * b, block_coefs);
+            store_32(scan + 16 * b, block_scan);
+            coded |= 1u << b;
+        }
+    };
+    for (int odd = 0; odd < 2; ++odd) {
+        // Columns 0 and 1, and 2 and 3, of blocks 0, 4, 2, 6, or of 1, 5, 3, 7.
+        const auto two_columns = [=](__m512i left, __m512i right) {
+            return odd ? _mm512_unpackhi_epi64(left, right) : _mm512_unpacklo_epi64(left, right);
+        };
+        const __m512i levels_01 = two_columns(levels[0], levels[1]);
+        const __m512i levels_23 = two_columns(levels[2], levels[3]);
+        const __m512i scaled_01 = two_columns(scaled[0], scaled[1]);
+        const __m512i scaled_23 = two_columns(scaled[2], scaled[3]);
+        for (int lane = 0; lane < 2; ++lane) {
+            const __m512i zigzag = _mm512_add_epi16(
+                load_64(kZigzagIndices.index), _mm512_set1_epi16(static_cast<short>(8 * lane)));
+            const __m512i by_column = _mm512_add_epi64(_mm512_setr_epi64(0, 1, 8, 9, 4, 5, 12, 13),
+                                                       _mm512_set1_epi64(2 * lane));
+            const __m512i in_order = _mm512_permutex2var_epi16(levels_01, zigzag, levels_23);
+            const __m512i blocks = _mm512_permutex2var_epi64(scaled_01, by_column, scaled_23);
+            const uint32_t mask = _mm512_test_epi16_mask(in_order, in_order);
+            const int b = 4 * lane + odd;
+            store_block(b, mask & 0xffff, low_half(blocks), low_half(in_order));
+            store_block(b + 2, mask >> 16, high_half(blocks), high_half(in_order));
+        }
+    }
+    return coded;
+}
+
+uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                             const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                             uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int first = 0; first < 16; first += 8, src += 8 * stride, pred += 128) {
+        __m512i v[4];
+        for (int y = 0; y < 4; ++y) {
+            v[y] =
+                _mm512_sub_epi16(two_rows(src + y * stride, stride), two_rows(pred + 16 * y, 16));
+        }
+        coded |= code_eight(v, quantizer, dc ? dc + first : nullptr, coefs + 16 * first,
+                            scan + 16 * first, nonzero + first)
+                 << first;
+    }
+    return coded;
+}
+
+// Rows of the residual of eight blocks that stand in decoding order, as code_eight takes them.
+// Returns false when 16-bit sums might not be exact: no sum of the inverse transform, rounding
+// included, exceeds the sum of a block's magnitudes.
+[[gnu::always_inline]] inline bool inverse_eight(const __m512i* b, __m512i* rows) {
+    const __m512i first = _mm512_setr_epi64(0, 4, 8, 12, 1, 5, 9, 13);
+    const __m512i last = _mm512_setr_epi64(2, 6, 10, 14, 3, 7, 11, 15);
+    const __m512i upper_01 = _mm512_permutex2var_epi64(b[0], first, b[2]);
+    const __m512i upper_23 = _mm512_permutex2var_epi64(b[0], last, b[2]);
+    const __m512i lower_01 = _mm512_permutex2var_epi64(b[1], first, b[3]);
+    const __m512i lower_23 = _mm512_permutex2var_epi64(b[1], last, b[3]);
+    constexpr int kLow = _MM_SHUFFLE(1, 0, 1, 0), kHigh = _MM_SHUFFLE(3, 2, 3, 2);
+    rows[0] = _mm512_shuffle_i64x2(upper_01, lower_01, kLow);
+    rows[1] = _mm512_shuffle_i64x2(upper_01, lower_01, kHigh);
+    rows[2] = _mm512_shuffle_i64x2(upper_23, lower_23, kLow);
+    rows[3] = _mm512_shuffle_i64x2(upper_23, lower_23, kHigh);
+    __m512i sum = _mm512_setzero_si512();
+    for (int j = 0; j < 4; ++j) {
+        sum = _mm512_adds_epi16(sum, _mm512_abs_epi16(rows[j]));
+    }
+    sum = _mm512_adds_epi16(sum, _mm512_shuffle_epi32(sum, _MM_PERM_CDAB));
+    sum = _mm512_adds_epi16(sum, _mm512_rol_epi32(sum, 16));
+    if (_mm512_cmpgt_epi16_mask(sum, _mm512_set1_epi16(32767 - 32)) != 0) {
+        return false;
+    }
+    inverse_butterfly(rows);
+    transpose_eight(rows);
+    inverse_butterfly(rows);
+    for (int y = 0; y < 4; ++y) {
+        rows[y] = _mm512_srai_epi16(_mm512_add_epi16(rows[y], _mm512_set1_epi16(32)), 6);
+    }
+    return true;
+}
+
+void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                       ptrdiff_t stride) {
+    constexpr __mmask8 kBlocks[4] = {0, 0x0f, 0xf0, 0xff};
+    for (int first = 0; first < 16; first += 8) {
+        const uint8_t* half_pred = pred + 16 * first;
+        uint8_t* half_dst = dst + first * stride;
+        if ((mask >> first & 0xff) == 0) {
+            for (int y = 0; y < 8; ++y) {
+                store_16(half_dst + y * stride, load_16(half_pred + 16 * y));
+            }
+            continue;
+        }
+        __m512i blocks[4], rows[4];
+        for (int i = 0; i < 4; ++i) {
+            const int b = first + 2 * i;
+            blocks[i] = _mm512_maskz_loadu_epi64(kBlocks[mask >> b & 3], coefs + 16 * b);
+        }
+        if (!inverse_eight(blocks, rows)) {
+            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
+            return;
+        }
+        for (int y = 0; y < 4; ++y) {
+            const __m256i samples =
+                to_samples(_mm512_add_epi16(rows[y], two_rows(half_pred + 16 * y, 16)));
+            store_16(half_dst + y * stride, _mm256_castsi256_si128(samples));
+            store_16(half_dst + (y + 4) * stride, _mm256_extracti128_si256(samples, 1));
+        }
+    }
+}
+
+}  // namespace
+
+void avx512::fill_residual(Kernels& table) {
+    table.code_residual_16x16 = code_residual_16x16;
+    table.reconstruct_16x16 = reconstruct_16x16;
+}
+
+}  // namespace zolt

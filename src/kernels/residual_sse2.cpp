@@ -1,0 +1,293 @@
+#include "kernels/families.h"
+#include "kernels/sse2.h"
+#include "kernels/zigzag.h"
+
+namespace zolt {
+namespace {
+
+using std::int16_t;
+using std::ptrdiff_t;
+using std::uint16_t;
+using std::uint32_t;
+using std::uint8_t;
+
+// Forward core transform across four vectors.
+void forward_butterfly(__m128i* v) {
+    const __m128i s = _mm_add_epi16(v[0], v[3]);
+    const __m128i d = _mm_sub_epi16(v[0], v[3]);
+    const __m128i t = _mm_add_epi16(v[1], v[2]);
+    const __m128i u = _mm_sub_epi16(v[1], v[2]);
+    v[0] = _mm_add_epi16(s, t);
+    v[1] = _mm_add_epi16(_mm_add_epi16(d, d), u);
+    v[2] = _mm_sub_epi16(s, t);
+    v[3] = _mm_sub_epi16(d, _mm_add_epi16(u, u));
+}
+
+// Inverse core transform across four vectors.
+void inverse_butterfly(__m128i* v) {
+    const __m128i e = _mm_add_epi16(v[0], v[2]);
+    const __m128i f = _mm_sub_epi16(v[0], v[2]);
+    const __m128i g = _mm_sub_epi16(_mm_srai_epi16(v[1], 1), v[3]);
+    const __m128i h = _mm_add_epi16(v[1], _mm_srai_epi16(v[3], 1));
+    v[0] = _mm_add_epi16(e, h);
+    v[1] = _mm_add_epi16(f, g);
+    v[2] = _mm_sub_epi16(f, g);
+    v[3] = _mm_sub_epi16(e, h);
+}
+
+// Transposes the two 4x4 blocks that stand side by side in four vectors.
+void transpose_two(__m128i* v) {
+    const __m128i a = _mm_unpacklo_epi16(v[0], v[1]);
+    const __m128i b = _mm_unpackhi_epi16(v[0], v[1]);
+    const __m128i c = _mm_unpacklo_epi16(v[2], v[3]);
+    const __m128i d = _mm_unpackhi_epi16(v[2], v[3]);
+    const __m128i first_01 = _mm_unpacklo_epi32(a, c);
+    const __m128i first_23 = _mm_unpackhi_epi32(a, c);
+    const __m128i second_01 = _mm_unpacklo_epi32(b, d);
+    const __m128i second_23 = _mm_unpackhi_epi32(b, d);
+    v[0] = _mm_unpacklo_epi64(first_01, second_01);
+    v[1] = _mm_unpackhi_epi64(first_01, second_01);
+    v[2] = _mm_unpacklo_epi64(first_23, second_23);
+    v[3] = _mm_unpackhi_epi64(first_23, second_23);
+}
+
+// Sample offsets of the pair of blocks 2n, 2n + 1 in decoding order (Figure 6-10).
+constexpr int pair_x(int n) {
+    return 8 * (n >> 1 & 1);
+}
+constexpr int pair_y(int n) {
+    return 4 * (n & 1) + 8 * (n >> 2);
+}
+
+// Levels and scaled coefficients of eight coefficients.
+void quantize_eight(__m128i c, const int16_t* forward, const int16_t* dequant, __m128i rounding,
+                    __m128i shift, __m128i* levels, __m128i* scaled) {
+    const __m128i magnitude = absolute_16(c);
+    const __m128i factor = load_aligned(forward);
+    const __m128i low = _mm_mullo_epi16(magnitude, factor);
+    const __m128i high = _mm_mulhi_epu16(magnitude, factor);
+    const __m128i first =
+        _mm_srl_epi32(_mm_add_epi32(_mm_unpacklo_epi16(low, high), rounding), shift);
+    const __m128i second =
+        _mm_srl_epi32(_mm_add_epi32(_mm_unpackhi_epi16(low, high), rounding), shift);
+    const __m128i level = _mm_min_epi16(_mm_packs_epi32(first, second), _mm_set1_epi16(kMaxLevel));
+    const __m128i sign = _mm_srai_epi16(c, 15);
+    *levels = _mm_sub_epi16(_mm_xor_si128(level, sign), sign);
+    *scaled = _mm_mullo_epi16(*levels, load_aligned(dequant));
+}
+
+// Quantises a block that has a coefficient beyond the dead zone; returns the mask of its levels.
+uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int16_t* coefs,
+                        int16_t* scan) {
+    const __m128i rounding = _mm_set1_epi32(quantizer.rounding);
+    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
+    alignas(16) int16_t levels[16];
+    __m128i level0, level1, scaled0, scaled1;
+    quantize_eight(c0, quantizer.forward, quantizer.dequant, rounding, shift, &level0, &scaled0);
+    quantize_eight(c1, quantizer.forward + 8, quantizer.dequant + 8, rounding, shift, &level1,
+                   &scaled1);
+    store(levels, level0);
+    store(levels + 8, level1);
+    store(coefs, scaled0);
+    store(coefs + 8, scaled1);
+    for (int n = 0; n < 16; ++n) {
+        scan[n] = levels[kZigzag[n]];
+    }
+    const __m128i zeros =
+        _mm_cmpeq_epi8(_mm_packs_epi16(load(scan), load(scan + 8)), _mm_setzero_si128());
+    return static_cast<uint16_t>(~_mm_movemask_epi8(zeros));
+}
+
+// Whether a level of the block is not 0.
+bool leaves_dead_zone(__m128i c0, __m128i c1, const Quantizer& quantizer) {
+    const __m128i beyond =
+        _mm_or_si128(_mm_cmpgt_epi16(absolute_16(c0), load_aligned(quantizer.dead_zone)),
+                     _mm_cmpgt_epi16(absolute_16(c1), load_aligned(quantizer.dead_zone + 8)));
+    return _mm_movemask_epi8(beyond) != 0;
+}
+
+void clear_block(int16_t* block) {
+    store(block, _mm_setzero_si128());
+    store(block + 8, _mm_setzero_si128());
+}
+
+// Codes two blocks side by side; dc, coefs, scan and nonzero are those of the first. Returns the
+// mask of the coded ones.
+uint32_t code_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptrdiff_t pred_stride,
+                  const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                  uint16_t* nonzero) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_8(src + y * stride)),
+                             widen_low(load_8(pred + y * pred_stride)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    if (dc) {
+        dc[0] = static_cast<int16_t>(_mm_extract_epi16(v[0], 0));
+        dc[1] = static_cast<int16_t>(_mm_extract_epi16(v[0], 4));
+        v[0] = _mm_and_si128(v[0], _mm_set1_epi64x(~0xffffLL));
+    }
+    const __m128i blocks[2][2] = {{_mm_unpacklo_epi64(v[0], v[1]), _mm_unpacklo_epi64(v[2], v[3])},
+                                  {_mm_unpackhi_epi64(v[0], v[1]), _mm_unpackhi_epi64(v[2], v[3])}};
+    uint32_t coded = 0;
+    for (int b = 0; b < 2; ++b) {
+        if (leaves_dead_zone(blocks[b][0], blocks[b][1], quantizer)) {
+            coded |= 1u << b;
+            nonzero[b] = quantize_block(blocks[b][0], blocks[b][1], quantizer, coefs + 16 * b,
+                                        scan + 16 * b);
+        } else {
+            nonzero[b] = 0;
+            if (dc) {
+                clear_block(coefs + 16 * b);
+            }
+        }
+    }
+    return coded;
+}
+
+uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                             const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                             uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int n = 0; n < 8; ++n) {
+        coded |= code_two(src + pair_y(n) * stride + pair_x(n), stride,
+                          pred + pair_y(n) * 16 + pair_x(n), 16, quantizer,
+                          dc ? dc + 2 * n : nullptr, coefs + 32 * n, scan + 32 * n, nonzero + 2 * n)
+                 << (2 * n);
+    }
+    return coded;
+}
+
+uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    uint32_t coded = 0;
+    for (int n = 0; n < 2; ++n) {
+        coded |= code_two(src + 4 * n * stride, stride, pred + 32 * n, 8, quantizer,
+                          dc ? dc + 2 * n : nullptr, coefs + 32 * n, scan + 32 * n, nonzero + 2 * n)
+                 << (2 * n);
+    }
+    return coded;
+}
+
+uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
+                           const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
+                           uint16_t* nonzero) {
+    __m128i v[4];
+    for (int y = 0; y < 4; ++y) {
+        v[y] = _mm_sub_epi16(widen_low(load_4(src + y * stride)), widen_low(load_4(pred + 4 * y)));
+    }
+    forward_butterfly(v);
+    transpose_two(v);
+    forward_butterfly(v);
+    const __m128i c0 = _mm_unpacklo_epi64(v[0], v[1]), c1 = _mm_unpacklo_epi64(v[2], v[3]);
+    if (!leaves_dead_zone(c0, c1, quantizer)) {
+        *nonzero = 0;
+        return 0;
+    }
+    *nonzero = quantize_block(c0, c1, quantizer, coefs, scan);
+    return 1;
+}
+
+// Whether 16-bit sums are exact for a block: no sum of the inverse transform, rounding included,
+// exceeds the sum of the magnitudes.
+bool fits_16_bits(const int16_t* coefs) {
+    constexpr int kLargestSum = 32767 - 32;
+    const __m128i ones = _mm_set1_epi16(1);
+    __m128i sum = _mm_add_epi32(_mm_madd_epi16(absolute_16(load_aligned(coefs)), ones),
+                                _mm_madd_epi16(absolute_16(load_aligned(coefs + 8)), ones));
+    sum = _mm_add_epi32(sum, _mm_srli_si128(sum, 8));
+    sum = _mm_add_epi32(sum, _mm_srli_si128(sum, 4));
+    return _mm_cvtsi128_si32(sum) <= kLargestSum;
+}
+
+// Rows of the residual of two blocks side by side.
+void inverse_two(const int16_t* first, const int16_t* second, __m128i* rows) {
+    const __m128i first_01 = load_aligned(first), first_23 = load_aligned(first + 8);
+    const __m128i second_01 = load_aligned(second), second_23 = load_aligned(second + 8);
+    rows[0] = _mm_unpacklo_epi64(first_01, second_01);
+    rows[1] = _mm_unpackhi_epi64(first_01, second_01);
+    rows[2] = _mm_unpacklo_epi64(first_23, second_23);
+    rows[3] = _mm_unpackhi_epi64(first_23, second_23);
+    inverse_butterfly(rows);
+    transpose_two(rows);
+    inverse_butterfly(rows);
+    for (int y = 0; y < 4; ++y) {
+        rows[y] = _mm_srai_epi16(_mm_add_epi16(rows[y], _mm_set1_epi16(32)), 6);
+    }
+}
+
+alignas(16) constexpr int16_t kNoCoefs[16] = {};
+
+// Two blocks side by side; bits 0 and 1 of mask. Returns false when 16 bits are not enough.
+bool reconstruct_two(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
+                     ptrdiff_t pred_stride, uint8_t* dst, ptrdiff_t stride) {
+    if ((mask & 3) == 0) {
+        for (int y = 0; y < 4; ++y) {
+            store_8(dst + y * stride, load_8(pred + y * pred_stride));
+        }
+        return true;
+    }
+    const int16_t* first = mask & 1 ? coefs : kNoCoefs;
+    const int16_t* second = mask & 2 ? coefs + 16 : kNoCoefs;
+    if (!fits_16_bits(first) || !fits_16_bits(second)) {
+        return false;
+    }
+    __m128i rows[4];
+    inverse_two(first, second, rows);
+    for (int y = 0; y < 4; ++y) {
+        const __m128i sum = _mm_add_epi16(rows[y], widen_low(load_8(pred + y * pred_stride)));
+        store_8(dst + y * stride, _mm_packus_epi16(sum, sum));
+    }
+    return true;
+}
+
+void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                       ptrdiff_t stride) {
+    for (int n = 0; n < 8; ++n) {
+        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + pair_y(n) * 16 + pair_x(n), 16,
+                             dst + pair_y(n) * stride + pair_x(n), stride)) {
+            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
+            return;
+        }
+    }
+}
+
+void reconstruct_8x8(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
+                     ptrdiff_t stride) {
+    for (int n = 0; n < 2; ++n) {
+        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + 32 * n, 8,
+                             dst + 4 * n * stride, stride)) {
+            scalar_kernels().reconstruct_8x8(coefs, mask, pred, dst, stride);
+            return;
+        }
+    }
+}
+
+void reconstruct_4x4(const int16_t* coefs, const uint8_t* pred, uint8_t* dst, ptrdiff_t stride) {
+    if (!fits_16_bits(coefs)) {
+        scalar_kernels().reconstruct_4x4(coefs, pred, dst, stride);
+        return;
+    }
+    __m128i rows[4];
+    inverse_two(coefs, kNoCoefs, rows);
+    for (int y = 0; y < 4; ++y) {
+        const __m128i sum = _mm_add_epi16(rows[y], widen_low(load_4(pred + 4 * y)));
+        store_4(dst + y * stride, _mm_packus_epi16(sum, sum));
+    }
+}
+
+}  // namespace
+
+void sse2::fill_residual(Kernels& table) {
+    table.code_residual_16x16 = code_residual_16x16;
+    table.code_residual_8x8 = code_residual_8x8;
+    table.code_residual_4x4 = code_residual_4x4;
+    table.reconstruct_16x16 = reconstruct_16x16;
+    table.reconstruct_8x8 = reconstruct_8x8;
+    table.reconstruct_4x4 = reconstruct_4x4;
+}
+
+}  // namespace zolt
