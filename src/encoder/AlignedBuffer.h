@@ -9,7 +9,8 @@
 namespace zolt {
 
 // Owning, zero-filled array of trivially copyable elements whose start is aligned to 64 bytes.
-// It never throws: after a failed allocate() data() is null.
+// It stands for its address wherever a pointer does. It never throws: the address is null before
+// allocate() and after one that failed.
 template <typename T>
 class AlignedBuffer {
     static_assert(std::is_trivially_copyable<T>::value, "elements are copied and cleared as bytes");
@@ -22,15 +23,15 @@ public:
     AlignedBuffer& operator=(const AlignedBuffer&) = delete;
     ~AlignedBuffer() { release(); }
 
-    // Replaces the content by `count` zero elements; returns their address, null on failure.
-    T* allocate(std::size_t count) {
+    // Replaces the content by `count` zero elements; returns false on failure.
+    bool allocate(std::size_t count) {
         release();
         const std::size_t bytes = (count * sizeof(T) + kAlignment - 1) / kAlignment * kAlignment;
         m_data = static_cast<T*>(::operator new(bytes, std::align_val_t(kAlignment), std::nothrow));
         if (m_data) {
             std::memset(static_cast<void*>(m_data), 0, bytes);
         }
-        return m_data;
+        return m_data != nullptr;
     }
 
     void release() {
@@ -39,6 +40,8 @@ public:
     }
 
     T* data() const { return m_data; }
+    operator T*() const { return m_data; }
+    T* operator->() const { return m_data; }
 
 private:
     T* m_data = nullptr;

@@ -334,21 +334,16 @@ public:
     unsigned g_slice_bits = 0;  // NAL header, slice header and slice data of the last picture
 
     // ---- Records ----
-    zolt::AlignedBuffer<seq_par_set_t> g_sps_store;
-    zolt::AlignedBuffer<pic_par_set_t> g_pps_store;
-    zolt::AlignedBuffer<slice_par_t> g_slp_store;
-    seq_par_set_t* g_sps = nullptr;
-    pic_par_set_t* g_pps = nullptr;
-    slice_par_t* g_slp = nullptr;
+    zolt::AlignedBuffer<seq_par_set_t> g_sps;
+    zolt::AlignedBuffer<pic_par_set_t> g_pps;
+    zolt::AlignedBuffer<slice_par_t> g_slp;
 
     // ---- NAL buffer ----
-    zolt::AlignedBuffer<std::uint8_t> g_nal_store;
-    zolt::AlignedBuffer<int> g_nal_emul_store;
-    std::uint8_t* g_nal_buf = nullptr;  // g_nal_buf_size bytes and room for one write_bits
-    int* g_nal_emul_pos = nullptr;      // positions before which a byte 3 is inserted
-    int g_nal_buf_size = 0;             // bytes
-    int g_nal_emul_size = 0;            // entries
-    unsigned g_nal_bitpos = 0;          // bits written
+    zolt::AlignedBuffer<std::uint8_t> g_nal_buf;  // g_nal_buf_size bytes, room for one write_bits
+    zolt::AlignedBuffer<int> g_nal_emul_pos;      // positions before which a byte 3 is inserted
+    int g_nal_buf_size = 0;                       // bytes
+    int g_nal_emul_size = 0;                      // entries
+    unsigned g_nal_bitpos = 0;                    // bits written
 
     // ---- Pictures ----
     // Two pictures with borders, in one block; the planes' strides are g_stride_luma and
@@ -363,30 +358,22 @@ public:
     std::uint8_t *g_half_v_L0 = nullptr, *g_half_h_L0 = nullptr, *g_half_hv_L0 = nullptr;
 
     // ---- Per-macroblock maps of the picture ----
-    zolt::AlignedBuffer<std::uint8_t> g_mb_mode_store, g_mb_qp_store;
-    zolt::AlignedBuffer<lfdata> g_lf_data_store;
-    zolt::AlignedBuffer<_mv> g_mv_store, g_me_mb_store;
-    std::uint8_t* g_mb_mode = nullptr;  // MbMode
-    std::uint8_t* g_mb_qp = nullptr;    // luma QP
-    lfdata* g_lf_data = nullptr;
-    zolt::AlignedBuffer<std::uint16_t> g_coded_blocks_store;
-    std::uint16_t* g_coded_blocks = nullptr;  // inter: 4x4 luma blocks with levels, raster order
-    _mv* g_mv_array = nullptr;                // 16x16 search results
-    _mv* g_me_mb_L0 = nullptr;  // their integer stage: the neighbours of later searches
+    zolt::AlignedBuffer<std::uint8_t> g_mb_mode;  // MbMode
+    zolt::AlignedBuffer<std::uint8_t> g_mb_qp;    // luma QP
+    zolt::AlignedBuffer<lfdata> g_lf_data;
+    // Inter: 4x4 luma blocks with levels, raster order.
+    zolt::AlignedBuffer<std::uint16_t> g_coded_blocks;
+    zolt::AlignedBuffer<_mv> g_mv_array;  // 16x16 search results
+    zolt::AlignedBuffer<_mv> g_me_mb_L0;  // their integer stage: the neighbours of later searches
 
     // ---- Per-4x4-block maps of the picture, g_blk_width entries per row ----
-    zolt::AlignedBuffer<std::int8_t> g_i4mode_store, g_blk_ref_store;
-    zolt::AlignedBuffer<std::int16_t> g_blk_mvx_store, g_blk_mvy_store;
-    zolt::AlignedBuffer<std::uint8_t> g_cnum_l_store, g_cnum_u_store, g_cnum_v_store;
     // Intra 4x4 modes with a border row above and a border column on either side, g_blk_width + 2
     // entries per row; -1: no such block, 2: no intra 4x4 block.
-    std::int8_t* g_i4mode = nullptr;
-    std::int8_t* g_blk_ref = nullptr;   // reference index, -1: intra
-    std::int16_t* g_blk_mvx = nullptr;  // quarter pels
-    std::int16_t* g_blk_mvy = nullptr;  // quarter pels
-    std::uint8_t* g_cnum_l = nullptr;   // TotalCoeff of luma blocks
-    std::uint8_t* g_cnum_u = nullptr;   // TotalCoeff of Cb blocks, g_blk_width / 2 per row
-    std::uint8_t* g_cnum_v = nullptr;   // TotalCoeff of Cr blocks
+    zolt::AlignedBuffer<std::int8_t> g_i4mode;
+    zolt::AlignedBuffer<std::int8_t> g_blk_ref;              // reference index, -1: intra
+    zolt::AlignedBuffer<std::int16_t> g_blk_mvx, g_blk_mvy;  // quarter pels
+    zolt::AlignedBuffer<std::uint8_t> g_cnum_l;              // TotalCoeff of luma blocks
+    zolt::AlignedBuffer<std::uint8_t> g_cnum_u, g_cnum_v;  // of Cb and Cr, g_blk_width / 2 per row
 
     // ---- Current macroblock ----
     int g_mb_x = 0, g_mb_y = 0;               // position in macroblocks
@@ -449,8 +436,7 @@ public:
     };
     plane_offset_t g_quarter_samples[4][8];
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
-    zolt::AlignedBuffer<std::uint32_t> g_visit_store;
-    std::uint32_t* g_visit_L0 = nullptr;
+    zolt::AlignedBuffer<std::uint32_t> g_visit_L0;
     int g_half_rows_end = 0;          // picture row where the half-sample planes end that are built
     std::uint32_t g_visit_stamp = 0;  // stamp of the running search
 

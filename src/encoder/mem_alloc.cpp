@@ -8,12 +8,10 @@ namespace {
 
 // Allocates count elements and ends the process when there is no memory for them.
 template <typename T>
-T* allocate(zolt::AlignedBuffer<T>& buffer, std::size_t count, const char* name) {
-    T* data = buffer.allocate(count);
-    if (!data) {
+void allocate(zolt::AlignedBuffer<T>& buffer, std::size_t count, const char* name) {
+    if (!buffer.allocate(count)) {
         CEncoder::memError(name);
     }
-    return data;
 }
 
 constexpr std::size_t size(int count) {
@@ -72,15 +70,13 @@ void CEncoder::allocate_memory() {
     allocGlobal2();
     allocImageBuffers();
     allocFramePred();
-    g_sps = allocate(g_sps_store, 1, "allocate_memory: g_sps");
-    g_pps = allocate(g_pps_store, 1, "allocate_memory: g_pps");
+    allocate(g_sps, 1, "allocate_memory: g_sps");
+    allocate(g_pps, 1, "allocate_memory: g_pps");
 }
 
 void CEncoder::free_memory() {
-    g_sps_store.release();
-    g_pps_store.release();
-    g_sps = nullptr;
-    g_pps = nullptr;
+    g_sps.release();
+    g_pps.release();
     freeFramePred();
     freeImageBuffers();
     freeGlobal2();
@@ -93,104 +89,88 @@ void CEncoder::allocBitBuff() {
     g_nal_buf_size =
         static_cast<int>(std::clamp<std::int64_t>(samples * 3 / 2, 20000, kMaxNalBytes));
     g_nal_emul_size = static_cast<int>(std::min<std::int64_t>(samples / 100 + 100, kMaxNalBytes));
-    g_nal_buf = allocate(g_nal_store, size(g_nal_buf_size) + kSlack, "allocBitBuff: g_nal_buf");
-    g_nal_emul_pos =
-        allocate(g_nal_emul_store, size(g_nal_emul_size), "allocBitBuff: g_nal_emul_pos");
+    allocate(g_nal_buf, size(g_nal_buf_size) + kSlack, "allocBitBuff: g_nal_buf");
+    allocate(g_nal_emul_pos, size(g_nal_emul_size), "allocBitBuff: g_nal_emul_pos");
     g_nal_bitpos = 0;
 }
 
 void CEncoder::freeBitBuff() {
-    g_nal_store.release();
-    g_nal_emul_store.release();
-    g_nal_buf = nullptr;
-    g_nal_emul_pos = nullptr;
+    g_nal_buf.release();
+    g_nal_emul_pos.release();
 }
 
 void CEncoder::allocGlobal() {
-    g_slp = allocate(g_slp_store, 1, "allocFirst(): g_slp");
+    allocate(g_slp, 1, "allocFirst(): g_slp");
 }
 
 void CEncoder::freeGlobal() {
-    g_slp_store.release();
-    g_slp = nullptr;
+    g_slp.release();
 }
 
 void CEncoder::allocGlobal2() {
     const std::size_t mbs = size(g_num_mbs);
     const std::size_t blocks = size(g_blk_width) * size(g_blk_height);
-    g_i4mode = allocate(g_i4mode_store, size(g_blk_width + 2) * size(g_blk_height + 1),
-                        "allocGlobal2: g_i4mode");
-    g_mb_mode = allocate(g_mb_mode_store, mbs, "allocGlobal2: g_mb_mode");
-    g_mb_qp = allocate(g_mb_qp_store, mbs, "allocGlobal2: g_mb_qp");
-    g_blk_ref = allocate(g_blk_ref_store, blocks, "allocGlobal2: g_blk_ref");
-    g_blk_mvx = allocate(g_blk_mvx_store, blocks, "allocGlobal2: g_blk_mvx");
-    g_blk_mvy = allocate(g_blk_mvy_store, blocks, "allocGlobal2: g_blk_mvy");
-    g_lf_data = allocate(g_lf_data_store, mbs, "allocGlobals2: g_lf_data");
-    g_coded_blocks = allocate(g_coded_blocks_store, mbs, "allocGlobal2: g_coded_blocks");
-    g_cnum_l = allocate(g_cnum_l_store, blocks, "allocGlobal2:g_cnum_l");
-    g_cnum_u = allocate(g_cnum_u_store, blocks / 4, "allocGlobal2:g_cnum_u");
-    g_cnum_v = allocate(g_cnum_v_store, blocks / 4, "allocGlobal2:g_cnum_v");
+    allocate(g_i4mode, size(g_blk_width + 2) * size(g_blk_height + 1), "allocGlobal2: g_i4mode");
+    allocate(g_mb_mode, mbs, "allocGlobal2: g_mb_mode");
+    allocate(g_mb_qp, mbs, "allocGlobal2: g_mb_qp");
+    allocate(g_blk_ref, blocks, "allocGlobal2: g_blk_ref");
+    allocate(g_blk_mvx, blocks, "allocGlobal2: g_blk_mvx");
+    allocate(g_blk_mvy, blocks, "allocGlobal2: g_blk_mvy");
+    allocate(g_lf_data, mbs, "allocGlobals2: g_lf_data");
+    allocate(g_coded_blocks, mbs, "allocGlobal2: g_coded_blocks");
+    allocate(g_cnum_l, blocks, "allocGlobal2:g_cnum_l");
+    allocate(g_cnum_u, blocks / 4, "allocGlobal2:g_cnum_u");
+    allocate(g_cnum_v, blocks / 4, "allocGlobal2:g_cnum_v");
 }
 
 void CEncoder::freeGlobal2() {
-    g_i4mode_store.release();
-    g_mb_mode_store.release();
-    g_mb_qp_store.release();
-    g_blk_ref_store.release();
-    g_blk_mvx_store.release();
-    g_blk_mvy_store.release();
-    g_lf_data_store.release();
-    g_coded_blocks_store.release();
-    g_cnum_l_store.release();
-    g_cnum_u_store.release();
-    g_cnum_v_store.release();
-    g_i4mode = g_blk_ref = nullptr;
-    g_mb_mode = g_mb_qp = g_cnum_l = g_cnum_u = g_cnum_v = nullptr;
-    g_blk_mvx = g_blk_mvy = nullptr;
-    g_coded_blocks = nullptr;
-    g_lf_data = nullptr;
+    g_i4mode.release();
+    g_mb_mode.release();
+    g_mb_qp.release();
+    g_blk_ref.release();
+    g_blk_mvx.release();
+    g_blk_mvy.release();
+    g_lf_data.release();
+    g_coded_blocks.release();
+    g_cnum_l.release();
+    g_cnum_u.release();
+    g_cnum_v.release();
 }
 
 void CEncoder::allocImageBuffers() {
     const std::size_t picture = size(g_size_Y) + 2 * size(g_size_U);
-    std::uint8_t* images =
-        allocate(g_alloc_images, 2 * picture + kSlack, "allocImageBuffers: g_alloc_images");
-    g_cur_y = images + g_origin_luma;
-    g_cur_u = images + g_size_Y + g_origin_chroma;
+    allocate(g_alloc_images, 2 * picture + kSlack, "allocImageBuffers: g_alloc_images");
+    g_cur_y = g_alloc_images + g_origin_luma;
+    g_cur_u = g_alloc_images + g_size_Y + g_origin_chroma;
     g_cur_v = g_cur_u + g_size_U;
     g_ref_y = g_cur_y + picture;
     g_ref_u = g_cur_u + picture;
     g_ref_v = g_cur_v + picture;
-    g_mv_array = allocate(g_mv_store, size(g_num_mbs), "allocImageBuffers: g_mv_array");
+    allocate(g_mv_array, size(g_num_mbs), "allocImageBuffers: g_mv_array");
 }
 
 void CEncoder::freeImageBuffers() {
     g_alloc_images.release();
-    g_mv_store.release();
+    g_mv_array.release();
     g_cur_y = g_cur_u = g_cur_v = nullptr;
     g_ref_y = g_ref_u = g_ref_v = nullptr;
-    g_mv_array = nullptr;
 }
 
 void CEncoder::allocFramePred() {
-    std::uint8_t* planes =
-        allocate(g_half_planes, 3 * size(g_size_Y) + kSlack, "allocFramePred: g_half_planes");
-    g_half_v_L0 = planes + g_origin_luma;
+    allocate(g_half_planes, 3 * size(g_size_Y) + kSlack, "allocFramePred: g_half_planes");
+    g_half_v_L0 = g_half_planes + g_origin_luma;
     g_half_h_L0 = g_half_v_L0 + g_size_Y;
     g_half_hv_L0 = g_half_h_L0 + g_size_Y;
-    g_me_mb_L0 = allocate(g_me_mb_store, size(g_num_mbs), "allocFramePred: g_me_mb_L0");
-    g_visit_L0 = allocate(g_visit_store, size(g_visit_dim) * size(g_visit_dim),
-                          "allocFramePred: g_visit_L0");
+    allocate(g_me_mb_L0, size(g_num_mbs), "allocFramePred: g_me_mb_L0");
+    allocate(g_visit_L0, size(g_visit_dim) * size(g_visit_dim), "allocFramePred: g_visit_L0");
     g_visit_stamp = 0;
 }
 
 void CEncoder::freeFramePred() {
     g_half_planes.release();
-    g_me_mb_store.release();
-    g_visit_store.release();
+    g_me_mb_L0.release();
+    g_visit_L0.release();
     g_half_v_L0 = g_half_h_L0 = g_half_hv_L0 = nullptr;
-    g_me_mb_L0 = nullptr;
-    g_visit_L0 = nullptr;
 }
 
 void CEncoder::exitOnError(const char* msg, int status) {

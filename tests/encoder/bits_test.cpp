@@ -57,7 +57,7 @@ TEST(Bits, FieldsAndExpGolombCodesReadBack) {
     engine.ResetNALUnit();
     engine.GetNALUnit(&bits);
     EXPECT_EQ(bits, 0);
-    EXPECT_EQ(std::count(engine.g_nal_buf, engine.g_nal_buf + engine.g_nal_buf_size, 0),
+    EXPECT_EQ(std::count(engine.g_nal_buf.data(), engine.g_nal_buf + engine.g_nal_buf_size, 0),
               engine.g_nal_buf_size);
 }
 
@@ -66,7 +66,7 @@ TEST(Bits, WritesOverOldContent) {
     CEncoder engine(16, 16);
     for (int position = 0; position < 8; ++position) {
         for (int length = 1; length <= CEncoder::kMaxWrite; ++length) {
-            std::fill(engine.g_nal_buf, engine.g_nal_buf + 32, std::uint8_t{0xff});
+            std::fill(engine.g_nal_buf.data(), engine.g_nal_buf + 32, std::uint8_t{0xff});
             engine.g_nal_buf[0] = 0;
             engine.g_nal_bitpos = static_cast<unsigned>(position);
             engine.write_bits(0, length);
@@ -131,7 +131,7 @@ TEST(ParameterSets, BytesForPictureSizes) {
 // Ends an RBSP whose bits stand in bytes, `spare` bits short of their end.
 bool end_nal_unit(CEncoder& engine, const Bytes& bytes, unsigned spare) {
     engine.ResetNALUnit();
-    std::copy(bytes.begin(), bytes.end(), engine.g_nal_buf);
+    std::copy(bytes.begin(), bytes.end(), engine.g_nal_buf.data());
     engine.g_nal_bitpos = static_cast<unsigned>(8 * bytes.size()) - spare;
     return engine.writeNALUnit();
 }

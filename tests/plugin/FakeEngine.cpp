@@ -36,12 +36,11 @@ void note(const char* call, double value) {
 CEncoder::CEncoder(int width, int height, const zolt::Kernels*) : g_width(width), g_height(height) {
     note("width", width);
     note("height", height);
-    g_nal_buf = new std::uint8_t[16]();
+    g_nal_buf.allocate(16);
     ++FakeEngine::alive;
 }
 
 CEncoder::~CEncoder() {
-    delete[] g_nal_buf;
     --FakeEngine::alive;
 }
 
@@ -77,14 +76,14 @@ void CEncoder::initialize_encoder() {
 void CEncoder::encode_sps() {
     note("sps");
     const std::uint8_t unit[] = {0x47, 1, 2};
-    std::copy(unit, unit + 3, g_nal_buf);
+    std::copy(unit, unit + 3, g_nal_buf.data());
     g_nal_bitpos = 24;
 }
 
 void CEncoder::encode_pps() {
     note("pps");
     const std::uint8_t unit[] = {0x48, 3};
-    std::copy(unit, unit + 2, g_nal_buf);
+    std::copy(unit, unit + 2, g_nal_buf.data());
     g_nal_bitpos = 16;
 }
 
@@ -101,7 +100,7 @@ void CEncoder::encode_frame(const void* frame) {
 
 int CEncoder::copy_nal_unit(void* dst, int max) const {
     const int size = std::min(get_nal_size(), max);
-    std::copy(g_nal_buf, g_nal_buf + size, static_cast<std::uint8_t*>(dst));
+    std::copy_n(g_nal_buf.data(), size, static_cast<std::uint8_t*>(dst));
     return size;
 }
 

@@ -187,9 +187,9 @@ TEST(SliceHeaders, CountersGoRound) {
 // Bits of a picture at a QP, coded by an engine whose buffer holds it.
 std::size_t bits_in_a_large_buffer(const Sequence& sequence, const Bytes& picture, int qp) {
     Encoding encoding(sequence.width, sequence.height, {qp, 0, 3});
-    Bytes large(4 * sequence.picture_size());
-    encoding.engine().g_nal_buf = large.data();
-    encoding.engine().g_nal_buf_size = static_cast<int>(large.size()) - 64;
+    const std::size_t bytes = 4 * sequence.picture_size();
+    EXPECT_TRUE(encoding.engine().g_nal_buf.allocate(bytes));
+    encoding.engine().g_nal_buf_size = static_cast<int>(bytes) - 64;
     return 8 * encoding.encode(picture.data()).size();
 }
 
@@ -263,7 +263,7 @@ TEST(VisitStamps, GoRound) {
         if (n == 2) {
             engine.g_visit_stamp = 0xffffffff - 5;
             const std::size_t dimension = static_cast<std::size_t>(engine.g_visit_dim);
-            std::fill(engine.g_visit_L0, engine.g_visit_L0 + dimension * dimension, 3u);
+            std::fill_n(engine.g_visit_L0.data(), dimension * dimension, 3u);
         }
         sequence.draw(n, picture.data());
         EXPECT_EQ(around.encode(picture.data()), plain.encode(picture.data())) << "picture " << n;
