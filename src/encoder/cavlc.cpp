@@ -394,6 +394,7 @@ std::uint8_t CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned 
     }
     int trailing_ones = 0;
     unsigned signs = 0;
+    // NOLINTNEXTLINE(clang-analyzer-core.CallAndMessage): the first `total` levels are set.
     while (trailing_ones < std::min(total, 3) && std::abs(level[trailing_ones]) == 1) {
         signs = signs << 1 | (level[trailing_ones] < 0 ? 1u : 0u);
         ++trailing_ones;

@@ -17,7 +17,8 @@ void extend_edges(uint8_t* origin, int width, int height, ptrdiff_t stride, int 
         std::memset(row - border, row[0], static_cast<std::size_t>(border));
         std::memset(row + width, row[width - 1], static_cast<std::size_t>(border));
     }
-    const std::size_t row_size = static_cast<std::size_t>(width + 2 * border);
+    const std::size_t row_size =
+        static_cast<std::size_t>(width) + 2 * static_cast<std::size_t>(border);
     uint8_t* first = origin - border;
     uint8_t* last = first + (height - 1) * stride;
     for (int y = 1; y <= border; ++y) {
