@@ -311,21 +311,51 @@ TEST_F(ProxiesWithHost, TheListenerHearsOfEveryError) {
 
 // Constructed before the proxies' objects and so destroyed after them.
 struct LateUser {
-    bool unloads = false;
+    void (*use)() = nullptr;
     ~LateUser() {
-        if (unloads) {
-            ErrMgr::Unload();
-            Logger::EndLogging();
-            Logger::Unload();
+        if (use != nullptr) {
+            use();
         }
     }
 };
 [[gnu::init_priority(101)]] LateUser late_user;
 
+// For late users, which are too late for an expectation.
+void require(bool holds, const char* what) {
+    if (!holds) {
+        std::fprintf(stderr, "after the proxies' end: not so: %s\n", what);
+        std::_Exit(1);
+    }
+}
+
+int late_lines = 0;
+
+// The proxy in question is the only one that holds the host's library, so that giving its object
+// back would unload that.
 TEST_F(ProxiesWithHost, StayAsTheyAreAfterTheirEnd) {
     in_own_process([] {
-        ErrMgr::AddErr("class", "method", nullptr, "message");
-        late_user.unloads = true;
+        Logger::Unload();
+        EXPECT_FALSE(ErrMgr::Load());
+        late_user.use = [] {
+            ErrMgr::Unload();
+            require(host_is_loaded(), "ErrMgr::Unload keeps the library");
+            ErrMgr::ClearErrorTrace();
+            ErrMgr::AddErr("C", "M", nullptr, "late");
+            const IErrData* error = ErrMgr::GetError();
+            require(error != nullptr && error->Message() == std::string("late"),
+                    "errors reach the error manager");
+        };
+    });
+    in_own_process([] {
+        EXPECT_FALSE(Logger::StartLoggingToFunc([](char*) { late_lines++; }));
+        late_user.use = [] {
+            Logger::Unload();
+            require(host_is_loaded(), "Logger::Unload keeps the library");
+            Logger::EndLogging();
+            require(host_is_loaded(), "Logger::EndLogging keeps the library");
+            Logger::Log("late");
+            require(late_lines == 1, "lines reach the logger");
+        };
     });
 }
 

@@ -61,6 +61,19 @@ class Usage(ToolTest):
         self.assert_fails(self.zoltenc("in.y4m", "-o", ""), 2, "file name")
         self.assert_fails(self.zoltenc("synthetic:0x0", "-o", "out.264"), 2, "16x16")
 
+    def test_sizes_beyond_every_level_are_refused_before_anything_is_written(self):
+        limits = "too large", "16880 samples a side", "139264 macroblocks"
+        for size in ("16x20000", "16881x16", "16x53687040", "16880x2128", "16880x16880",
+                     "2147483647x2147483647"):
+            for source in ([f"synthetic:{size}@25:1"], ["/dev/zero", "-s", size],
+                           ["/dev/zero", "-s", size, "-f", "RGBA"]):
+                with self.subTest(source=source):
+                    result = self.zoltenc(*source, "-n", "1", "-o", "out.264", stub=False)
+                    self.assert_fails(result, 2, size, *limits)
+                    self.assertEqual(self.files(), [])
+        for size in ("16x16880", "16880x2112"):
+            self.assert_succeeds(self.zoltenc("/dev/zero", "-s", size, "-n", "1", "-o", "out.264"))
+
     def test_help_and_version_go_to_standard_output(self):
         for option, text in (("--help", b"--keyint"), ("--version", b"zoltenc ")):
             result = self.assert_succeeds(self.zoltenc(option))
