@@ -6,8 +6,11 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
+#include <cstdint>
 #include <cstdlib>
 #include <functional>
+#include <ostream>
 #include <set>
 #include <sstream>
 #include <string>
@@ -18,6 +21,7 @@
 #include "common/Encoding.h"
 #include "common/Random.h"
 #include "common/Sequence.h"
+#include "encoder/CEncoder.h"
 #include "kernels/Kernels.h"
 
 namespace {
@@ -42,6 +46,10 @@ struct Vector {
     int x = 0, y = 0;
 };
 
+std::ostream& operator<<(std::ostream& out, Vector v) {
+    return out << "(" << v.x << ", " << v.y << ")";
+}
+
 struct Record {
     int x = 0, y = 0, dx = 0, dy = 0;
     unsigned sad = 0, cost = 0;
@@ -52,8 +60,19 @@ struct Record {
 };
 
 std::ostream& operator<<(std::ostream& out, const Record& r) {
-    return out << "(" << r.x << ", " << r.y << ") + (" << r.dx << ", " << r.dy << ")/4 sad "
-               << r.sad << " cost " << r.cost;
+    return out << Vector{r.x, r.y} << " + " << Vector{r.dx, r.dy} << "/4 sad " << r.sad << " cost "
+               << r.cost;
+}
+
+// Results of the two stages of a search.
+struct Found {
+    Record integer, refined;
+
+    bool operator==(const Found& o) const { return integer == o.integer && refined == o.refined; }
+};
+
+std::ostream& operator<<(std::ostream& out, const Found& f) {
+    return out << f.integer << ", then " << f.refined;
 }
 
 // A plane with its border.
@@ -122,10 +141,9 @@ public:
                   }),
           records_(static_cast<std::size_t>(width / 16 * (height / 16))) {}
 
-    // Searches the next macroblock, whose predicted vector is `predicted` quarter pels; `integer`
-    // and `refined` become the results of the two stages.
-    void search(int mb_x, int mb_y, Vector predicted, unsigned lambda, Record& integer,
-                Record& refined) {
+    // Searches a macroblock, whose predicted vector is `predicted` quarter pels, and keeps the
+    // integer result for its neighbours.
+    Found search(int mb_x, int mb_y, Vector predicted, unsigned lambda) {
         px_ = 16 * mb_x;
         py_ = 16 * mb_y;
         predicted_ = predicted;
@@ -135,12 +153,15 @@ public:
         visited_.clear();
 
         integer_search();
-        integer = best_;
-        records_[static_cast<std::size_t>(mb_y * (width_ / 16) + mb_x)] = best_;
+        const Record integer = best_;
+        keep(mb_y * (width_ / 16) + mb_x, integer);
         refine({{0, 2}, {0, -2}, {2, 0}, {-2, 0}, {2, 2}, {-2, 2}, {2, -2}, {-2, -2}}, false);
         refine({{1, 0}, {0, 1}, {-1, 0}, {0, -1}, {1, 1}, {-1, 1}, {1, -1}, {-1, -1}}, true);
-        refined = best_;
+        return {integer, best_};
     }
+
+    // The integer result of a macroblock.
+    void keep(int mb, const Record& integer) { records_[static_cast<std::size_t>(mb)] = integer; }
 
 private:
     int sample(const std::uint8_t* p, int stride, int x, int y) const {
@@ -338,7 +359,7 @@ private:
     std::set<std::pair<int, int>> visited_;
 };
 
-// Predicted vector of a 16x16 partition with reference index 0, in quarter pels.
+// Predicted vector of a 16x16 partition with reference index 0, in quarter pels (clause 8.4.1.3).
 Vector predicted_vector(const CEncoder& e, int mb_x, int mb_y) {
     struct Motion {
         bool available;
@@ -371,11 +392,17 @@ Record record(const _mv& m) {
     return {m.x, m.y, m.dx, m.dy, m.sad, m.cost};
 }
 
+// What the engine found for a macroblock. The record of the integer stage has no fractions.
+Found engine_found(const CEncoder& e, int mb) {
+    Found found{record(e.g_me_mb_L0[mb]), record(e.g_mv_array[mb])};
+    found.integer.dx = found.integer.dy = 0;
+    return found;
+}
+
 // Codes a sequence and searches along. Returns the first macroblock where the two differ, or
 // nothing; adds the number of searches to `searches`.
-std::string compare(const Sequence& sequence, const Settings& settings, int& searches,
-                    const zolt::Kernels* kernels = nullptr) {
-    Encoding encoding(sequence.width, sequence.height, settings, kernels);
+std::string compare(const Sequence& sequence, const Settings& settings, int& searches) {
+    Encoding encoding(sequence.width, sequence.height, settings);
     const CEncoder& e = encoding.engine();
     std::vector<std::uint8_t> source(sequence.picture_size()), reference;
     for (int n = 0; n < sequence.pictures; ++n, reference = encoding.reconstruction()) {
@@ -389,25 +416,21 @@ std::string compare(const Sequence& sequence, const Settings& settings, int& sea
         for (int mb = 0; mb < e.g_num_mbs; ++mb, ++searches) {
             const int mb_x = mb % e.g_mb_width, mb_y = mb / e.g_mb_width;
             const Vector predicted = predicted_vector(e, mb_x, mb_y);
-            Record integer, refined;
-            model.search(mb_x, mb_y, predicted, kLambda[std::max(e.g_mb_qp[mb] - 12, 0)], integer,
-                         refined);
-            Record engine_integer = record(e.g_me_mb_L0[mb]);
-            engine_integer.dx = engine_integer.dy = 0;  // not of this stage
-            const Record engine_refined = record(e.g_mv_array[mb]);
+            const Found model_found =
+                model.search(mb_x, mb_y, predicted, kLambda[std::max(e.g_mb_qp[mb] - 12, 0)]);
+            const Found found = engine_found(e, mb);
             // A macroblock coded in inter mode is coded with the vector that was found.
             const int block = 4 * mb_y * e.g_blk_width + 4 * mb_x;
-            const bool coded =
-                e.g_blk_ref[block] < 0 || (e.g_blk_mvx[block] == 4 * refined.x + refined.dx &&
-                                           e.g_blk_mvy[block] == 4 * refined.y + refined.dy);
-            if (!(engine_integer == integer) || !(engine_refined == refined) || !coded) {
+            const Vector coded = {e.g_blk_mvx[block], e.g_blk_mvy[block]};
+            const Record& r = model_found.refined;
+            const bool as_found =
+                e.g_blk_ref[block] < 0 || (coded.x == 4 * r.x + r.dx && coded.y == 4 * r.y + r.dy);
+            if (!(found == model_found) || !as_found) {
                 std::ostringstream message;
                 message << sequence.name << " " << settings.name() << " picture " << n
-                        << " macroblock (" << mb_x << ", " << mb_y << "), predicted ("
-                        << predicted.x << ", " << predicted.y << ")/4:\n  engine " << engine_integer
-                        << ", then " << engine_refined << ", coded (" << e.g_blk_mvx[block] << ", "
-                        << e.g_blk_mvy[block] << ")/4\n  model  " << integer << ", then "
-                        << refined;
+                        << " macroblock " << Vector{mb_x, mb_y} << ", predicted " << predicted
+                        << "/4:\n  engine " << found << ", coded " << coded << "/4\n  model  "
+                        << model_found;
                 return message.str();
             }
         }
@@ -433,6 +456,186 @@ TEST_P(SearchOracle, GeneratedSequences) {
 
 INSTANTIATE_TEST_SUITE_P(SearchKinds, SearchOracle, testing::ValuesIn(zolt_test::generated_kinds()),
                          [](const auto& test) { return test.param; });
+
+// ---- Material that brings out single rules of the search ----
+
+constexpr int kPictures = 4;  // of a sequence
+constexpr int kRounds = 60;   // sequences of a test
+
+// Luma given by a function of picture and position; grey.
+Sequence grey(const std::string& name, int width, int height,
+              const std::function<int(int n, int x, int y)>& sample) {
+    const auto draw = [=](int n, std::uint8_t* out) {
+        for (int y = 0; y < height; ++y) {
+            for (int x = 0; x < width; ++x) {
+                *out++ = static_cast<std::uint8_t>(std::clamp(sample(n, x, y), 0, 255));
+            }
+        }
+        std::fill_n(out, width / 2 * (height / 2) * 2, std::uint8_t{128});
+    };
+    return {name + "_" + std::to_string(width) + "x" + std::to_string(height), width, height,
+            kPictures, draw};
+}
+
+// 0..65535, by the position; x, y, seed not negative.
+int noise(int x, int y, int seed) {
+    std::uint64_t key = static_cast<std::uint64_t>(seed);
+    for (const int v : {y, x}) {
+        key = key << 20 | static_cast<std::uint64_t>(v);
+    }
+    return static_cast<int>(Random(key).next() >> 16);
+}
+
+// Smooth: random heights -128..127 on a lattice, linear in between.
+int hills(int x, int y, int cell, int seed) {
+    x += 16 * 1024;
+    y += 16 * 1024;
+    const auto height = [&](int i, int j) { return noise(x / cell + i, y / cell + j, seed) % 256; };
+    const int u = x % cell, v = y % cell;
+    const int sum = (height(0, 0) * (cell - u) + height(1, 0) * u) * (cell - v) +
+                    (height(0, 1) * (cell - u) + height(1, 1) * u) * v;
+    return sum / (cell * cell) - 128;
+}
+
+// Single samples on flat ground: distortions of few values, unevenly spread over a block.
+Sequence stars(Random& random, int width, int height) {
+    const int seed = random.between(0, 9999), rarity = random.between(8, 160);
+    const int light = random.between(20, 120);
+    return grey("stars" + std::to_string(seed), width, height, [=](int n, int x, int y) {
+        return 100 + (noise(x, y, seed + n) % rarity ? 0 : light);
+    });
+}
+
+// A landscape that moves far, which only steady steps can follow, also out of the picture.
+Sequence sweep(Random& random, int width, int height) {
+    const int seed = random.between(0, 9999), cell = random.between(12, 60);
+    const int x_speed = random.between(-30, 30), y_speed = random.between(-30, 30);
+    const int grain = random.between(1, 12);
+    return grey("sweep" + std::to_string(seed), width, height, [=](int n, int x, int y) {
+        return 128 + hills(x + n * x_speed, y + n * y_speed, cell, seed) +
+               noise(x, y, seed + n) % grain;
+    });
+}
+
+// Every macroblock with a contrast and a motion of its own.
+Sequence mosaic(Random& random, int width, int height) {
+    const int seed = random.between(0, 9999), cell = random.between(2, 12);
+    const int speed = random.between(1, 40), contrast = random.between(8, 128);
+    return grey("mosaic" + std::to_string(seed), width, height, [=](int n, int x, int y) {
+        Random own(static_cast<std::uint64_t>(noise(x / 16, y / 16, seed + n)));
+        const int scale = own.between(1, contrast);
+        const int dx = own.between(-speed, speed), dy = own.between(-speed, speed);
+        return 128 + hills(x + dx, y + dy, cell, seed) * scale / 128;
+    });
+}
+
+// In every other picture the samples whose distortion is measured first move unlike the others: a
+// vector that suits them need not suit the rest.
+Sequence split(Random& random, int width, int height) {
+    const int seed = random.between(0, 9999), cell = 4 * random.between(2, 12);
+    const int spread = random.between(1, 24), contrast = random.between(16, 128);
+    return grey("split" + std::to_string(seed), width, height, [=](int n, int x, int y) {
+        Random own(static_cast<std::uint64_t>(noise(x / 16, y / 16, seed + n)));
+        const int others = x % 2 + y % 2;
+        int dx = 0, dy = 0;
+        for (int i = 0; i < n % 2 + (others ? 1 : 0); ++i) {
+            dx = own.between(-spread, spread);
+            dy = own.between(-spread, spread);
+        }
+        return 128 + hills(4 * x + n % 2 * dx, 4 * y + n % 2 * dy, cell, seed) * contrast / 128;
+    });
+}
+
+using Material = Sequence (*)(Random& random, int width, int height);
+constexpr std::array<Material, 4> kMaterials = {stars, sweep, mosaic, split};
+
+class SearchOracleMaterial : public testing::TestWithParam<int> {};
+
+TEST_P(SearchOracleMaterial, SmallPictures) {
+    Random random(static_cast<std::uint64_t>(GetParam()));
+    for (int i = 0; i < kRounds; ++i) {
+        const int width = 16 * random.between(1, 5), height = 16 * random.between(1, 5);
+        const auto material = kMaterials[static_cast<std::size_t>(i % 4)];
+        const Sequence sequence = material(random, width, height);
+        const int qp = i % 2 ? random.between(0, 15) : random.between(10, 45);
+        int searches = 0;
+        ASSERT_EQ(compare(sequence, {qp, 0, 30}, searches), "");
+    }
+}
+
+// Two pictures of random samples, and around every macroblock a random outcome of the searches and
+// codings before: also such as pictures seldom or never lead to.
+TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
+    Random random(static_cast<std::uint64_t>(GetParam() + 1000));
+    for (int i = 0; i < kRounds; ++i) {
+        const int width = 16 * random.between(1, 4), height = 16 * random.between(1, 4);
+        const Sequence sequence =
+            kMaterials[static_cast<std::size_t>(i % 4)](random, width, height);
+        std::vector<std::uint8_t> source(sequence.picture_size()), reference(source);
+        sequence.draw(0, reference.data());
+        sequence.draw(1, source.data());
+        // In turn with every table of sample loops that this processor can run.
+        const auto& tables = zolt::kernel_tables();
+        const zolt::Kernels& kernels = tables.begin()[i / 4 % (tables.end() - tables.begin())];
+        CEncoder e(width, height, &kernels);
+        for (int y = 0; y < height; ++y) {
+            std::copy_n(&source[static_cast<std::size_t>(y * width)], width,
+                        e.g_cur_y + y * e.g_stride_luma);
+            std::copy_n(&reference[static_cast<std::size_t>(y * width)], width,
+                        e.g_ref_y + y * e.g_stride_luma);
+        }
+        e.framePredInitP();
+        SearchModel model(width, height, source.data(), width, reference.data());
+        for (int n = 0; n < 32 * e.g_num_mbs; ++n) {
+            const int mb = n % e.g_num_mbs;
+            const int reach = std::array{1, 4, 20, 38}[random.next() % 4];
+            // Anywhere, or where the block is about to leave the picture's surroundings.
+            const auto component = [&](int position, int size) {
+                const int edge = random.between(0, 1) ? -19 - position : size - position + 2;
+                return random.between(0, 1) ? random.between(-reach, reach)
+                                            : edge + random.between(-3, 3);
+            };
+            const Vector about = {component(16 * (mb % e.g_mb_width), width),
+                                  component(16 * (mb / e.g_mb_width), height)};
+            const int near = random.between(0, 3);
+            const unsigned most = random.between(0, 1) ? 1100u : 20000u;
+            for (int other = 0; other < e.g_num_mbs; ++other) {
+                Record r;
+                r.x = std::clamp(about.x + random.between(-near, near), -38, 38);
+                r.y = std::clamp(about.y + random.between(-near, near), -38, 38);
+                r.sad = random.next() % most;
+                model.keep(other, r);
+                _mv& kept = e.g_me_mb_L0[other];
+                kept.x = static_cast<std::int16_t>(r.x);
+                kept.y = static_cast<std::int16_t>(r.y);
+                kept.sad = r.sad;
+                const int ref = random.between(0, 3) ? 0 : -1;
+                const int mvx = ref < 0 ? 0 : 4 * r.x + random.between(-12, 12);
+                const int mvy = ref < 0 ? 0 : 4 * r.y + random.between(-12, 12);
+                for (int block = 0; block < 16; ++block) {
+                    const int at = (4 * (other / e.g_mb_width) + block / 4) * e.g_blk_width +
+                                   4 * (other % e.g_mb_width) + block % 4;
+                    e.g_blk_ref[at] = static_cast<std::int8_t>(ref);
+                    e.g_blk_mvx[at] = static_cast<std::int16_t>(mvx);
+                    e.g_blk_mvy[at] = static_cast<std::int16_t>(mvy);
+                }
+            }
+            e.g_mapMBNumber = mb;
+            e.g_mbQp = random.between(0, 3) ? random.between(0, 24) : 51;
+            e.setMBOffsets();
+            e.generateMBPred();
+            const Vector predicted = predicted_vector(e, e.g_mb_x, e.g_mb_y);
+            const Found model_found =
+                model.search(e.g_mb_x, e.g_mb_y, predicted, kLambda[std::max(e.g_mbQp - 12, 0)]);
+            ASSERT_EQ(engine_found(e, mb), model_found)
+                << sequence.name << " " << kernels.name << " search " << n << " macroblock "
+                << Vector{e.g_mb_x, e.g_mb_y} << ", predicted " << predicted << "/4, QP "
+                << e.g_mbQp;
+        }
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(SearchMaterial, SearchOracleMaterial, testing::Range(0, 10));
 
 TEST(SearchOracleClips, FirstPictures) {
     const char* folder = std::getenv("ZOLT_TEST_CLIPS");
