@@ -520,7 +520,7 @@ Sequence sweep(Random& random, int width, int height) {
 // Every macroblock with a contrast and a motion of its own.
 Sequence mosaic(Random& random, int width, int height) {
     const int seed = random.between(0, 9999), cell = random.between(2, 12);
-    const int speed = random.between(1, 40), contrast = random.between(8, 128);
+    const int speed = random.between(1, 40), contrast = 8 << random.between(0, 4);
     return grey("mosaic" + std::to_string(seed), width, height, [=](int n, int x, int y) {
         Random own(static_cast<std::uint64_t>(noise(x / 16, y / 16, seed + n)));
         const int scale = own.between(1, contrast);
@@ -533,7 +533,7 @@ Sequence mosaic(Random& random, int width, int height) {
 // vector that suits them need not suit the rest.
 Sequence split(Random& random, int width, int height) {
     const int seed = random.between(0, 9999), cell = 4 * random.between(2, 12);
-    const int spread = random.between(1, 24), contrast = random.between(16, 128);
+    const int spread = 4 << random.between(0, 4), contrast = 8 << random.between(0, 4);
     return grey("split" + std::to_string(seed), width, height, [=](int n, int x, int y) {
         Random own(static_cast<std::uint64_t>(noise(x / 16, y / 16, seed + n)));
         const int others = x % 2 + y % 2;
@@ -598,11 +598,15 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
             const Vector about = {component(16 * (mb % e.g_mb_width), width),
                                   component(16 * (mb / e.g_mb_width), height)};
             const int near = random.between(0, 3);
+            const int grid = random.between(0, 1) ? 4 : 1;  // 4: on the spiral's points
             const unsigned most = random.between(0, 1) ? 1100u : 20000u;
             for (int other = 0; other < e.g_num_mbs; ++other) {
                 Record r;
-                r.x = std::clamp(about.x + random.between(-near, near), -38, 38);
-                r.y = std::clamp(about.y + random.between(-near, near), -38, 38);
+                const auto around = [&](int v) {
+                    return std::clamp((v / grid + random.between(-near, near)) * grid, -38, 38);
+                };
+                r.x = around(about.x);
+                r.y = around(about.y);
                 r.sad = random.next() % most;
                 model.keep(other, r);
                 _mv& kept = e.g_me_mb_L0[other];
