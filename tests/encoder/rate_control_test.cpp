@@ -362,6 +362,11 @@ TEST(ChangingSettings, NotANumberStaysInsideTheLimits) {
         EXPECT_EQ(engine.g_mbQp, 28);
         *number = kept;
     }
+    // A number of bits that is none is 0.
+    engine.g_rc_frame_rate = NAN;
+    engine.g_pic_type = I_SLICE;
+    engine.FrameLevelRateControl();
+    EXPECT_EQ(engine.g_rc_remaining_bits, 0);
 }
 
 // ---- Model fits ----
