@@ -16,8 +16,6 @@ struct VideoAvcSeqParSet {
     std::uint32_t profile_idc = 0;
     std::uint32_t level_idc = 0;
     std::uint32_t seq_parameter_set_id = 0;
-    std::uint32_t chroma_format_idc = 1;  // 1 where the profile has no such field
-    std::uint8_t separate_colour_plane_flag = 0;
     std::uint32_t log2_max_frame_num_minus4 = 0;
     std::uint32_t pic_order_cnt_type = 0;
     std::uint32_t log2_max_pic_order_cnt_lsb_minus4 = 0;

@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include "avc/SliceHeader.h"
+#include "avcdump/SliceHeader.h"
 #include "media/IConfigVideoAvc.h"
 
 namespace zolt {

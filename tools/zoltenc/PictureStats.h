@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <string>
 
-#include "avc/ParameterSets.h"
+#include "avcdump/ParameterSets.h"
 #include "io/OutputFile.h"
 
 class IConfigVideoAvc;

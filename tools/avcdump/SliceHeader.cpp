@@ -1,4 +1,4 @@
-#include "avc/SliceHeader.h"
+#include "avcdump/SliceHeader.h"
 
 #include <iterator>
 #include <vector>
@@ -20,7 +20,7 @@ constexpr std::uint64_t kSliceSp = 3;
 // Reads the part of a slice header that depends on its parameter sets.
 class HeaderReader {
 public:
-    HeaderReader(BitStreamReader& reader, const VideoAvcSeqParSet& sps, const PicParSet& pps,
+    HeaderReader(BitStreamReader& reader, const SeqParSet& sps, const PicParSet& pps,
                  SliceHeader& header)
         : reader_(reader),
           sps_(sps),
@@ -56,12 +56,11 @@ private:
     }
 
     void read_picture_identity() {
-        if (sps_.separate_colour_plane_flag != 0) {
+        if (sps_.separate_colour_planes) {
             reader_.SkipBits(2);  // colour_plane_id
         }
-        header_.frame_num =
-            reader_.ReadUnsInt4(static_cast<int>(sps_.log2_max_frame_num_minus4) + 4);
-        if (sps_.frame_mbs_only_flag == 0) {
+        header_.frame_num = reader_.ReadUnsInt4(sps_.frame_num_bits);
+        if (!sps_.frame_mbs_only) {
             header_.field_pic = reader_.ReadBoolean();
             header_.bottom_field = header_.field_pic && reader_.ReadBoolean();
         }
@@ -71,15 +70,14 @@ private:
         const bool has_bottom_delta =
             pps_.bottom_field_pic_order_in_frame_present && !header_.field_pic;
         if (sps_.pic_order_cnt_type == 0) {
-            header_.pic_order_cnt_lsb =
-                reader_.ReadUnsInt4(static_cast<int>(sps_.log2_max_pic_order_cnt_lsb_minus4) + 4);
+            header_.pic_order_cnt_lsb = reader_.ReadUnsInt4(sps_.pic_order_cnt_lsb_bits);
         }
-        if (sps_.pic_order_cnt_type == 1 && sps_.delta_pic_order_always_zero_flag == 0) {
+        if (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero) {
             header_.delta_pic_order_cnt[0] = reader_.ReadSignedExpGolomb();
         }
         if (has_bottom_delta &&
             (sps_.pic_order_cnt_type == 0 ||
-             (sps_.pic_order_cnt_type == 1 && sps_.delta_pic_order_always_zero_flag == 0))) {
+             (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero))) {
             header_.delta_pic_order_cnt[1] = reader_.ReadSignedExpGolomb();
         }
         if (pps_.redundant_pic_cnt_present) {
@@ -132,8 +130,7 @@ private:
         if (!has_list(0) || (is_b ? pps_.weighted_bipred_idc != 1 : !pps_.weighted_pred)) {
             return;
         }
-        const bool has_chroma =  // ChromaArrayType is not 0
-            sps_.chroma_format_idc != 0 && sps_.separate_colour_plane_flag == 0;
+        const bool has_chroma = sps_.chroma_array_type() != 0;
         reader_.SkipExpGolomb();  // luma_log2_weight_denom
         if (has_chroma) {
             reader_.SkipExpGolomb();  // chroma_log2_weight_denom
@@ -185,7 +182,7 @@ private:
     static constexpr int kMaxCommands = 66;
 
     BitStreamReader& reader_;
-    const VideoAvcSeqParSet& sps_;
+    const SeqParSet& sps_;
     const PicParSet& pps_;
     SliceHeader& header_;
     std::array<std::uint64_t, 2> num_ref_idx_;
@@ -216,8 +213,7 @@ std::optional<SliceHeader> SliceHeader::read(const unsigned char* nal, int size,
     header.pic_parameter_set_id = reader.ReadExpGolomb();
 
     const PicParSet* const pps = sets.pic_par_set(header.pic_parameter_set_id);
-    const VideoAvcSeqParSet* const sps =
-        pps != nullptr ? sets.seq_par_set(pps->seq_par_set_id) : nullptr;
+    const SeqParSet* const sps = pps != nullptr ? sets.seq_par_set(pps->seq_par_set_id) : nullptr;
     if (sps != nullptr) {
         header.is_complete = HeaderReader(reader, *sps, *pps, header).read() && !is_cut_off();
     }

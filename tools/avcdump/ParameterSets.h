@@ -4,11 +4,26 @@
 #include <cstdint>
 #include <optional>
 
-#include "avc/VideoAvcParser.h"
-
 namespace zolt {
 
-// What a slice header's syntax depends on, of a picture parameter set (clause 7.3.2.2).
+// What a slice header's syntax depends on, of a sequence parameter set (clause 7.3.2.1).
+struct SeqParSet {
+    std::uint64_t id = 0;
+    std::uint64_t chroma_format_idc = 1;
+    bool separate_colour_planes = false;
+    int frame_num_bits = 4;
+    std::uint64_t pic_order_cnt_type = 0;
+    int pic_order_cnt_lsb_bits = 4;
+    bool delta_pic_order_always_zero = false;
+    bool frame_mbs_only = true;
+
+    // ChromaArrayType
+    std::uint64_t chroma_array_type() const {
+        return separate_colour_planes ? 0 : chroma_format_idc;
+    }
+};
+
+// The same of a picture parameter set (clause 7.3.2.2).
 struct PicParSet {
     std::uint64_t id = 0;
     std::uint64_t seq_par_set_id = 0;
@@ -30,11 +45,11 @@ public:
     void add_pic_par_set(const unsigned char* nal, int size);
 
     // Null when there is none of that identifier.
-    const VideoAvcSeqParSet* seq_par_set(std::uint64_t id) const;
+    const SeqParSet* seq_par_set(std::uint64_t id) const;
     const PicParSet* pic_par_set(std::uint64_t id) const;
 
 private:
-    std::array<std::optional<VideoAvcSeqParSet>, 32> seq_par_sets_;
+    std::array<std::optional<SeqParSet>, 32> seq_par_sets_;
     std::array<std::optional<PicParSet>, 256> pic_par_sets_;
 };
 

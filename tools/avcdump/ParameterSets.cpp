@@ -1,10 +1,11 @@
-#include "avc/ParameterSets.h"
+#include "avcdump/ParameterSets.h"
 
+#include <algorithm>
+#include <iterator>
 #include <vector>
 
 #include "avc/BitStreamReader.h"
 #include "avc/rbsp.h"
-#include "avc/seq_par_set.h"
 
 namespace zolt {
 namespace {
@@ -16,6 +17,44 @@ constexpr std::uint64_t kMaxRefIdx = 32;
 
 bool is_cut_off(const BitStreamReader& reader, const std::vector<unsigned char>& bytes) {
     return reader.GetBytePos() >= static_cast<int>(bytes.size());
+}
+
+// Clause 7.3.2.1.1: these profiles tell their chroma format.
+bool has_chroma_format(int profile_idc) {
+    constexpr int kProfiles[] = {44, 83, 86, 100, 110, 118, 122, 128, 134, 135, 138, 139, 244};
+    return std::find(std::begin(kProfiles), std::end(kProfiles), profile_idc) !=
+           std::end(kProfiles);
+}
+
+// scaling_list, clause 7.3.2.1.1.1.
+void skip_scaling_list(BitStreamReader& reader, int size) {
+    std::int64_t last = 8;
+    for (int i = 0; i < size; ++i) {
+        const std::int64_t next = (last + reader.ReadSignedExpGolomb()) & 255;
+        if (next == 0) {
+            return;
+        }
+        last = next;
+    }
+}
+
+void read_chroma_format(BitStreamReader& reader, SeqParSet& set) {
+    constexpr std::uint64_t kFormat444 = 3;
+    set.chroma_format_idc = reader.ReadExpGolomb();
+    if (set.chroma_format_idc == kFormat444) {
+        set.separate_colour_planes = reader.ReadBoolean();
+    }
+    reader.SkipExpGolomb();      // bit_depth_luma_minus8
+    reader.SkipExpGolomb();      // bit_depth_chroma_minus8
+    reader.SkipBoolean();        // qpprime_y_zero_transform_bypass_flag
+    if (reader.ReadBoolean()) {  // seq_scaling_matrix_present_flag
+        const int lists = set.chroma_format_idc == kFormat444 ? 12 : 8;
+        for (int i = 0; i < lists; ++i) {
+            if (reader.ReadBoolean()) {
+                skip_scaling_list(reader, i < 6 ? 16 : 64);
+            }
+        }
+    }
 }
 
 // The slice group part of a picture parameter set; false for values that do not exist.
@@ -55,12 +94,47 @@ bool skip_slice_groups(BitStreamReader& reader) {
 }  // namespace
 
 void ParameterSets::add_seq_par_set(const unsigned char* nal, int size) {
-    VideoAvcSeqParSet set;
-    if (read_seq_par_set(nal, size, set) && set.seq_parameter_set_id < seq_par_sets_.size() &&
-        set.chroma_format_idc <= 3 && set.log2_max_frame_num_minus4 <= kMaxLog2Minus4 &&
-        set.pic_order_cnt_type <= 2 && set.log2_max_pic_order_cnt_lsb_minus4 <= kMaxLog2Minus4) {
-        seq_par_sets_[set.seq_parameter_set_id] = set;
+    const std::vector<unsigned char> bytes = rbsp_bytes(nal, size, kMaxBytes);
+    BitStreamReader reader(bytes.data(), static_cast<int>(bytes.size()));
+    reader.SkipBytes(1);
+    const int profile_idc = reader.ReadUnsInt1();
+    reader.SkipBytes(2);  // constraint_set flags, level_idc
+
+    SeqParSet set;
+    const std::uint64_t id = reader.ReadExpGolomb();
+    if (has_chroma_format(profile_idc)) {
+        read_chroma_format(reader, set);
     }
+    const std::uint64_t log2_frame_num_minus4 = reader.ReadExpGolomb();
+    const std::uint64_t pic_order_cnt_type = reader.ReadExpGolomb();
+    std::uint64_t log2_lsb_minus4 = 0;
+    if (pic_order_cnt_type == 0) {
+        log2_lsb_minus4 = reader.ReadExpGolomb();
+    } else if (pic_order_cnt_type == 1) {
+        set.delta_pic_order_always_zero = reader.ReadBoolean();
+        reader.SkipSignedExpGolomb();  // offset_for_non_ref_pic
+        reader.SkipSignedExpGolomb();  // offset_for_top_to_bottom_field
+        const std::uint64_t cycle = reader.ReadExpGolomb();
+        for (std::uint64_t i = 0; i < cycle && !is_cut_off(reader, bytes); ++i) {
+            reader.SkipSignedExpGolomb();  // offset_for_ref_frame
+        }
+    }
+    reader.SkipExpGolomb();  // max_num_ref_frames
+    reader.SkipBoolean();    // gaps_in_frame_num_value_allowed_flag
+    reader.SkipExpGolomb();  // pic_width_in_mbs_minus1
+    reader.SkipExpGolomb();  // pic_height_in_map_units_minus1
+    set.frame_mbs_only = reader.ReadBoolean();
+
+    if (is_cut_off(reader, bytes) || id >= seq_par_sets_.size() || set.chroma_format_idc > 3 ||
+        log2_frame_num_minus4 > kMaxLog2Minus4 || pic_order_cnt_type > 2 ||
+        log2_lsb_minus4 > kMaxLog2Minus4) {
+        return;
+    }
+    set.id = id;
+    set.frame_num_bits = static_cast<int>(log2_frame_num_minus4) + 4;
+    set.pic_order_cnt_type = pic_order_cnt_type;
+    set.pic_order_cnt_lsb_bits = static_cast<int>(log2_lsb_minus4) + 4;
+    seq_par_sets_[id] = set;
 }
 
 void ParameterSets::add_pic_par_set(const unsigned char* nal, int size) {
@@ -97,7 +171,7 @@ void ParameterSets::add_pic_par_set(const unsigned char* nal, int size) {
     pic_par_sets_[id] = set;
 }
 
-const VideoAvcSeqParSet* ParameterSets::seq_par_set(std::uint64_t id) const {
+const SeqParSet* ParameterSets::seq_par_set(std::uint64_t id) const {
     return id < seq_par_sets_.size() && seq_par_sets_[id] ? &*seq_par_sets_[id] : nullptr;
 }
 

@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <optional>
 
-#include "avc/ParameterSets.h"
+#include "avcdump/ParameterSets.h"
 
 namespace zolt {
 
