@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include "avcdump/SliceHeader.h"
+#include "avc/SliceHeader.h"
 #include "media/IConfigVideoAvc.h"
 
 namespace zolt {

@@ -1,4 +1,4 @@
-#include "avcdump/ParameterSets.h"
+#include "avc/ParameterSets.h"
 
 #include <algorithm>
 #include <iterator>

@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <optional>
 
-#include "avcdump/ParameterSets.h"
+#include "avc/ParameterSets.h"
 
 namespace zolt {
 

@@ -1,4 +1,4 @@
-#include "avcdump/SliceHeader.h"
+#include "avc/SliceHeader.h"
 
 #include <iterator>
 #include <vector>
