@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -30,6 +31,27 @@ Bytes unit_of(const BitWriter& bits) {
 UnitRow add(UnitLister& lister, const BitWriter& bits) {
     const Bytes unit = unit_of(bits);
     return lister.add(unit.data(), static_cast<int>(unit.size()));
+}
+
+// A set whose chroma-format fields are taken for others, or others for them, does not give the
+// slice's QP.
+TEST(Avcdump, KnowsTheProfilesWithChromaFormatFields) {
+    const std::set<int> with_fields = {100, 110, 122, 244, 44, 83, 86, 118, 128};
+    for (int profile_idc = 0; profile_idc < 256; ++profile_idc) {
+        BitWriter bits;
+        bits.u(8, 0x67).u(8, static_cast<unsigned>(profile_idc)).u(16, 31).ue(0);
+        if (with_fields.count(profile_idc) != 0) {
+            bits.ue(1).ue(0).ue(0).u(2, 0);
+        }
+        bits.ue(12).ue(0).ue(12).ue(1).u(1, 0).ue(10).ue(8).u(1, 1).u(3, 0);
+        UnitLister lister(FrameRate{25, 1});
+        add(lister, bits.trailing());
+        add(lister, pic_par_set({}));
+        const UnitRow row = add(lister, idr_slice(0, 6));
+        ASSERT_TRUE(row.header);
+        EXPECT_TRUE(row.header->is_complete) << profile_idc;
+        EXPECT_EQ(row.header->slice_qp, 27) << profile_idc;
+    }
 }
 
 TEST(Avcdump, CountsPicturesAndTheirTimes) {
