@@ -4,24 +4,26 @@
 #include <array>
 #include <cstdint>
 #include <cstdio>
-#include <vector>
 
 #include "avc/BitStreamReader.h"
+#include "avc/PictureParameterSet.h"
+#include "avc/SequenceParameterSet.h"
+#include "avc/SliceHeader.h"
 #include "avc/VideoAvcParser.h"
 #include "avc/rbsp.h"
 
 namespace {
 
+using zolt::kSliceB;
+using zolt::kSliceI;
+using zolt::kSliceP;
+using zolt::kSliceSi;
+using zolt::kSliceSp;
+using zolt::read_log2_field;
+using zolt::read_ue;
+
 constexpr int kHeaderBits = 8;  // of the NAL unit header byte
 constexpr std::int64_t kMaxSizeInMbs = 65535;
-constexpr std::uint32_t kChromaFormat444 = 3;
-
-// slice_type modulo 5, table 7-6.
-constexpr std::uint32_t kSliceP = 0;
-constexpr std::uint32_t kSliceB = 1;
-constexpr std::uint32_t kSliceI = 2;
-constexpr std::uint32_t kSliceSp = 3;
-constexpr std::uint32_t kSliceSi = 4;
 
 // What the diagnostic lines of a slice tell. Bit positions count from the byte behind the header.
 struct SliceDiagnostics {
@@ -42,66 +44,10 @@ struct SliceDiagnostics {
     long end_pos = 0;
 };
 
-// ue(v) in 32 bits; only codes that are no valid syntax element exceed them.
-std::uint32_t read_ue(BitStreamReader& reader) {
-    return static_cast<std::uint32_t>(std::min<std::uint64_t>(reader.ReadExpGolomb(), UINT32_MAX));
-}
-
-// A field whose width is given by a log2_..._minus4 element; 0 for a width that no stream has.
-std::uint32_t read_log2_field(BitStreamReader& reader, std::uint32_t log2_minus4) {
-    return reader.ReadUnsInt4(static_cast<int>(std::min(log2_minus4, 32U)) + 4);
-}
-
 // Macroblocks of a dimension, 0 for one that no picture has.
 int size_in_mbs(std::uint32_t size_minus1) {
     const std::int64_t size = static_cast<std::int64_t>(size_minus1) + 1;
     return size <= kMaxSizeInMbs ? static_cast<int>(size) : 0;
-}
-
-// Clause 7.3.2.1.1: these profiles tell their chroma format.
-bool has_chroma_format(std::uint32_t profile_idc) {
-    switch (profile_idc) {
-        case 44:
-        case 83:
-        case 86:
-        case 100:
-        case 110:
-        case 118:
-        case 122:
-        case 128:
-        case 244:
-            return true;
-        default:
-            return false;
-    }
-}
-
-// scaling_list, clause 7.3.2.1.1.1.
-void skip_scaling_list(BitStreamReader& reader, int size) {
-    std::int64_t last_scale = 8;
-    std::int64_t next_scale = 8;
-    for (int i = 0; i < size && next_scale != 0; ++i) {
-        next_scale = (last_scale + reader.ReadSignedExpGolomb()) & 255;
-        last_scale = next_scale != 0 ? next_scale : last_scale;
-    }
-}
-
-void skip_chroma_format(BitStreamReader& reader) {
-    const std::uint32_t chroma_format_idc = read_ue(reader);
-    if (chroma_format_idc == kChromaFormat444) {
-        reader.SkipBoolean();  // separate_colour_plane_flag
-    }
-    reader.SkipExpGolomb();      // bit_depth_luma_minus8
-    reader.SkipExpGolomb();      // bit_depth_chroma_minus8
-    reader.SkipBoolean();        // qpprime_y_zero_transform_bypass_flag
-    if (reader.ReadBoolean()) {  // seq_scaling_matrix_present_flag
-        const int lists = chroma_format_idc == kChromaFormat444 ? 12 : 8;
-        for (int i = 0; i < lists; ++i) {
-            if (reader.ReadBoolean()) {
-                skip_scaling_list(reader, i < 6 ? 16 : 64);
-            }
-        }
-    }
 }
 
 // What can be said of a NAL unit (header byte first) without reading its syntax.
@@ -223,37 +169,19 @@ void print_slice_lines(std::FILE* output, const SliceDiagnostics& found) {
 void VideoAvcParser::ParseSeqParSet(const unsigned char* nal, int size, VideoAvcSeqParSet* set) {
     // More than the fields of any valid set take, and a bound for what a damaged one costs.
     constexpr int kMaxBytes = 8192;
-    const std::vector<unsigned char> bytes = zolt::rbsp_bytes(nal, size, kMaxBytes);
-    const int num_bytes = static_cast<int>(bytes.size());
-    BitStreamReader reader(bytes.data(), num_bytes);
-
-    *set = {};
-    reader.SkipBits(kHeaderBits);
-    set->profile_idc = reader.ReadUnsInt1();
-    reader.SkipBits(8);  // constraint_set flags
-    set->level_idc = reader.ReadUnsInt1();
-    set->seq_parameter_set_id = read_ue(reader);
-    if (has_chroma_format(set->profile_idc)) {
-        skip_chroma_format(reader);
-    }
-    set->log2_max_frame_num_minus4 = read_ue(reader);
-    set->pic_order_cnt_type = read_ue(reader);
-    if (set->pic_order_cnt_type == 0) {
-        set->log2_max_pic_order_cnt_lsb_minus4 = read_ue(reader);
-    } else if (set->pic_order_cnt_type == 1) {
-        set->delta_pic_order_always_zero_flag = reader.ReadBoolean();
-        reader.SkipSignedExpGolomb();  // offset_for_non_ref_pic
-        reader.SkipSignedExpGolomb();  // offset_for_top_to_bottom_field
-        const std::uint32_t cycle = read_ue(reader);
-        for (std::uint32_t i = 0; i < cycle && reader.GetBytePos() < num_bytes; ++i) {
-            reader.SkipSignedExpGolomb();  // offset_for_ref_frame
-        }
-    }
-    set->num_ref_frames = read_ue(reader);
-    set->gaps_in_frame_num_value_allowed_flag = reader.ReadBoolean();
-    set->pic_width_in_mbs_minus1 = read_ue(reader);
-    set->pic_height_in_map_units_minus1 = read_ue(reader);
-    set->frame_mbs_only_flag = reader.ReadBoolean();
+    const auto from = zolt::SequenceParameterSet::read(zolt::rbsp_bytes(nal, size, kMaxBytes));
+    set->profile_idc = from.profile_idc;
+    set->level_idc = from.level_idc;
+    set->seq_parameter_set_id = from.seq_parameter_set_id;
+    set->log2_max_frame_num_minus4 = from.log2_max_frame_num_minus4;
+    set->pic_order_cnt_type = from.pic_order_cnt_type;
+    set->log2_max_pic_order_cnt_lsb_minus4 = from.log2_max_pic_order_cnt_lsb_minus4;
+    set->delta_pic_order_always_zero_flag = from.delta_pic_order_always_zero_flag;
+    set->num_ref_frames = from.max_num_ref_frames;
+    set->gaps_in_frame_num_value_allowed_flag = from.gaps_in_frame_num_value_allowed_flag;
+    set->pic_width_in_mbs_minus1 = from.pic_width_in_mbs_minus1;
+    set->pic_height_in_map_units_minus1 = from.pic_height_in_map_units_minus1;
+    set->frame_mbs_only_flag = from.frame_mbs_only_flag;
 }
 
 void VideoAvcParser::ParseSeqParSet(const unsigned char* nal, int size, int* picWidth,
@@ -265,12 +193,12 @@ void VideoAvcParser::ParseSeqParSet(const unsigned char* nal, int size, int* pic
 }
 
 void VideoAvcParser::ParsePicParSet(const unsigned char* bytes, int size, VideoAvcPicParSet* set) {
-    BitStreamReader reader(bytes, size);
-    set->pic_parameter_set_id = read_ue(reader);
-    set->seq_parameter_set_id = read_ue(reader);
-    set->entropy_coding_mode_flag = reader.ReadBoolean();
-    set->pic_order_present_flag = reader.ReadBoolean();
-    set->num_slice_groups_minus1 = read_ue(reader);
+    const auto from = zolt::PictureParameterSet::read(bytes, size);
+    set->pic_parameter_set_id = from.pic_parameter_set_id;
+    set->seq_parameter_set_id = from.seq_parameter_set_id;
+    set->entropy_coding_mode_flag = from.entropy_coding_mode_flag;
+    set->pic_order_present_flag = from.bottom_field_pic_order_in_frame_present_flag;
+    set->num_slice_groups_minus1 = from.num_slice_groups_minus1;
 }
 
 void VideoAvcParser::ParseSliceHeader(const unsigned char* nal, int size,

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstddef>
 
+#include "avc/BitStreamReader.h"
+
 namespace zolt {
 
 std::vector<unsigned char> rbsp_bytes(const unsigned char* nal, int size, int max_bytes) {
@@ -19,6 +21,14 @@ std::vector<unsigned char> rbsp_bytes(const unsigned char* nal, int size, int ma
         bytes.push_back(nal[i]);
     }
     return bytes;
+}
+
+std::uint32_t read_ue(BitStreamReader& reader) {
+    return static_cast<std::uint32_t>(std::min<std::uint64_t>(reader.ReadExpGolomb(), UINT32_MAX));
+}
+
+std::uint32_t read_log2_field(BitStreamReader& reader, std::uint32_t log2_minus4) {
+    return reader.ReadUnsInt4(static_cast<int>(std::min(log2_minus4, 32U)) + 4);
 }
 
 }  // namespace zolt

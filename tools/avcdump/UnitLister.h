@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <optional>
 
-#include "avcdump/ParameterSets.h"
-#include "avcdump/SliceHeader.h"
+#include "avc/ParameterSets.h"
+#include "avc/SliceHeader.h"
 #include "io/FrameRate.h"
 
 namespace zolt {

@@ -2,15 +2,10 @@
 
 #include <optional>
 
-#include "avcdump/SliceHeader.h"
+#include "avc/SliceHeader.h"
 #include "media/IConfigVideoAvc.h"
 
 namespace zolt {
-namespace {
-
-constexpr std::uint64_t kSliceTypeI = 2;
-
-}  // namespace
 
 PictureStats::PictureStats(const std::string& file_name) : file_(file_name) {
     write_row("index,time_us,type,bytes,qp");
@@ -25,7 +20,7 @@ void PictureStats::add(IConfigVideoAvc& stream, const unsigned char* nal, std::s
 
     std::string row = std::to_string(index_++) + "," + std::to_string(time) + ",";
     if (slice) {
-        row += slice->slice_type == kSliceTypeI ? "I" : "P";
+        row += slice->slice_type == kSliceI ? "I" : "P";
     }
     row += "," + std::to_string(size) + ",";
     if (slice && slice->is_complete) {

@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <string>
 
-#include "avcdump/ParameterSets.h"
+#include "avc/ParameterSets.h"
 #include "io/OutputFile.h"
 
 class IConfigVideoAvc;

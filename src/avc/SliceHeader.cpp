@@ -1,4 +1,4 @@
-#include "avcdump/SliceHeader.h"
+#include "avc/SliceHeader.h"
 
 #include <iterator>
 #include <vector>
@@ -13,15 +13,11 @@ namespace {
 // More than any valid slice header takes.
 constexpr int kMaxHeaderBytes = 4096;
 
-constexpr std::uint64_t kSliceP = 0;
-constexpr std::uint64_t kSliceB = 1;
-constexpr std::uint64_t kSliceSp = 3;
-
 // Reads the part of a slice header that depends on its parameter sets.
 class HeaderReader {
 public:
-    HeaderReader(BitStreamReader& reader, const SeqParSet& sps, const PicParSet& pps,
-                 SliceHeader& header)
+    HeaderReader(BitStreamReader& reader, const SequenceParameterSet& sps,
+                 const PictureParameterSet& pps, SliceHeader& header)
         : reader_(reader),
           sps_(sps),
           pps_(pps),
@@ -41,10 +37,10 @@ public:
         if (header_.nal_ref_idc != 0 && !skip_dec_ref_pic_marking()) {
             return false;
         }
-        if (pps_.is_cabac && has_list(0)) {
+        if (pps_.entropy_coding_mode_flag && has_list(0)) {
             reader_.SkipExpGolomb();  // cabac_init_idc
         }
-        header_.slice_qp = pps_.pic_init_qp + reader_.ReadSignedExpGolomb();
+        header_.slice_qp = 26 + pps_.pic_init_qp_minus26 + reader_.ReadSignedExpGolomb();
         return true;
     }
 
@@ -56,11 +52,11 @@ private:
     }
 
     void read_picture_identity() {
-        if (sps_.separate_colour_planes) {
+        if (sps_.separate_colour_plane_flag) {
             reader_.SkipBits(2);  // colour_plane_id
         }
-        header_.frame_num = reader_.ReadUnsInt4(sps_.frame_num_bits);
-        if (!sps_.frame_mbs_only) {
+        header_.frame_num = read_log2_field(reader_, sps_.log2_max_frame_num_minus4);
+        if (!sps_.frame_mbs_only_flag) {
             header_.field_pic = reader_.ReadBoolean();
             header_.bottom_field = header_.field_pic && reader_.ReadBoolean();
         }
@@ -68,25 +64,25 @@ private:
             header_.idr_pic_id = reader_.ReadExpGolomb();
         }
         const bool has_bottom_delta =
-            pps_.bottom_field_pic_order_in_frame_present && !header_.field_pic;
+            pps_.bottom_field_pic_order_in_frame_present_flag && !header_.field_pic;
         if (sps_.pic_order_cnt_type == 0) {
-            header_.pic_order_cnt_lsb = reader_.ReadUnsInt4(sps_.pic_order_cnt_lsb_bits);
+            header_.pic_order_cnt_lsb =
+                read_log2_field(reader_, sps_.log2_max_pic_order_cnt_lsb_minus4);
         }
-        if (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero) {
+        if (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero_flag) {
             header_.delta_pic_order_cnt[0] = reader_.ReadSignedExpGolomb();
         }
         if (has_bottom_delta &&
             (sps_.pic_order_cnt_type == 0 ||
-             (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero))) {
+             (sps_.pic_order_cnt_type == 1 && !sps_.delta_pic_order_always_zero_flag))) {
             header_.delta_pic_order_cnt[1] = reader_.ReadSignedExpGolomb();
         }
-        if (pps_.redundant_pic_cnt_present) {
+        if (pps_.redundant_pic_cnt_present_flag) {
             header_.redundant_pic_cnt = reader_.ReadExpGolomb();
         }
     }
 
     bool read_num_ref_idx() {
-        constexpr std::uint64_t kMaxRefIdx = 32;
         if (has_list(1)) {
             reader_.SkipBoolean();  // direct_spatial_mv_pred_flag
         }
@@ -95,7 +91,7 @@ private:
         }
         for (int list = 0; list < 2 && has_list(list); ++list) {
             const std::uint64_t last = reader_.ReadExpGolomb();
-            if (last >= kMaxRefIdx) {
+            if (last >= PictureParameterSet::kMaxRefIdx) {
                 return false;
             }
             num_ref_idx_[list] = last + 1;
@@ -127,7 +123,7 @@ private:
     // Clause 7.3.3.2.
     void skip_pred_weight_table() {
         const bool is_b = header_.slice_type == kSliceB;
-        if (!has_list(0) || (is_b ? pps_.weighted_bipred_idc != 1 : !pps_.weighted_pred)) {
+        if (!has_list(0) || (is_b ? pps_.weighted_bipred_idc != 1 : !pps_.weighted_pred_flag)) {
             return;
         }
         const bool has_chroma = sps_.chroma_array_type() != 0;
@@ -182,8 +178,8 @@ private:
     static constexpr int kMaxCommands = 66;
 
     BitStreamReader& reader_;
-    const SeqParSet& sps_;
-    const PicParSet& pps_;
+    const SequenceParameterSet& sps_;
+    const PictureParameterSet& pps_;
     SliceHeader& header_;
     std::array<std::uint64_t, 2> num_ref_idx_;
 };
@@ -212,8 +208,9 @@ std::optional<SliceHeader> SliceHeader::read(const unsigned char* nal, int size,
     header.slice_type %= 5;
     header.pic_parameter_set_id = reader.ReadExpGolomb();
 
-    const PicParSet* const pps = sets.pic_par_set(header.pic_parameter_set_id);
-    const SeqParSet* const sps = pps != nullptr ? sets.seq_par_set(pps->seq_par_set_id) : nullptr;
+    const PictureParameterSet* const pps = sets.pic_par_set(header.pic_parameter_set_id);
+    const SequenceParameterSet* const sps =
+        pps != nullptr ? sets.seq_par_set(pps->seq_parameter_set_id) : nullptr;
     if (sps != nullptr) {
         header.is_complete = HeaderReader(reader, *sps, *pps, header).read() && !is_cut_off();
     }

@@ -4,9 +4,12 @@
 #include <cstdint>
 #include <optional>
 
-#include "avcdump/ParameterSets.h"
+#include "avc/ParameterSets.h"
 
 namespace zolt {
+
+// slice_type modulo 5, table 7-6.
+enum SliceType : std::uint32_t { kSliceP, kSliceB, kSliceI, kSliceSp, kSliceSi };
 
 // A slice header up to slice_qp_delta, named as in clause 7.3.3; elements that a slice lacks have
 // their inferred values.
@@ -14,7 +17,7 @@ struct SliceHeader {
     int nal_ref_idc = 0;
     bool is_idr = false;
     std::uint64_t first_mb_in_slice = 0;
-    std::uint64_t slice_type = 0;  // 0 to 4: P, B, I, SP, SI
+    std::uint64_t slice_type = 0;  // a SliceType
     std::uint64_t pic_parameter_set_id = 0;
 
     // False when the slice refers to a parameter set that is missing, is cut off, or is damaged:
