@@ -100,12 +100,12 @@ TEST(UtilRandom, FollowsTheMinimalStandardSequence) {
     EXPECT_EQ(1043618065, seed);
 
     for (const long unusual : {0L, -1L, LONG_MIN, LONG_MAX, Util::RandomMaxVal, -Util::RandomMaxVal,
-                               2 * Util::RandomMaxVal}) {
+                               LONG_MAX / Util::RandomMaxVal * Util::RandomMaxVal}) {
         const long value = Util::Random(unusual);
         EXPECT_GE(value, 1) << unusual;
         EXPECT_LT(value, Util::RandomMaxVal) << unusual;
     }
-    EXPECT_EQ(Util::Random(5), Util::Random(5 + Util::RandomMaxVal));
+    EXPECT_EQ(Util::Random(5), Util::Random(5 - Util::RandomMaxVal));
 }
 
 TEST(UtilRandom, ScalesIntoTheRange) {

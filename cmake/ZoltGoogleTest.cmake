@@ -1,0 +1,12 @@
+# GoogleTest as GTest::gtest_main: the machine's own library, or its sources (Debian: googletest, which
+# libgtest-dev brings) where the library is for another width or system than what is built.
+find_package(GTest CONFIG QUIET)
+if(NOT GTest_FOUND)
+    set(ZOLT_GOOGLETEST_SOURCES /usr/src/googletest CACHE PATH "Sources of GoogleTest")
+    set(INSTALL_GTEST OFF CACHE INTERNAL "")
+    set(BUILD_GMOCK OFF CACHE INTERNAL "")
+    add_subdirectory(${ZOLT_GOOGLETEST_SOURCES} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
+    if(NOT TARGET GTest::gtest_main)
+        add_library(GTest::gtest_main ALIAS gtest_main)
+    endif()
+endif()

@@ -1,0 +1,13 @@
+#pragma once
+
+#include <string>
+
+// File names and texts as the library has them, UTF-8, and as the system has them, UTF-16. Its
+// functions for the code page of the process (LoadLibraryA and the like) would not find every file.
+namespace zolt {
+
+// False, with the system's last error set, for null and for text that is ill-formed.
+bool to_utf16(const char* utf8, std::wstring* utf16);
+bool to_utf8(const wchar_t* utf16, std::string* utf8);
+
+}  // namespace zolt
