@@ -39,12 +39,12 @@ protected:                                                \
 
 namespace zolt {
 
-constexpr unsigned kFree = 1;  // of the flags
+constexpr unsigned kFreeObject = 1;  // a flag
 
 template <class Class>
 void* destroy(Class* object, unsigned flags) {
     object->Class::~Class();
-    if ((flags & kFree) != 0) {
+    if ((flags & kFreeObject) != 0) {
         ::operator delete(object);
     }
     return object;
@@ -54,15 +54,15 @@ struct Delete {
     template <class Interface>
     void operator()(Interface* object) const {
         if (object != nullptr) {
-            object->DeletingDestructor(kFree);
+            object->DeletingDestructor(kFreeObject);
         }
     }
 };
 
 template <class Interface>
 class EmptyInterface {
-    // What moves the base. Never read or written: the host's objects do not have it.
-    [[maybe_unused]] char place;
+    // What moves the base. Only constructors touch it: the host's objects do not have it.
+    [[maybe_unused]] char place = 0;
 };
 
 }  // namespace zolt
