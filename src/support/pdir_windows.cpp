@@ -43,6 +43,21 @@ struct DIR {
     dirent entry{};
 };
 
+namespace zolt {
+
+int errno_of_listing(unsigned long error) {
+    switch (error) {
+        case ERROR_DIRECTORY:
+            return ENOTDIR;
+        case ERROR_ACCESS_DENIED:
+            return EACCES;
+        default:
+            return ENOENT;
+    }
+}
+
+}  // namespace zolt
+
 DIR* opendir(const char* path) {
     auto listing = std::make_unique<DIR>();
     if (path == nullptr || !zolt::to_utf16(path, &listing->pattern)) {
@@ -54,8 +69,7 @@ DIR* opendir(const char* path) {
         !pattern.empty() && (pattern.back() == L'/' || pattern.back() == L'\\');
     pattern += ends_in_separator ? L"*" : L"/*";
     if (!listing->start()) {
-        const DWORD error = GetLastError();
-        errno = error == ERROR_DIRECTORY ? ENOTDIR : error == ERROR_ACCESS_DENIED ? EACCES : ENOENT;
+        errno = zolt::errno_of_listing(GetLastError());
         return nullptr;
     }
     return listing.release();

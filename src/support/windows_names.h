@@ -10,4 +10,7 @@ namespace zolt {
 bool to_utf16(const char* utf8, std::wstring* utf16);
 bool to_utf8(const wchar_t* utf16, std::string* utf8);
 
+// What opendir puts into errno when the system refuses to list a directory with that error.
+int errno_of_listing(unsigned long error);
+
 }  // namespace zolt
