@@ -12,6 +12,7 @@
 #include "color/ColorConverter.h"
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
+#include "media/abi.h"
 
 namespace {
 
@@ -36,9 +37,8 @@ protected:
         return reinterpret_cast<Function*>(dlsym(handle, name));
     }
 
-    std::unique_ptr<IMediaEncoder> make_encoder() {
-        return std::unique_ptr<IMediaEncoder>(new_encoder());
-    }
+    using Encoder = std::unique_ptr<IMediaEncoder, zolt::Delete>;
+    Encoder make_encoder() { return Encoder(new_encoder()); }
 
     static IVideoEncSettings& settings(IMediaEncoder& encoder) {
         return *static_cast<IVideoEncSettings*>(encoder.GetEncSettings());
@@ -123,7 +123,7 @@ TEST_F(PluginLibrary, AcceptsEveryColourFormat) {
             ColorConverter::GetNewColorConverter(70, 37, format, ColorConverter::kIYUV, 16, 16));
         InputConfig inputs[] = {{70, 37, 25.0, format}, {64, 32}};
         Consumer consumers[2];
-        std::unique_ptr<IMediaEncoder> encoders[] = {make_encoder(), make_encoder()};
+        Encoder encoders[] = {make_encoder(), make_encoder()};
         for (int i = 0; i < 2; ++i) {
             encoders[i]->PutStreamConfig(inputs[i].stream());
             ASSERT_EQ(encoders[i]->Connect(&consumers[i]), 0);

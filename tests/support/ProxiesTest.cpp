@@ -122,8 +122,7 @@ TEST(ProxiesWithoutHost, FactoriesWithoutAnObjectCountAsMissing) {
     const TempDir dir;
     in_own_process([&dir] {
         const std::string path = dir.path(host_file());
-        fs::copy_file(
-            fs::path(ZOLT_TEST_LIBRARIES) / std::string("empty_host") + zolt::kDllExtension, path);
+        fs::copy_file(std::string(ZOLT_TEST_LIBRARIES "/empty_host") + zolt::kDllExtension, path);
         DllUtils::SetDllDir(dir.path().c_str());
         expect_nothing_there();
         EXPECT_FALSE(library_is_loaded(path));
@@ -445,15 +444,15 @@ TEST(HostInterfaces, OperationsKeepTheirSlots) {
         slot(&IErrMgr::AddTypedErr),
         slot(&IErrMgr::AddErr),
         slot(&IErrMgr::GetError),
-        slot<IErrData* (IErrMgr::*)()>(&IErrMgr::GetErrorTraceRoot),
-        slot<int (IErrMgr::*)(IErrData***)>(&IErrMgr::GetErrorTrace),
-        slot<char* (IErrMgr::*)()>(&IErrMgr::GetErrorTraceString),
-        slot<void (IErrMgr::*)()>(&IErrMgr::ClearErrorTrace),
+        slot(&IErrMgr::GetErrorTraceRoot),
+        slot(&IErrMgr::GetErrorTrace),
+        slot(&IErrMgr::GetErrorTraceString),
+        slot(&IErrMgr::ClearErrorTrace),
         slot(&IErrMgr::GetErrorTraceThreadIdList),
-        slot<IErrData* (IErrMgr::*)(long)>(&IErrMgr::GetErrorTraceRoot),
-        slot<int (IErrMgr::*)(long, IErrData***)>(&IErrMgr::GetErrorTrace),
-        slot<char* (IErrMgr::*)(long)>(&IErrMgr::GetErrorTraceString),
-        slot<void (IErrMgr::*)(long)>(&IErrMgr::ClearErrorTrace),
+        slot(&IErrMgr::GetThreadErrorTraceRoot),
+        slot(&IErrMgr::GetThreadErrorTrace),
+        slot(&IErrMgr::GetThreadErrorTraceString),
+        slot(&IErrMgr::ClearThreadErrorTrace),
     };
     const int logger[] = {
         slot(&ILogger::StartLoggingToFunc),

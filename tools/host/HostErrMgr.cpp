@@ -52,19 +52,19 @@ IErrData* HostErrMgr::GetError() {
 }
 
 IErrData* HostErrMgr::GetErrorTraceRoot() {
-    return GetErrorTraceRoot(current_thread_id());
+    return GetThreadErrorTraceRoot(current_thread_id());
 }
 
 int HostErrMgr::GetErrorTrace(IErrData*** trace) {
-    return GetErrorTrace(current_thread_id(), trace);
+    return GetThreadErrorTrace(current_thread_id(), trace);
 }
 
 char* HostErrMgr::GetErrorTraceString() {
-    return GetErrorTraceString(current_thread_id());
+    return GetThreadErrorTraceString(current_thread_id());
 }
 
 void HostErrMgr::ClearErrorTrace() {
-    ClearErrorTrace(current_thread_id());
+    ClearThreadErrorTrace(current_thread_id());
 }
 
 int HostErrMgr::GetErrorTraceThreadIdList(long** ids) {
@@ -75,13 +75,13 @@ int HostErrMgr::GetErrorTraceThreadIdList(long** ids) {
     return static_cast<int>(traces.size());
 }
 
-IErrData* HostErrMgr::GetErrorTraceRoot(long thread_id) {
+IErrData* HostErrMgr::GetThreadErrorTraceRoot(long thread_id) {
     const MutexLock lock(mutex);
     const Trace* trace = find(thread_id);
     return trace == nullptr ? nullptr : trace->front().get();
 }
 
-int HostErrMgr::GetErrorTrace(long thread_id, IErrData*** trace) {
+int HostErrMgr::GetThreadErrorTrace(long thread_id, IErrData*** trace) {
     const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
@@ -94,7 +94,7 @@ int HostErrMgr::GetErrorTrace(long thread_id, IErrData*** trace) {
     return static_cast<int>(errors->size());
 }
 
-char* HostErrMgr::GetErrorTraceString(long thread_id) {
+char* HostErrMgr::GetThreadErrorTraceString(long thread_id) {
     const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
@@ -107,7 +107,7 @@ char* HostErrMgr::GetErrorTraceString(long thread_id) {
     return Util::CopyString(text.c_str());
 }
 
-void HostErrMgr::ClearErrorTrace(long thread_id) {
+void HostErrMgr::ClearThreadErrorTrace(long thread_id) {
     const MutexLock lock(mutex);
     traces.erase(thread_id);
 }

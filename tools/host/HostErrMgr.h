@@ -34,10 +34,10 @@ public:
     void ClearErrorTrace() override;
 
     int GetErrorTraceThreadIdList(long** ids) override;
-    IErrData* GetErrorTraceRoot(long thread_id) override;
-    int GetErrorTrace(long thread_id, IErrData*** trace) override;
-    char* GetErrorTraceString(long thread_id) override;
-    void ClearErrorTrace(long thread_id) override;
+    IErrData* GetThreadErrorTraceRoot(long thread_id) override;
+    int GetThreadErrorTrace(long thread_id, IErrData*** trace) override;
+    char* GetThreadErrorTraceString(long thread_id) override;
+    void ClearThreadErrorTrace(long thread_id) override;
 
 private:
     // Oldest first, never empty.

@@ -34,8 +34,8 @@ EncoderLibrary::EncoderLibrary(const std::string& file_name)
 
 EncoderLibrary::~EncoderLibrary() = default;
 
-std::unique_ptr<IMediaEncoder> EncoderLibrary::new_encoder() const {
-    std::unique_ptr<IMediaEncoder> encoder(get_new_encoder_());
+std::unique_ptr<IMediaEncoder, Delete> EncoderLibrary::new_encoder() const {
+    std::unique_ptr<IMediaEncoder, Delete> encoder(get_new_encoder_());
     if (!encoder) {
         throw ToolError(file_name_ + ": gives no encoder object");
     }
