@@ -19,7 +19,7 @@ FFMPEG = os.environ["FFMPEG"]
 ENCODER_LIBRARY = "VideoH264ZoltEnc.dll" if EMULATOR else "libVideoH264ZoltEnc.so"
 START_CODE = b"\0\0\0\1"
 
-native_only = unittest.skipIf(EMULATOR, "with files or signals that only POSIX systems have")
+native_only = unittest.skipIf(EMULATOR, "not for programs of another system")
 
 
 def restore_sigpipe():

@@ -79,6 +79,8 @@ class Usage(ToolTest):
         for size in ("16x16880", "16880x2112"):
             self.assert_succeeds(self.zoltenc("/dev/zero", "-s", size, "-n", "1", "-o", "out.264"))
 
+
+class Help(ToolTest):
     def test_help_and_version_go_to_standard_output(self):
         for option, text in (("--help", b"--keyint"), ("--version", b"zoltenc ")):
             result = self.assert_succeeds(self.zoltenc(option))
@@ -406,6 +408,10 @@ class Outputs(ToolTest):
         for name in ("in.y4m", "./in.y4m", "same.y4m", "hard.y4m"):
             with self.subTest(output=name):
                 self.assert_fails(self.zoltenc("in.y4m", "-o", name), 2, "input")
+        self.assertEqual(self.read("in.y4m"), y4m())
+
+    @native_only  # Wine does not tell which file a standard stream is.
+    def test_standard_input_is_never_overwritten(self):
         with open(self.folder / "in.y4m", "rb") as stdin:
             command = [*ZOLTENC, "--plugin", STUB_ENCODER, "-", "-o", "in.y4m"]
             result = subprocess.run(
@@ -498,7 +504,8 @@ class Signals(ToolTest):
         self.fail("nothing was written")
 
     def test_a_signal_finishes_the_file(self):
-        for number in (signal.SIGINT, signal.SIGTERM):
+        # An emulator hands on the first as Ctrl-C and has nothing for the other.
+        for number in (signal.SIGINT,) if EMULATOR else (signal.SIGINT, signal.SIGTERM):
             with self.subTest(signal=number):
                 with self.start("synthetic:64x64@25:100000000", "-o", "out.264") as process:
                     self.wait_for_growth()
@@ -511,6 +518,7 @@ class Signals(ToolTest):
                 self.assertIn(f"{len(pictures)} frames", message)
                 (self.folder / "out.264").unlink()
 
+    @native_only  # Wine cannot cancel a read from a pipe of the system below it.
     def test_a_signal_ends_the_wait_for_input(self):
         with self.start("-", "-o", "out.264", stdin=subprocess.PIPE) as process:
             process.stdin.write(y4m(frames=20) + b"FRAME\npart of a picture")
@@ -522,6 +530,7 @@ class Signals(ToolTest):
             self.assertNotIn(b"cut off", process.stderr.read())
         self.assertEqual(len(self.told(self.read("out.264"))), 2 + 20)
 
+    @native_only  # Wine cannot cancel a read from a pipe of the system below it.
     def test_a_signal_before_the_first_picture_leaves_nothing(self):
         with self.start("-", "-o", "out.264", stdin=subprocess.PIPE) as process:
             time.sleep(0.5)

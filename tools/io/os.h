@@ -28,13 +28,13 @@ bool os_has_terminal();
 // What a name or a descriptor stands for.
 struct FileStatus {
     bool is_regular;
-    // Together the same for every name of a file.
+    // Together the same for every name of a file; 0 where the system does not tell.
     std::uint64_t volume;
     std::uint64_t number;
     unsigned permissions;  // as os_create takes them
 
     bool is_same_file(const FileStatus& other) const {
-        return volume == other.volume && number == other.number;
+        return number != 0 && number == other.number && volume == other.volume;
     }
 };
 std::optional<FileStatus> os_status(const std::string& name);
