@@ -6,6 +6,7 @@
 #ifdef _WIN32
 
 constexpr int RTLD_LAZY = 1;
+constexpr int RTLD_NOW = 2;
 
 // The handle of the library of that name (UTF-8), or null. `mode` is not used.
 void* dlopen(const char* name, int mode);

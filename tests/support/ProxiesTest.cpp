@@ -122,8 +122,7 @@ TEST(ProxiesWithoutHost, FactoriesWithoutAnObjectCountAsMissing) {
     const TempDir dir;
     in_own_process([&dir] {
         const std::string path = dir.path(host_file());
-        fs::copy_file(
-            fs::path(ZOLT_TEST_LIBRARIES) / std::string("empty_host") + zolt::kDllExtension, path);
+        fs::copy_file(std::string(ZOLT_TEST_LIBRARIES "/empty_host") + zolt::kDllExtension, path);
         DllUtils::SetDllDir(dir.path().c_str());
         expect_nothing_there();
         EXPECT_FALSE(library_is_loaded(path));

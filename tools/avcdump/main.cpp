@@ -1,5 +1,3 @@
-#include <signal.h>
-
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -16,6 +14,7 @@
 #include "avcdump/UnitLister.h"
 #include "io/ByteReader.h"
 #include "io/ToolError.h"
+#include "io/os.h"
 
 namespace {
 
@@ -99,9 +98,10 @@ int report(const std::exception& error, int status) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    signal(SIGPIPE, SIG_IGN);
+    zolt::os_prepare_streams();
     try {
-        const std::optional<zolt::Options> options = zolt::Options::parse(argc, argv);
+        const char* const* const arguments = zolt::os_command_line(&argc, argv);
+        const std::optional<zolt::Options> options = zolt::Options::parse(argc, arguments);
         if (options) {
             dump(*options);
         }

@@ -6,6 +6,7 @@
 
 #include "host/IEvent.h"
 #include "host/thread_id.h"
+#include "support/MutexLock.h"
 #include "support/Util.h"
 
 namespace zolt {
@@ -45,7 +46,7 @@ void HostErrMgr::AddErr(const char* cls, const char* method, const char* message
 }
 
 IErrData* HostErrMgr::GetError() {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     const Trace* trace = find(current_thread_id());
     return trace == nullptr ? nullptr : trace->back().get();
 }
@@ -67,7 +68,7 @@ void HostErrMgr::ClearErrorTrace() {
 }
 
 int HostErrMgr::GetErrorTraceThreadIdList(long** ids) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     *ids = new long[traces.size()];
     std::transform(traces.begin(), traces.end(), *ids,
                    [](const auto& entry) { return entry.first; });
@@ -75,13 +76,13 @@ int HostErrMgr::GetErrorTraceThreadIdList(long** ids) {
 }
 
 IErrData* HostErrMgr::GetThreadErrorTraceRoot(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     const Trace* trace = find(thread_id);
     return trace == nullptr ? nullptr : trace->front().get();
 }
 
 int HostErrMgr::GetThreadErrorTrace(long thread_id, IErrData*** trace) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
         *trace = nullptr;
@@ -94,7 +95,7 @@ int HostErrMgr::GetThreadErrorTrace(long thread_id, IErrData*** trace) {
 }
 
 char* HostErrMgr::GetThreadErrorTraceString(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
         return nullptr;
@@ -107,13 +108,13 @@ char* HostErrMgr::GetThreadErrorTraceString(long thread_id) {
 }
 
 void HostErrMgr::ClearThreadErrorTrace(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     traces.erase(thread_id);
 }
 
 void HostErrMgr::add(const std::shared_ptr<ErrData>& error) {
     {
-        const std::lock_guard<std::mutex> lock(mutex);
+        const MutexLock lock(mutex);
         Trace& trace = traces[current_thread_id()];
         trace.push_back(error);
         if (trace.size() > kMaxTraceLength) {

@@ -4,11 +4,11 @@
 #include <deque>
 #include <map>
 #include <memory>
-#include <mutex>
 
 #include "host/ErrData.h"
 #include "media/IEventListener.h"
 #include "support/IErrMgr.h"
+#include "support/SimpleMutex.h"
 
 namespace zolt {
 
@@ -48,7 +48,7 @@ private:
     // Null when the thread has no errors. Called with the mutex held.
     const Trace* find(long thread_id) const;
 
-    std::mutex mutex;
+    SimpleMutex mutex;
     std::map<long, Trace> traces;
     std::atomic<IEventListener*> listener{nullptr};
 };
