@@ -2,11 +2,9 @@
 // knows of the library are the headers of the interfaces. It stops at the first fault with a
 // message and status 1.
 //
-//   host_msabi LIBRARY-IS-IN-THIS-DIRECTORY
-//
-// Writes the pictures that it made (NAME.raw) and their streams (NAME.h264) into the current
-// directory, and a line "stream NAME WxH FPS KBPS KEYINT FORMAT" for each. The environment variable
-// STREAMING_ENGINE_LIB must name the directory of services_msabi.dll.
+// Loads the library from the current directory, and writes the pictures that it made (NAME.raw)
+// and their streams (NAME.h264) there, with a line "stream NAME WxH FPS KBPS KEYINT FORMAT" for
+// each. The environment variable STREAMING_ENGINE_LIB names the directory of services_msabi.dll.
 
 #include "media/IConfigVideoAvc.h"
 #include "media/IConfigVideoUncompressed.h"
@@ -508,10 +506,10 @@ void* slot(void* object, int number) {
 // The stream is the same when every call comes with the stack aligned to 4 bytes only.
 void check_misaligned() {
     const Case& of = kCases[4];
+    encode(of, false);
     for (unsigned offset = 0; offset < 16; offset += 4) {
         Video video(of.width, of.height, of.frames_per_second, format_code(of.format));
         StreamConfig config(MediaType::kVideoUncompressed, &video);
-        encode(of, false);
         Consumer consumer(other_stream, of.key_frame_interval);
         void* const new_object = GetProcAddress(library, "GetNewEncoder");
         auto* const encoder =

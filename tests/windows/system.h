@@ -27,7 +27,6 @@ __declspec(dllimport) Handle
 __declspec(dllimport) int __stdcall WriteFile(Handle file, const void* data, unsigned long bytes,
                                               unsigned long* written, void* overlapped);
 __declspec(dllimport) int __stdcall CloseHandle(Handle handle);
-__declspec(dllimport) const char* __stdcall GetCommandLineA();
 __declspec(dllimport) Handle __stdcall GetCurrentProcess();
 __declspec(dllimport) int __stdcall K32GetProcessMemoryInfo(Handle process,
                                                             MemoryCounters* counters,
