@@ -1,9 +1,7 @@
 #include <cstdint>
 #include <cstring>
-#include <filesystem>
 #include <memory>
 #include <string>
-#include <system_error>
 
 #include "support/ErrnoKeeper.h"
 #include "support/Util.h"
@@ -186,13 +184,10 @@ int Util::WriteByteArrayToFile(const char* path, const unsigned char* buf, long 
 
 long long Util::GetFileSize(const char* path) {
     const zolt::ErrnoKeeper keep_errno;
-    std::error_code error;
-    const std::uintmax_t size = std::filesystem::file_size(std::filesystem::u8path(path), error);
-    return error ? -1 : static_cast<long long>(size);
+    return zolt::os_file_size(path);
 }
 
 bool Util::IsDir(const char* path) {
     const zolt::ErrnoKeeper keep_errno;
-    std::error_code error;
-    return std::filesystem::is_directory(std::filesystem::u8path(path), error);
+    return zolt::os_is_directory(path);
 }
