@@ -25,11 +25,12 @@ constexpr int kWrongUsage = 2;
 struct PipeClosed {};
 
 [[noreturn]] void throw_output_error() {
-    if (errno == EPIPE) {
+    const int error = zolt::os_stream_error();
+    if (error == EPIPE) {
         throw PipeClosed();
     }
     throw zolt::ToolError(std::string("standard output: cannot be written: ") +
-                          std::strerror(errno));
+                          std::strerror(error));
 }
 
 void write_output(const std::string& text) {

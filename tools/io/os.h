@@ -59,6 +59,9 @@ bool os_close(int descriptor);
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size);
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size);
 
+// The value of errno for the C library's last failed write to a stream: EPIPE for a closed pipe.
+int os_stream_error();
+
 // Bytes from the descriptor's position to the end of its file; nothing where that is not known.
 std::optional<std::int64_t> os_bytes_left(int descriptor);
 

@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -101,6 +102,10 @@ std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size) {
 
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size) {
     return write(descriptor, data, size);
+}
+
+int os_stream_error() {
+    return errno;
 }
 
 std::optional<std::int64_t> os_bytes_left(int descriptor) {

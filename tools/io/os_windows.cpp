@@ -282,6 +282,11 @@ std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size) {
     return static_cast<std::ptrdiff_t>(count);
 }
 
+int os_stream_error() {
+    // The C library makes an invalid argument of a pipe that is being closed.
+    return _doserrno == ERROR_NO_DATA || _doserrno == ERROR_PIPE_NOT_CONNECTED ? EPIPE : errno;
+}
+
 std::optional<std::int64_t> os_bytes_left(int descriptor) {
     const HANDLE handle = handle_of(descriptor);
     LARGE_INTEGER size;
