@@ -8,9 +8,10 @@ add_link_options(-static)
 add_compile_definitions(_WIN32_WINNT=0x0600 NOMINMAX WIN32_LEAN_AND_MEAN)
 
 if(CMAKE_SIZEOF_VOID_P EQUAL 8)
-    # The system aligns the stack to 16 bytes and g++ cannot align a frame further there, yet it spills
-    # vectors of 32 and 64 bytes with instructions that fault on any other alignment. The assembler
-    # writes the unaligned form of each, which is as fast on processors that have AVX.
+    # The system aligns the stack to 16 bytes and g++ cannot align a frame further there, yet as it is
+    # published it keeps vectors of 32 and 64 bytes there with instructions that fault on any other
+    # alignment. Debian's compilers write the unaligned form; with this the assembler does for all,
+    # and for what is aligned by hand. It is as fast on processors that have AVX.
     add_compile_options(-Wa,-muse-unaligned-vector-move)
     add_link_options(-Wa,-muse-unaligned-vector-move)
 endif()

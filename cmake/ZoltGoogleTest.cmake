@@ -5,9 +5,10 @@ if(NOT GTest_FOUND)
     set(ZOLT_GOOGLETEST_SOURCES /usr/src/googletest CACHE PATH "Sources of GoogleTest")
     set(INSTALL_GTEST OFF CACHE INTERNAL "")
     set(BUILD_GMOCK OFF CACHE INTERNAL "")
+    # Optimised across files like everything here: MinGW's linker may find the inline functions of the C
+    # library's headers twice when only some objects are.
     set(CMAKE_POLICY_DEFAULT_CMP0069 NEW)
     add_subdirectory(${ZOLT_GOOGLETEST_SOURCES} ${CMAKE_BINARY_DIR}/googletest EXCLUDE_FROM_ALL)
-    set_target_properties(gtest gtest_main PROPERTIES INTERPROCEDURAL_OPTIMIZATION_RELEASE OFF)
     if(NOT TARGET GTest::gtest_main)
         add_library(GTest::gtest_main ALIAS gtest_main)
     endif()

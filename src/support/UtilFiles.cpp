@@ -1,5 +1,6 @@
 #include <cstdint>
 #include <cstring>
+#include <limits>
 #include <memory>
 #include <string>
 
@@ -157,7 +158,9 @@ int Util::ReadFileIntoNewByteArray(const char* path, unsigned char** buf, long* 
     *buf = nullptr;
     *size = 0;
     std::string contents;
-    if (!read_file(path, &contents)) {
+    // A long has 32 bits on Windows.
+    if (!read_file(path, &contents) ||
+        contents.size() > static_cast<size_t>(std::numeric_limits<long>::max())) {
         return 1;
     }
     *buf = new unsigned char[contents.size()];

@@ -2,7 +2,6 @@
 // leaves it. This file is compiled like such a host: its functions keep their frames' alignment as
 // they find it.
 
-#include <dlfcn.h>
 #include <gtest/gtest.h>
 
 #include <memory>
@@ -11,6 +10,8 @@
 #include "SessionFakes.h"
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
+#include "media/abi.h"
+#include "support/dl.h"
 
 namespace {
 
@@ -30,7 +31,7 @@ void encode(Trial* trial) {
         *reinterpret_cast<const char* (*)()>(find("GetEncoderName"))() == '\0') {
         return;
     }
-    const std::unique_ptr<IMediaEncoder> encoder(
+    const std::unique_ptr<IMediaEncoder, zolt::Delete> encoder(
         reinterpret_cast<IMediaEncoder* (*)()>(find("GetNewEncoder"))());
     auto* const settings = static_cast<IVideoEncSettings*>(encoder->GetEncSettings());
     settings->SetBitRateKbs(300);
@@ -74,7 +75,7 @@ void encode(Trial* trial) {
 }
 
 TEST(MisalignedStack, DoesNotMatterToTheLibrary) {
-    void* const library = dlopen(ZOLT_PLUGIN_FILE, RTLD_NOW | RTLD_LOCAL);
+    void* const library = dlopen(ZOLT_PLUGIN_FILE, RTLD_NOW);
     ASSERT_NE(library, nullptr) << dlerror();
     // The offsets that a host's own frames add to these are multiples of 4 that nobody knows: with
     // all four, every call of the library comes with every stack that there is.
