@@ -36,7 +36,7 @@ bool os_is_directory(const char* path);
 // The size of a file in bytes, or -1.
 long long os_file_size(const char* path);
 
-// Sleeps about that long.
+// Sleeps about that long; 0 lets other threads run.
 void os_sleep(int msecs);
 
 }  // namespace zolt

@@ -67,7 +67,11 @@ long long os_file_size(const char* path) {
 }
 
 void os_sleep(int msecs) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(msecs));
+    if (msecs > 0) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(msecs));
+    } else {
+        std::this_thread::yield();
+    }
 }
 
 }  // namespace zolt
