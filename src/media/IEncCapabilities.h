@@ -1,7 +1,9 @@
 #pragma once
 
+#include "media/abi.h"
+
 // What an encoder can do; the operations are those of the kind of encoder.
-class IEncCapabilities {
+class IEncCapabilities : private zolt::EmptyInterface<IEncCapabilities> {
 protected:
     ~IEncCapabilities() = default;
 };

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "media/ISampleProcessor.h"
+#include "media/abi.h"
 
 class IEncCapabilities;
 class IEncRunTimeControl;
@@ -15,4 +16,6 @@ public:
     virtual IEncCapabilities* GetEncCapabilities() = 0;
     virtual IEncSettings* GetEncSettings() = 0;
     virtual IEncRunTimeControl* GetEncRunTimeControl() = 0;
+
+    ZOLT_INTERFACE_DESTRUCTOR(IMediaEncoder) = default;
 };

@@ -2,9 +2,10 @@
 
 #include "media/ISampleConsumer.h"
 #include "media/ISampleProducer.h"
+#include "media/abi.h"
 
-// Consumer and producer at once. Owned through this interface: its destructor is virtual.
+// Consumer and producer at once. Owned through this interface: deleted with zolt::Delete.
 class ISampleProcessor : public ISampleConsumer, public ISampleProducer {
 public:
-    virtual ~ISampleProcessor() = default;
+    ZOLT_INTERFACE_DESTRUCTOR(ISampleProcessor) = default;
 };

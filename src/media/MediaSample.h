@@ -1,6 +1,7 @@
 #pragma once
 
 #include "media/ISample.h"
+#include "media/abi.h"
 
 class IMediaFileSample;
 
@@ -22,7 +23,7 @@ public:
     int GetSubStreamId() override { return subStreamId; }
 
     // Releases the payload when the sample owns it.
-    virtual ~MediaSample();
+    ZOLT_DESTRUCTOR(MediaSample);
 
     int GetFrameType() const { return frameType; }
 

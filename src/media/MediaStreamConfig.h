@@ -3,6 +3,7 @@
 #include <memory>
 
 #include "media/ISampleStreamConfig.h"
+#include "media/abi.h"
 
 // Description of a stream: media type, the object that describes it (borrowed), and the key of an
 // encrypted stream (an own copy).
@@ -19,7 +20,7 @@ public:
     int GetCryptoSessionKey(unsigned char** key) override;
     void* GetBwAdaptConfig() override { return nullptr; }
 
-    virtual ~MediaStreamConfig() = default;
+    ZOLT_DESTRUCTOR(MediaStreamConfig) = default;
 
 private:
     int mediaType;

@@ -12,6 +12,7 @@
 #include "media/MediaSample.h"
 #include "media/MediaStreamConfig.h"
 #include "media/MediaType.h"
+#include "media/abi.h"
 #include "media/fourcc.h"
 #include "support/SimpleMutex.h"
 
@@ -58,7 +59,7 @@ public:
     void EndOfSamples() override;
 
     // The consumer is not told.
-    ~VideoH264ZoltEnc() override;
+    ZOLT_DESTRUCTOR(VideoH264ZoltEnc);
 
     int GetEncoderMediaType() override { return Type; }
     IEncCapabilities* GetEncCapabilities() override { return this; }

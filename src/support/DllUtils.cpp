@@ -2,12 +2,9 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <memory>
 #include <string>
-#include <system_error>
 
 #include "support/ErrMgr.h"
 #include "support/ErrnoKeeper.h"
@@ -22,14 +19,10 @@ constexpr size_t kExtensionLength = sizeof zolt::kDllExtension - 1;
 
 using Directory = std::unique_ptr<DIR, int (*)(DIR*)>;
 
-// Opening anything else may wait for ever, as a pipe does that nobody writes to.
-bool is_regular_file(const std::string& path) {
-    std::error_code error;
-    return std::filesystem::is_regular_file(std::filesystem::u8path(path), error);
-}
-
+// Opening anything but a regular file may wait for ever, as a pipe does that nobody writes to.
 bool is_readable_file(const std::string& path) {
-    std::FILE* file = is_regular_file(path) ? Util::Win32FileOpen(path.c_str(), "rb") : nullptr;
+    std::FILE* file =
+        zolt::os_is_regular_file(path.c_str()) ? Util::Win32FileOpen(path.c_str(), "rb") : nullptr;
     if (file == nullptr) {
         return false;
     }
@@ -70,11 +63,9 @@ void DllUtils::SetDllDir(const char* dir) {
 
 const char* DllUtils::GetDllDir() {
     if (dllDirectory[0] == '\0') {
-        const char* dir = std::getenv(EnvVarStreamingEngineLib);
-        if (dir == nullptr || dir[0] == '\0') {
-            dir = DefaultStreamingEngineLib;
-        }
-        std::snprintf(dllDirectory, sizeof dllDirectory, "%s", dir);
+        const std::string dir = zolt::os_environment(EnvVarStreamingEngineLib);
+        std::snprintf(dllDirectory, sizeof dllDirectory, "%s",
+                      dir.empty() ? DefaultStreamingEngineLib : dir.c_str());
     }
     return dllDirectory;
 }
@@ -137,7 +128,7 @@ int DllUtils::LoadAllDlls(const char* dir, int n, const char* const* funcNames, 
         }
         const std::string name = entry->d_name;
         const std::string path = std::string(dir) + zolt::kDirSeparator + name;
-        if (!is_library_name(name) || !is_regular_file(path)) {
+        if (!is_library_name(name) || !zolt::os_is_regular_file(path.c_str())) {
             continue;
         }
         void* handle = LoadDll(path.c_str(), n, funcNames, funcPtrs + count * n);

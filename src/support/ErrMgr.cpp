@@ -122,22 +122,22 @@ int ErrMgr::GetErrorTraceThreadIdList(long** ids) {
 
 IErrData* ErrMgr::GetErrorTraceRoot(long thread_id) {
     IErrMgr* host = errMgr.get();
-    return host ? host->GetErrorTraceRoot(thread_id) : nullptr;
+    return host ? host->GetThreadErrorTraceRoot(thread_id) : nullptr;
 }
 
 int ErrMgr::GetErrorTrace(long thread_id, IErrData*** trace) {
     IErrMgr* host = errMgr.get();
-    return host ? host->GetErrorTrace(thread_id, trace) : 0;
+    return host ? host->GetThreadErrorTrace(thread_id, trace) : 0;
 }
 
 char* ErrMgr::GetErrorTraceString(long thread_id) {
     IErrMgr* host = errMgr.get();
-    return host ? host->GetErrorTraceString(thread_id) : nullptr;
+    return host ? host->GetThreadErrorTraceString(thread_id) : nullptr;
 }
 
 void ErrMgr::ClearErrorTrace(long thread_id) {
     if (IErrMgr* host = errMgr.get()) {
-        host->ClearErrorTrace(thread_id);
+        host->ClearThreadErrorTrace(thread_id);
     }
 }
 

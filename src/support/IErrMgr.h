@@ -28,12 +28,13 @@ public:
     virtual void ClearErrorTrace() = 0;
 
     // The ids of the threads that have errors (a count and a new array), and the same operations
-    // for the thread of a given id.
+    // for the thread of a given id. They have names of their own because a compiler may put
+    // overloads side by side in the table.
     virtual int GetErrorTraceThreadIdList(long** ids) = 0;
-    virtual IErrData* GetErrorTraceRoot(long thread_id) = 0;
-    virtual int GetErrorTrace(long thread_id, IErrData*** trace) = 0;
-    virtual char* GetErrorTraceString(long thread_id) = 0;
-    virtual void ClearErrorTrace(long thread_id) = 0;
+    virtual IErrData* GetThreadErrorTraceRoot(long thread_id) = 0;
+    virtual int GetThreadErrorTrace(long thread_id, IErrData*** trace) = 0;
+    virtual char* GetThreadErrorTraceString(long thread_id) = 0;
+    virtual void ClearThreadErrorTrace(long thread_id) = 0;
 
 protected:
     ~IErrMgr() = default;

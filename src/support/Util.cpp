@@ -9,9 +9,9 @@
 #include <cstdint>
 #include <cstdlib>
 #include <memory>
-#include <thread>
 
 #include "support/ErrnoKeeper.h"
+#include "support/os.h"
 
 namespace {
 
@@ -199,9 +199,8 @@ unsigned char* Util::CopyArrayByte(const unsigned char* a, int n) {
 }
 
 int Util::SleepMsecs(long long ms, const bool* stop) {
-    using std::chrono::milliseconds;
     using std::chrono::steady_clock;
-    constexpr long long kSliceMsecs = 50;
+    constexpr int kSliceMsecs = 50;
     if (ms <= 0) {
         return 0;
     }
@@ -213,10 +212,13 @@ int Util::SleepMsecs(long long ms, const bool* stop) {
         if (flag != nullptr && *flag) {
             return 1;
         }
-        std::this_thread::sleep_for(milliseconds(kSliceMsecs));
+        zolt::os_sleep(kSliceMsecs);
     }
-    const auto elapsed = steady_clock::now() - start;
-    std::this_thread::sleep_for(milliseconds(ms) - elapsed);
+    const auto end = start + std::chrono::milliseconds(ms);
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - steady_clock::now());
+    if (left.count() > 0) {
+        zolt::os_sleep(static_cast<int>(left.count()));
+    }
     return 0;
 }
 

@@ -1,9 +1,8 @@
 #include <cstdint>
 #include <cstring>
-#include <filesystem>
+#include <limits>
 #include <memory>
 #include <string>
-#include <system_error>
 
 #include "support/ErrnoKeeper.h"
 #include "support/Util.h"
@@ -159,7 +158,9 @@ int Util::ReadFileIntoNewByteArray(const char* path, unsigned char** buf, long* 
     *buf = nullptr;
     *size = 0;
     std::string contents;
-    if (!read_file(path, &contents)) {
+    // A long has 32 bits on Windows.
+    if (!read_file(path, &contents) ||
+        contents.size() > static_cast<size_t>(std::numeric_limits<long>::max())) {
         return 1;
     }
     *buf = new unsigned char[contents.size()];
@@ -186,13 +187,10 @@ int Util::WriteByteArrayToFile(const char* path, const unsigned char* buf, long 
 
 long long Util::GetFileSize(const char* path) {
     const zolt::ErrnoKeeper keep_errno;
-    std::error_code error;
-    const std::uintmax_t size = std::filesystem::file_size(std::filesystem::u8path(path), error);
-    return error ? -1 : static_cast<long long>(size);
+    return zolt::os_file_size(path);
 }
 
 bool Util::IsDir(const char* path) {
     const zolt::ErrnoKeeper keep_errno;
-    std::error_code error;
-    return std::filesystem::is_directory(std::filesystem::u8path(path), error);
+    return zolt::os_is_directory(path);
 }

@@ -20,7 +20,7 @@ int init_recursive_mutex(pthread_mutex_t* mutex) {
 
 }  // namespace zolt
 
-int pthread_setTimeCritical(pthread_t thread) {
+int pthread_setTimeCritical(ThreadHandle thread) {
     // The lowest real-time priority is already above all ordinary threads and leaves room for the
     // system's own real-time work.
     sched_param parameters{};

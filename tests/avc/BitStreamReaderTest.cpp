@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <array>
+#include <climits>
 #include <cstdint>
 #include <random>
 #include <vector>
@@ -211,7 +212,7 @@ TEST(BitStreamReader, ReadsNothingOutsideTheBuffer) {
     EXPECT_FALSE(reader.ReadBoolean());
     reader.UseNewBuffer(bytes.data(), -3);
     EXPECT_EQ(reader.ReadUnsInt1(1), 0);
-    for (const long pos : {-1L, -8L, -1000L, 8L, 1L << 20, INT64_MAX, INT64_MIN}) {
+    for (const long pos : {-1L, -8L, -1000L, 8L, 1L << 20, LONG_MAX, LONG_MIN}) {
         reader.UseNewBuffer(bytes.data(), 1);
         reader.SetBitPos(pos);
         std::array<unsigned char, 2> copy = {};

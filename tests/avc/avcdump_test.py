@@ -7,11 +7,14 @@ import json
 import os
 import pathlib
 import re
+import shlex
 import shutil
 import subprocess
 import tempfile
 import unittest
 
+# The command that runs programs of another system than this one.
+EMULATOR = shlex.split(os.environ.get("EMULATOR", ""))
 AVCDUMP = os.environ["AVCDUMP"]
 ZOLTENC = os.environ.get("ZOLTENC", "")
 FFMPEG = shutil.which("ffmpeg")
@@ -27,7 +30,8 @@ SMALL_STREAM = bytes.fromhex(
 
 
 def run(*command, **options):
-    return subprocess.run([str(part) for part in command], capture_output=True, **options)
+    emulator = EMULATOR if command[0] in (AVCDUMP, ZOLTENC) else []
+    return subprocess.run([*emulator, *map(str, command)], capture_output=True, **options)
 
 
 def avcdump(*arguments, **options):
@@ -129,7 +133,7 @@ class CommandLine(InFolder):
         path = self.write("long.264", SMALL_STREAM * 20000)
         for options in [[], ["--json"], ["-v"]]:
             process = subprocess.Popen(
-                [AVCDUMP, str(path), *options], stdout=subprocess.PIPE, stderr=subprocess.PIPE
+                [*EMULATOR, AVCDUMP, str(path), *options], stdout=subprocess.PIPE, stderr=subprocess.PIPE
             )
             process.stdout.readline()
             process.stdout.close()
@@ -141,7 +145,7 @@ class CommandLine(InFolder):
     def test_a_full_device_is_reported(self):
         path = self.write("a.264", SMALL_STREAM)
         with open("/dev/full", "wb") as full:
-            result = subprocess.run([AVCDUMP, str(path)], stdout=full, stderr=subprocess.PIPE)
+            result = subprocess.run([*EMULATOR, AVCDUMP, str(path)], stdout=full, stderr=subprocess.PIPE)
         self.assertEqual(result.returncode, 1)
         self.assertRegex(result.stderr, rb"\Aavcdump: standard output: [^\n]*\n\Z")
 

@@ -9,11 +9,11 @@
 #include <memory>
 #include <numeric>
 #include <random>
-#include <thread>
 
 #include "HostErrors.h"
 #include "ReferenceConverter.h"
 #include "color/color_tables.h"
+#include "common/Thread.h"
 #include "support/Util.h"
 
 namespace {
@@ -284,7 +284,7 @@ TEST(ColorConverter, FirstConvertersMayBeMadeByTwoThreadsAtOnce) {
             make_converter(size, ColorConverter::kRGB, ColorConverter::kIYUV, 16, 16);
         *result = convert(*converter, source);
     };
-    std::thread other(use_first_converter, &results[0]);
+    Thread other([&] { use_first_converter(&results[0]); });
     use_first_converter(&results[1]);
     other.join();
     const Picture expected =

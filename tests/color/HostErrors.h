@@ -1,13 +1,14 @@
 #pragma once
 
-#include <cstdlib>
 #include <string>
 
 #include "host/IErrData.h"
 #include "support/ErrMgr.h"
+#include "support/os.h"
 
 // The error manager looks for the host's library when it is first used.
-inline const int host_directory_status = setenv("STREAMING_ENGINE_LIB", ZOLT_HOST_DIRECTORY, 1);
+inline const bool host_directory_is_set =
+    (zolt::os_set_environment("STREAMING_ENGINE_LIB", ZOLT_HOST_DIRECTORY), true);
 
 // The errors that the calling thread has reported since the last call, oldest first, each as
 // "Class.Method: message" with a line break; "(no host)" when nothing can be reported at all.

@@ -7,11 +7,11 @@
 #include <limits>
 #include <numeric>
 #include <stdexcept>
-#include <thread>
 
 #include "FakeEngine.h"
 #include "HostErrors.h"
 #include "SessionFakes.h"
+#include "common/Thread.h"
 #include "plugin/VideoH264ZoltEnc.h"
 
 namespace {
@@ -322,7 +322,7 @@ TEST_F(SessionTest, TakesSamplesThatHoldTheirPlanes) {
 TEST_F(SessionTest, ShowsNoOtherSizeWhileItIsRebuilt) {
     build();
     std::atomic<bool> done{false};
-    std::thread rebuilding([&] {
+    Thread rebuilding([&] {
         for (int i = 0; i < 2000; ++i) {
             session.PutStreamConfig(input.stream());
         }
@@ -374,7 +374,7 @@ TEST_F(SessionTest, AThrowingConsumerLeavesTheSessionUsable) {
     EXPECT_EQ(FakeEngine::take_calls(), "intra=30 encode reset ");
     consumer.on_sample = nullptr;
     // The lock is free: another thread gets through.
-    std::thread([&] { put_frame(40000); }).join();
+    Thread([&] { put_frame(40000); }).join();
     ASSERT_EQ(consumer.units.size(), 2u);
     EXPECT_EQ(consumer.units[1].bytes, (Bytes{0x41, 1}));
 }

@@ -9,7 +9,7 @@ if(NOT symbols STREQUAL "GetEncoderName GetEncoderType GetNewEncoder ")
     message(SEND_ERROR "The library exports: ${symbols}")
 endif()
 
-set(runtimes "linux-vdso|ld-linux[^.]*|libc|libm|libdl|librt|libpthread|libgcc_s|libstdc\\+\\+")
+set(runtimes "linux-vdso|linux-gate|ld-linux[^.]*|libc|libm|libdl|librt|libpthread|libgcc_s|libstdc\\+\\+")
 if(SANITIZERS)
     string(APPEND runtimes "|lib[alu]san|libubsan|libtsan")
 endif()

@@ -1,8 +1,9 @@
 #include "support/DllUtils.h"
 
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 
+#include <algorithm>
+#include <cctype>
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
@@ -10,6 +11,7 @@
 #include <string>
 
 #include "TempDir.h"
+#include "TestPlatform.h"
 #include "in_own_process.h"
 #include "support/dl.h"
 
@@ -17,21 +19,18 @@ namespace {
 
 namespace fs = std::filesystem;
 
+// A library's file name.
+std::string file(const std::string& name) {
+    return name + zolt::kDllExtension;
+}
+
 const char* const kNames[] = {"first_function", "second_function"};
 
 class DllUtilsTest : public testing::Test {
 protected:
     std::string add_library(const std::string& library, const std::string& name) const {
-        fs::copy_file(fs::path(ZOLT_TEST_LIBRARIES) / library, dir.path(name));
+        fs::copy_file(fs::path(ZOLT_TEST_LIBRARIES) / library, fs::u8path(dir.path(name)));
         return dir.path(name);
-    }
-
-    bool is_loaded(const std::string& path) const {
-        void* handle = dlopen(path.c_str(), RTLD_LAZY | RTLD_NOLOAD);
-        if (handle != nullptr) {
-            dlclose(handle);
-        }
-        return handle != nullptr;
     }
 
     const TempDir dir;
@@ -49,12 +48,12 @@ TEST_F(DllUtilsTest, DirectoryComesFromTheEnvironmentOrTheHost) {
     for (const auto& row : rows) {
         in_own_process([&row] {
             DllUtils::SetDllDir("");  // forgets what other tests have set
-            unsetenv(DllUtils::EnvVarStreamingEngineLib);
+            set_environment(DllUtils::EnvVarStreamingEngineLib, nullptr);
             if (row.variable != nullptr) {
-                setenv("STREAMING_ENGINE_LIB", row.variable, 1);
+                set_environment("STREAMING_ENGINE_LIB", row.variable);
             }
             EXPECT_EQ(row.expected, DllUtils::GetDllDir());
-            setenv("STREAMING_ENGINE_LIB", "/late", 1);
+            set_environment("STREAMING_ENGINE_LIB", "/late");
             EXPECT_EQ(row.expected, DllUtils::GetDllDir());  // found out once
 
             testing::internal::CaptureStdout();
@@ -73,24 +72,26 @@ TEST_F(DllUtilsTest, FullPathNameTriesPrefixesInOrder) {
     char out[300] = "untouched";
     EXPECT_EQ(1, DllUtils::ConstructDllFullPathName(out, "codec"));
     EXPECT_STREQ("", out);
-    fs::create_directory(dir.path("codec.so"));  // not a library
-    for (const char* file : {"libdll_codec.so", "libcodec.so"}) {
-        std::ofstream(dir.path(file)) << "x";
+    const std::string own = dir.path(file("codec"));
+    fs::create_directory(fs::u8path(own));  // not a library
+    for (const char* name : {"libdll_codec", "libcodec"}) {
+        const std::string path = dir.path(file(name));
+        std::ofstream(fs::u8path(path)) << "x";
         EXPECT_EQ(0, DllUtils::ConstructDllFullPathName(out, "codec"));
-        EXPECT_EQ(dir.path(file), out);
+        EXPECT_EQ(path, out);
     }
-    fs::remove(dir.path("codec.so"));
-    std::ofstream(dir.path("codec.so")) << "x";
-    std::ofstream(dir.path("libcodec.dll")) << "x";
+    fs::remove(fs::u8path(own));
+    std::ofstream(fs::u8path(own)) << "x";
+    std::ofstream(fs::u8path(dir.path("libcodec.other"))) << "x";
     EXPECT_EQ(0, DllUtils::ConstructDllFullPathName(out, "codec"));
-    EXPECT_EQ(dir.path("codec.so"), out);
-    EXPECT_EQ(0, DllUtils::ConstructDllFullPathName(out, "codec.dll"));
-    EXPECT_EQ(dir.path("libcodec.dll"), out);
+    EXPECT_EQ(own, out);
+    EXPECT_EQ(0, DllUtils::ConstructDllFullPathName(out, "codec.other"));
+    EXPECT_EQ(dir.path("libcodec.other"), out);
 }
 
 TEST_F(DllUtilsTest, LoadsALibraryOnlyWithAllItsFunctions) {
-    const std::string complete = add_library("complete.so", "complete.so");
-    const std::string partial = add_library("partial.so", "partial.so");
+    const std::string complete = add_library(file("complete"), file("complete"));
+    const std::string partial = add_library(file("partial"), file("partial"));
     void* functions[2];
 
     testing::internal::CaptureStdout();
@@ -105,7 +106,7 @@ TEST_F(DllUtilsTest, LoadsALibraryOnlyWithAllItsFunctions) {
     EXPECT_EQ(2, reinterpret_cast<int (*)()>(functions[1])());
     DllUtils::UnloadDll(nullptr, &handle);
     EXPECT_EQ(nullptr, handle);
-    EXPECT_FALSE(is_loaded(complete));
+    EXPECT_FALSE(library_is_loaded(complete));
 
     testing::internal::CaptureStdout();
     EXPECT_EQ(nullptr, DllUtils::LoadDll(partial.c_str(), 2, kNames, functions));
@@ -113,11 +114,11 @@ TEST_F(DllUtilsTest, LoadsALibraryOnlyWithAllItsFunctions) {
     EXPECT_NE(std::string::npos, lines.find("LOAD_DLLS>   Error in dlsym: ")) << lines;
     EXPECT_NE(std::string::npos, lines.find("second_function")) << lines;
     EXPECT_EQ(nullptr, functions[0]);
-    EXPECT_FALSE(is_loaded(partial));
+    EXPECT_FALSE(library_is_loaded(partial));
 
     functions[0] = functions[1] = this;
     testing::internal::CaptureStdout();
-    EXPECT_EQ(nullptr, DllUtils::LoadDll(dir.path("none.so").c_str(), 2, kNames, functions));
+    EXPECT_EQ(nullptr, DllUtils::LoadDll(dir.path(file("none")).c_str(), 2, kNames, functions));
     EXPECT_NE(std::string::npos,
               testing::internal::GetCapturedStdout().find("\nLOAD_DLLS> Error in dlopen: "));
     EXPECT_EQ(nullptr, functions[0]);
@@ -125,18 +126,14 @@ TEST_F(DllUtilsTest, LoadsALibraryOnlyWithAllItsFunctions) {
 }
 
 TEST_F(DllUtilsTest, LoadsAllFittingLibrariesOfADirectory) {
-    add_library("partial.so", "a.SO");
-    add_library("complete.so", "b.so");
-    add_library("complete.so", ".so");     // too short a name
-    add_library("complete.so", "c.so.1");  // not the extension
-    std::ofstream(dir.path("text.so")) << "not a library";
-    fs::create_directory(dir.path("d.so"));
-    fs::create_directory_symlink(dir.path("d.so"), dir.path("e.so"));
-    ASSERT_EQ(0, mkfifo(dir.path("f.so").c_str(), 0600));  // opening it would wait for a writer
-    char found[288];
+    std::string capitals = file("");
+    std::transform(capitals.begin(), capitals.end(), capitals.begin(), ::toupper);
+    add_library(file("partial"), "a" + capitals);
+    add_library(file("complete"), file("b"));
+    add_library(file("complete"), file("c") + ".1");  // not the extension
+    std::ofstream(fs::u8path(dir.path(file("text")))) << "not a library";
+    fs::create_directory(fs::u8path(dir.path(file("d"))));
     DllUtils::SetDllDir(dir.path().c_str());
-
-    EXPECT_EQ(1, DllUtils::ConstructDllFullPathName(found, "f"));
 
     char* names[4] = {};
     void* handles[4] = {};
@@ -151,7 +148,7 @@ TEST_F(DllUtilsTest, LoadsAllFittingLibrariesOfADirectory) {
     EXPECT_EQ(0, count);
     EXPECT_EQ(nullptr, names[0]);
     EXPECT_EQ(nullptr, handles[0]);
-    EXPECT_FALSE(is_loaded(dir.path("b.so")));
+    EXPECT_FALSE(library_is_loaded(dir.path(file("b"))));
 
     // One function: both libraries have it, each in its own slot.
     count = DllUtils::LoadAllDlls(dir.path().c_str(), 1, kNames, 4, nullptr, handles, functions);

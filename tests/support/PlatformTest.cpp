@@ -1,13 +1,21 @@
+// What the layer over the operating system does on Linux.
+
 #include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/time.h>
 
 #include <cerrno>
 #include <chrono>
+#include <csignal>
 #include <cstring>
+#include <filesystem>
+#include <memory>
 #include <set>
 #include <string>
 #include <thread>
 
 #include "TempDir.h"
+#include "support/DllUtils.h"
 #include "support/ErrMgr.h"
 #include "support/MutexLock.h"
 #include "support/Util.h"
@@ -66,6 +74,44 @@ TEST(Pdir, ListsADirectoryTwice) {
     EXPECT_EQ(0, closedir(listing));
     EXPECT_EQ(nullptr, opendir(dir.path("missing").c_str()));
     EXPECT_EQ(ENOENT, errno);
+}
+
+// Opening a pipe would wait for a writer.
+TEST(DllUtils, LeavesAloneWhatIsNoRegularFile) {
+    const TempDir dir;
+    const std::string library = std::string(ZOLT_TEST_LIBRARIES) + "/complete.so";
+    std::filesystem::copy_file(library, dir.path(".so"));  // too short a name
+    std::filesystem::create_directory(dir.path("directory"));
+    std::filesystem::create_directory_symlink(dir.path("directory"), dir.path("link.so"));
+    ASSERT_EQ(0, mkfifo(dir.path("pipe.so").c_str(), 0600));
+    DllUtils::SetDllDir(dir.path().c_str());
+    char found[288];
+    EXPECT_EQ(1, DllUtils::ConstructDllFullPathName(found, "pipe"));
+    void* handles[3];
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(0, DllUtils::LoadAllDlls(0, nullptr, 3, nullptr, handles, nullptr));
+    EXPECT_EQ("", testing::internal::GetCapturedStdout());
+}
+
+TEST(UtilFiles, ThatAreNoOrdinaryOnes) {
+    // A file whose size is not known beforehand.
+    const std::unique_ptr<char[]> status(Util::ReadFileIntoNewString("/proc/self/status"));
+    EXPECT_NE(nullptr, std::strstr(status.get(), "Pid:"));
+    // The disk is found full when the buffered bytes are written, at the end.
+    const unsigned char byte = 1;
+    EXPECT_EQ(1, Util::WriteByteArrayToFile("/dev/full", &byte, 1));
+}
+
+bool stop = false;
+
+TEST(SleepMsecs, StopsWhenTheFlagRises) {
+    ASSERT_NE(SIG_ERR, std::signal(SIGALRM, [](int) { stop = true; }));
+    const itimerval soon = {{0, 0}, {0, 60000}};
+    setitimer(ITIMER_REAL, &soon, nullptr);
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_EQ(1, Util::SleepMsecs(60000, &stop));
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
+    std::signal(SIGALRM, SIG_DFL);
 }
 
 TEST(Dl, ReportsTheLastError) {

@@ -8,11 +8,12 @@
 #include <fstream>
 #include <memory>
 #include <string>
-#include <thread>
 #include <utility>
 #include <vector>
 
 #include "TempDir.h"
+#include "TestPlatform.h"
+#include "common/Thread.h"
 #include "host/IErrData.h"
 #include "host/IEvent.h"
 #include "in_own_process.h"
@@ -21,6 +22,7 @@
 #include "support/ErrMgr.h"
 #include "support/Logger.h"
 #include "support/dl.h"
+#include "support/os.h"
 
 namespace {
 
@@ -28,6 +30,10 @@ namespace fs = std::filesystem;
 
 constexpr int kEngine = 0x656E6769;
 constexpr int kOs = 0x6F732020;
+
+std::string host_file() {
+    return std::string("host") + zolt::kDllExtension;
+}
 
 // The lines of the calling thread's logging: the host's logger calls back on the thread that logs.
 thread_local std::vector<std::string> logged;
@@ -70,7 +76,7 @@ void expect_nothing_there() {
     ErrMgr::Unload();
 
     EXPECT_TRUE(Logger::StartLoggingToStdout());
-    EXPECT_TRUE(Logger::StartLoggingToFile("/dev/null"));
+    EXPECT_TRUE(Logger::StartLoggingToFile(kNullDevice));
     EXPECT_TRUE(Logger::StartLoggingToFunc(collect));
     Logger::EnableLogTimeStamp(true);
     Logger::Enable(1, 2);
@@ -87,7 +93,7 @@ TEST(ProxiesWithoutHost, DoNothingAndNeverSearchAgain) {
     in_own_process([&dir] {
         DllUtils::SetDllDir(dir.path().c_str());
         expect_nothing_there();
-        fs::copy_file(ZOLT_HOST_LIBRARY, dir.path("host.so"));
+        fs::copy_file(ZOLT_HOST_LIBRARY, dir.path(host_file()));
         testing::internal::CaptureStdout();
         expect_nothing_there();
         EXPECT_EQ("", testing::internal::GetCapturedStdout());
@@ -105,7 +111,7 @@ TEST(ProxiesWithoutHost, MissingDirectoryDoesNotRecurse) {
             }
             expect_nothing_there();
             fs::create_directory(dir.path("missing"));
-            fs::copy_file(ZOLT_HOST_LIBRARY, dir.path("missing/host.so"));
+            fs::copy_file(ZOLT_HOST_LIBRARY, dir.path("missing/" + host_file()));
             expect_nothing_there();
             fs::remove_all(dir.path("missing"));
         });
@@ -115,11 +121,11 @@ TEST(ProxiesWithoutHost, MissingDirectoryDoesNotRecurse) {
 TEST(ProxiesWithoutHost, FactoriesWithoutAnObjectCountAsMissing) {
     const TempDir dir;
     in_own_process([&dir] {
-        const std::string path = dir.path("host.so");
-        fs::copy_file(fs::path(ZOLT_TEST_LIBRARIES) / "empty_host.so", path);
+        const std::string path = dir.path(host_file());
+        fs::copy_file(std::string(ZOLT_TEST_LIBRARIES "/empty_host") + zolt::kDllExtension, path);
         DllUtils::SetDllDir(dir.path().c_str());
         expect_nothing_there();
-        EXPECT_EQ(nullptr, dlopen(path.c_str(), RTLD_LAZY | RTLD_NOLOAD));
+        EXPECT_FALSE(library_is_loaded(path));
     });
 }
 
@@ -150,15 +156,9 @@ protected:
         EXPECT_FALSE(host_is_loaded());
     }
 
-    static std::string host_path() { return dir->path("host.so"); }
+    static std::string host_path() { return dir->path(host_file()); }
 
-    static bool host_is_loaded() {
-        void* handle = dlopen(host_path().c_str(), RTLD_LAZY | RTLD_NOLOAD);
-        if (handle != nullptr) {
-            dlclose(handle);
-        }
-        return handle != nullptr;
-    }
+    static bool host_is_loaded() { return library_is_loaded(host_path()); }
 
     static TempDir* dir;
 };
@@ -187,11 +187,13 @@ TEST_F(ProxiesWithHost, ReportsReachErrorManagerAndLogger) {
     expect_error(0, 0, "type", "extra", "typed 3", "Class::Method: type: typed 3");
     ErrMgr::SeErr(5, "Class", "Method", nullptr, "engine %d", 4);
     expect_error(kEngine, 5, nullptr, nullptr, "engine 4", "Class::Method: engine 4 [engi 5]");
-    errno = ENOENT;
+    zolt::os_set_last_error(ENOENT);
     ErrMgr::OsErr("Class", "Method", "extra", "system %d", 5);
-    EXPECT_EQ(ENOENT, errno);
+    EXPECT_EQ(ENOENT, zolt::os_last_error());
+    char text[200];
+    zolt::os_error_text(ENOENT, text, sizeof text);
     expect_error(kOs, ENOENT, nullptr, "extra", "system 5",
-                 "Class::Method: system 5 (No such file or directory, 2)");
+                 ("Class::Method: system 5 (" + std::string(text) + ", 2)").c_str());
     ErrMgr::AddErr(nullptr, nullptr, nullptr, "bare");
     EXPECT_EQ(nullptr, ErrMgr::GetError()->ClassName());
     EXPECT_EQ(Lines{"bare"}, take_logged());
@@ -199,10 +201,10 @@ TEST_F(ProxiesWithHost, ReportsReachErrorManagerAndLogger) {
 
 TEST_F(ProxiesWithHost, OsErrReadsTheCodeBeforeTheFirstLoad) {
     Logger::Unload();
-    errno = EACCES;
+    zolt::os_set_last_error(EACCES);
     ErrMgr::OsErr("Class", "Method", nullptr, "first use");
+    EXPECT_EQ(EACCES, zolt::os_last_error());
     EXPECT_EQ(EACCES, ErrMgr::GetError()->Code());
-    EXPECT_EQ(EACCES, errno);
 }
 
 TEST_F(ProxiesWithHost, LogLinesAreFilteredAndForwarded) {
@@ -268,7 +270,7 @@ TEST_F(ProxiesWithHost, TracesCanBeReadAndCleared) {
     ASSERT_EQ(1, ErrMgr::GetErrorTraceThreadIdList(&ids));
     const long own_id = ids[0];
     delete[] ids;
-    std::thread([own_id] {
+    Thread([own_id] {
         EXPECT_EQ(nullptr, ErrMgr::GetError());
         EXPECT_STREQ("one", ErrMgr::GetErrorTraceRoot(own_id)->Message());
         IErrData** other_trace = nullptr;
@@ -398,7 +400,7 @@ TEST_F(ProxiesWithHost, ManyThreads) {
     static constexpr int kThreads = 8;
     static constexpr int kReports = 50;
     Logger::Unload();
-    std::vector<std::thread> threads;
+    std::vector<Thread> threads;
     for (int t = 0; t < kThreads; t++) {
         threads.emplace_back([t] {
             if (t % 2 == 0) {
@@ -416,7 +418,7 @@ TEST_F(ProxiesWithHost, ManyThreads) {
             delete[] trace;
         });
     }
-    for (std::thread& thread : threads) {
+    for (Thread& thread : threads) {
         thread.join();
     }
     long* ids = nullptr;
@@ -442,15 +444,15 @@ TEST(HostInterfaces, OperationsKeepTheirSlots) {
         slot(&IErrMgr::AddTypedErr),
         slot(&IErrMgr::AddErr),
         slot(&IErrMgr::GetError),
-        slot<IErrData* (IErrMgr::*)()>(&IErrMgr::GetErrorTraceRoot),
-        slot<int (IErrMgr::*)(IErrData***)>(&IErrMgr::GetErrorTrace),
-        slot<char* (IErrMgr::*)()>(&IErrMgr::GetErrorTraceString),
-        slot<void (IErrMgr::*)()>(&IErrMgr::ClearErrorTrace),
+        slot(&IErrMgr::GetErrorTraceRoot),
+        slot(&IErrMgr::GetErrorTrace),
+        slot(&IErrMgr::GetErrorTraceString),
+        slot(&IErrMgr::ClearErrorTrace),
         slot(&IErrMgr::GetErrorTraceThreadIdList),
-        slot<IErrData* (IErrMgr::*)(long)>(&IErrMgr::GetErrorTraceRoot),
-        slot<int (IErrMgr::*)(long, IErrData***)>(&IErrMgr::GetErrorTrace),
-        slot<char* (IErrMgr::*)(long)>(&IErrMgr::GetErrorTraceString),
-        slot<void (IErrMgr::*)(long)>(&IErrMgr::ClearErrorTrace),
+        slot(&IErrMgr::GetThreadErrorTraceRoot),
+        slot(&IErrMgr::GetThreadErrorTrace),
+        slot(&IErrMgr::GetThreadErrorTraceString),
+        slot(&IErrMgr::ClearThreadErrorTrace),
     };
     const int logger[] = {
         slot(&ILogger::StartLoggingToFunc),

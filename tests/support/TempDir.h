@@ -6,7 +6,10 @@
 #include <filesystem>
 #include <string>
 
-// A directory of a test's own, removed with all that is in it at the end of the scope.
+#include "support/dl.h"
+
+// A directory of a test's own, removed with all that is in it at the end of the scope. Names are
+// UTF-8.
 class TempDir {
 public:
     TempDir() {
@@ -22,8 +25,8 @@ public:
     TempDir(const TempDir&) = delete;
     TempDir& operator=(const TempDir&) = delete;
 
-    std::string path() const { return root.string(); }
-    std::string path(const std::string& name) const { return (root / name).string(); }
+    std::string path() const { return root.u8string(); }
+    std::string path(const std::string& name) const { return path() + zolt::kDirSeparator + name; }
 
 private:
     std::filesystem::path root;

@@ -1,7 +1,6 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -127,10 +126,6 @@ TEST(UtilFiles, AreWrittenAndReadWhole) {
     EXPECT_NE(nullptr, read);
     EXPECT_EQ(0, read_size);
     delete[] read;
-
-    // A file whose size is not known beforehand.
-    const std::unique_ptr<char[]> status(Util::ReadFileIntoNewString("/proc/self/status"));
-    EXPECT_NE(nullptr, std::strstr(status.get(), "Pid:"));
     EXPECT_EQ(77, errno);
 }
 
@@ -152,9 +147,7 @@ TEST(UtilFiles, FailuresAreReported) {
     }
     EXPECT_EQ(1, Util::WriteByteArrayToFile(dir.path().c_str(), &byte, 1));
     EXPECT_EQ(1, Util::WriteByteArrayToFile(missing.c_str(), &byte, -1));
-    EXPECT_FALSE(std::filesystem::exists(missing));
-    // The disk is found full when the buffered bytes are written, at the end.
-    EXPECT_EQ(1, Util::WriteByteArrayToFile("/dev/full", &byte, 1));
+    EXPECT_FALSE(std::filesystem::exists(std::filesystem::u8path(missing)));
 }
 
 }  // namespace

@@ -1,11 +1,9 @@
 #include <gtest/gtest.h>
-#include <sys/time.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <climits>
-#include <csignal>
 #include <limits>
 #include <memory>
 
@@ -100,12 +98,12 @@ TEST(UtilRandom, FollowsTheMinimalStandardSequence) {
     EXPECT_EQ(1043618065, seed);
 
     for (const long unusual : {0L, -1L, LONG_MIN, LONG_MAX, Util::RandomMaxVal, -Util::RandomMaxVal,
-                               2 * Util::RandomMaxVal}) {
+                               LONG_MAX / Util::RandomMaxVal * Util::RandomMaxVal}) {
         const long value = Util::Random(unusual);
         EXPECT_GE(value, 1) << unusual;
         EXPECT_LT(value, Util::RandomMaxVal) << unusual;
     }
-    EXPECT_EQ(Util::Random(5), Util::Random(5 + Util::RandomMaxVal));
+    EXPECT_EQ(Util::Random(5), Util::Random(5 - Util::RandomMaxVal));
 }
 
 TEST(UtilRandom, ScalesIntoTheRange) {
@@ -183,13 +181,8 @@ protected:
             .count();
     }
 
-    static void raise_stop(int) { stop = true; }
-
-    static bool stop;
     const std::chrono::steady_clock::time_point start = std::chrono::steady_clock::now();
 };
-
-bool SleepMsecs::stop = false;
 
 TEST_F(SleepMsecs, SleepsTheWholeTime) {
     EXPECT_EQ(0, Util::SleepMsecs(0, nullptr));
@@ -202,21 +195,11 @@ TEST_F(SleepMsecs, SleepsTheWholeTime) {
 }
 
 TEST_F(SleepMsecs, LooksAtTheFlagBeforeEachSliceOnly) {
-    stop = true;
+    const bool stop = true;
     EXPECT_EQ(1, Util::SleepMsecs(60000, &stop));
     EXPECT_LT(elapsed_msecs(), 5000);
     EXPECT_EQ(0, Util::SleepMsecs(99, &stop));
     EXPECT_GE(elapsed_msecs(), 99);
-}
-
-TEST_F(SleepMsecs, StopsWhenTheFlagRises) {
-    stop = false;
-    ASSERT_NE(SIG_ERR, std::signal(SIGALRM, raise_stop));
-    const itimerval soon = {{0, 0}, {0, 60000}};
-    setitimer(ITIMER_REAL, &soon, nullptr);
-    EXPECT_EQ(1, Util::SleepMsecs(60000, &stop));
-    EXPECT_LT(elapsed_msecs(), 5000);
-    std::signal(SIGALRM, SIG_DFL);
 }
 
 }  // namespace

@@ -1,12 +1,14 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <cstring>
 #include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "TempDir.h"
+#include "TestPlatform.h"
 #include "in_own_process.h"
 #include "support/Util.h"
 
@@ -180,8 +182,9 @@ void handle(char* command, char** args, int num_args) {
 
 TEST(CmdLineInterpreter, RunsCommandsUntilQuit) {
     const TempDir dir;
-    std::ofstream(dir.path("input")) << "\n  \nEcho 'two words' x\nother\necho "
-                                     << std::string(294, 'a') << " echo 2\nQuit now\necho 3\n";
+    std::ofstream(dir.path("input"), std::ios::binary)
+        << "\n  \nEcho 'two words' x\nother\necho " << std::string(294, 'a')
+        << " echo 2\nQuit now\necho 3\n";
     in_own_process([&dir] {
         ASSERT_NE(nullptr, std::freopen(dir.path("input").c_str(), "r", stdin));
         testing::internal::CaptureStdout();
@@ -198,13 +201,13 @@ TEST(CmdLineInterpreter, RunsCommandsUntilQuit) {
 TEST(CmdLineInterpreter, StopsAtTheEndOfTheInput) {
     in_own_process(
         [] {
-            ASSERT_NE(nullptr, std::freopen("/dev/null", "r", stdin));
+            ASSERT_NE(nullptr, std::freopen(kNullDevice, "r", stdin));
             errno = EIO;
             Util::CmdLineInterpreter(nullptr, 0, nullptr, handle);
             EXPECT_EQ(EIO, errno);
             EXPECT_TRUE(handled.empty());
         },
-        "\nError reading command line - exiting: Success");
+        ("\nError reading command line - exiting: " + std::string(std::strerror(0))).c_str());
 }
 
 }  // namespace

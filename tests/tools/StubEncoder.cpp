@@ -35,6 +35,8 @@ unsigned long long digest(const unsigned char* data, long size) {
 
 class StubEncoder : public IMediaEncoder, public IConfigVideoAvc, public IVideoEncSettings {
 public:
+    ZOLT_DESTRUCTOR(StubEncoder) = default;
+
     void Notify(IEvent*) override {}
 
     int PutStreamConfig(ISampleStreamConfig* config) override {

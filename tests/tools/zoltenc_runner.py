@@ -2,16 +2,24 @@
 
 import os
 import pathlib
+import shlex
 import signal
 import subprocess
 import tempfile
 import unittest
 
-ZOLTENC = os.environ["ZOLTENC"]
+# The command that runs programs of another system than this one, and what those need of it.
+EMULATOR = shlex.split(os.environ.get("EMULATOR", ""))
+ENVIRONMENT = {**os.environ, **({"LC_ALL": "C.UTF-8"} if EMULATOR else {})}
+ZOLTENC_FILE = os.environ["ZOLTENC"]
+ZOLTENC = [*EMULATOR, ZOLTENC_FILE]
 STUB_ENCODER = os.environ["STUB_ENCODER"]
 NO_ENCODER = os.environ["NO_ENCODER"]
 FFMPEG = os.environ["FFMPEG"]
+ENCODER_LIBRARY = "VideoH264ZoltEnc.dll" if EMULATOR else "libVideoH264ZoltEnc.so"
 START_CODE = b"\0\0\0\1"
+
+native_only = unittest.skipIf(EMULATOR, "not for programs of another system")
 
 
 def restore_sigpipe():
@@ -59,14 +67,14 @@ class ToolTest(unittest.TestCase):
 
     def zoltenc(self, *arguments, stub=True, stub_does="", stdin=b"", environment=None):
         """Runs to the end; the result has returncode, stdout (bytes) and stderr (text)."""
-        command = [ZOLTENC, *(["--plugin", STUB_ENCODER] if stub else []), *arguments]
+        command = [*ZOLTENC, *(["--plugin", STUB_ENCODER] if stub else []), *arguments]
         result = subprocess.run(
             command,
             cwd=self.folder,
             input=stdin,
             stdout=subprocess.PIPE,
             stderr=subprocess.PIPE,
-            env={**os.environ, "ZOLT_STUB": stub_does, **(environment or {})},
+            env={**ENVIRONMENT, "ZOLT_STUB": stub_does, **(environment or {})},
             preexec_fn=restore_sigpipe,
             timeout=120,
             check=False,

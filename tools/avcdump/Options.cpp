@@ -14,6 +14,8 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
     bool csv = false;
 
     CLI::App app("Lists the NAL units of an H.264 elementary stream (Annex B).", "avcdump");
+    // A file's name may begin with '/' on any system.
+    app.allow_windows_style_options(false);
     app.set_version_flag("--version", "avcdump " ZOLT_VERSION);
     app.add_option("FILE", options.input, "File to read, '-' for standard input")->required();
     app.add_option("--fps", fps,

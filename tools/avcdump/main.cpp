@@ -1,5 +1,3 @@
-#include <signal.h>
-
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -16,6 +14,7 @@
 #include "avcdump/UnitLister.h"
 #include "io/ByteReader.h"
 #include "io/ToolError.h"
+#include "io/os.h"
 
 namespace {
 
@@ -26,11 +25,12 @@ constexpr int kWrongUsage = 2;
 struct PipeClosed {};
 
 [[noreturn]] void throw_output_error() {
-    if (errno == EPIPE) {
+    const int error = zolt::os_stream_error();
+    if (error == EPIPE) {
         throw PipeClosed();
     }
     throw zolt::ToolError(std::string("standard output: cannot be written: ") +
-                          std::strerror(errno));
+                          std::strerror(error));
 }
 
 void write_output(const std::string& text) {
@@ -99,9 +99,10 @@ int report(const std::exception& error, int status) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    signal(SIGPIPE, SIG_IGN);
+    zolt::os_prepare_streams();
     try {
-        const std::optional<zolt::Options> options = zolt::Options::parse(argc, argv);
+        const char* const* const arguments = zolt::os_command_line(&argc, argv);
+        const std::optional<zolt::Options> options = zolt::Options::parse(argc, arguments);
         if (options) {
             dump(*options);
         }

@@ -6,6 +6,7 @@
 
 #include "host/IEvent.h"
 #include "host/thread_id.h"
+#include "support/MutexLock.h"
 #include "support/Util.h"
 
 namespace zolt {
@@ -45,43 +46,43 @@ void HostErrMgr::AddErr(const char* cls, const char* method, const char* message
 }
 
 IErrData* HostErrMgr::GetError() {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     const Trace* trace = find(current_thread_id());
     return trace == nullptr ? nullptr : trace->back().get();
 }
 
 IErrData* HostErrMgr::GetErrorTraceRoot() {
-    return GetErrorTraceRoot(current_thread_id());
+    return GetThreadErrorTraceRoot(current_thread_id());
 }
 
 int HostErrMgr::GetErrorTrace(IErrData*** trace) {
-    return GetErrorTrace(current_thread_id(), trace);
+    return GetThreadErrorTrace(current_thread_id(), trace);
 }
 
 char* HostErrMgr::GetErrorTraceString() {
-    return GetErrorTraceString(current_thread_id());
+    return GetThreadErrorTraceString(current_thread_id());
 }
 
 void HostErrMgr::ClearErrorTrace() {
-    ClearErrorTrace(current_thread_id());
+    ClearThreadErrorTrace(current_thread_id());
 }
 
 int HostErrMgr::GetErrorTraceThreadIdList(long** ids) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     *ids = new long[traces.size()];
     std::transform(traces.begin(), traces.end(), *ids,
                    [](const auto& entry) { return entry.first; });
     return static_cast<int>(traces.size());
 }
 
-IErrData* HostErrMgr::GetErrorTraceRoot(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+IErrData* HostErrMgr::GetThreadErrorTraceRoot(long thread_id) {
+    const MutexLock lock(mutex);
     const Trace* trace = find(thread_id);
     return trace == nullptr ? nullptr : trace->front().get();
 }
 
-int HostErrMgr::GetErrorTrace(long thread_id, IErrData*** trace) {
-    const std::lock_guard<std::mutex> lock(mutex);
+int HostErrMgr::GetThreadErrorTrace(long thread_id, IErrData*** trace) {
+    const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
         *trace = nullptr;
@@ -93,8 +94,8 @@ int HostErrMgr::GetErrorTrace(long thread_id, IErrData*** trace) {
     return static_cast<int>(errors->size());
 }
 
-char* HostErrMgr::GetErrorTraceString(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+char* HostErrMgr::GetThreadErrorTraceString(long thread_id) {
+    const MutexLock lock(mutex);
     const Trace* errors = find(thread_id);
     if (errors == nullptr) {
         return nullptr;
@@ -106,14 +107,14 @@ char* HostErrMgr::GetErrorTraceString(long thread_id) {
     return Util::CopyString(text.c_str());
 }
 
-void HostErrMgr::ClearErrorTrace(long thread_id) {
-    const std::lock_guard<std::mutex> lock(mutex);
+void HostErrMgr::ClearThreadErrorTrace(long thread_id) {
+    const MutexLock lock(mutex);
     traces.erase(thread_id);
 }
 
 void HostErrMgr::add(const std::shared_ptr<ErrData>& error) {
     {
-        const std::lock_guard<std::mutex> lock(mutex);
+        const MutexLock lock(mutex);
         Trace& trace = traces[current_thread_id()];
         trace.push_back(error);
         if (trace.size() > kMaxTraceLength) {

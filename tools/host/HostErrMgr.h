@@ -4,11 +4,11 @@
 #include <deque>
 #include <map>
 #include <memory>
-#include <mutex>
 
 #include "host/ErrData.h"
 #include "media/IEventListener.h"
 #include "support/IErrMgr.h"
+#include "support/SimpleMutex.h"
 
 namespace zolt {
 
@@ -34,10 +34,10 @@ public:
     void ClearErrorTrace() override;
 
     int GetErrorTraceThreadIdList(long** ids) override;
-    IErrData* GetErrorTraceRoot(long thread_id) override;
-    int GetErrorTrace(long thread_id, IErrData*** trace) override;
-    char* GetErrorTraceString(long thread_id) override;
-    void ClearErrorTrace(long thread_id) override;
+    IErrData* GetThreadErrorTraceRoot(long thread_id) override;
+    int GetThreadErrorTrace(long thread_id, IErrData*** trace) override;
+    char* GetThreadErrorTraceString(long thread_id) override;
+    void ClearThreadErrorTrace(long thread_id) override;
 
 private:
     // Oldest first, never empty.
@@ -48,7 +48,7 @@ private:
     // Null when the thread has no errors. Called with the mutex held.
     const Trace* find(long thread_id) const;
 
-    std::mutex mutex;
+    SimpleMutex mutex;
     std::map<long, Trace> traces;
     std::atomic<IEventListener*> listener{nullptr};
 };

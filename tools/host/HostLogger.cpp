@@ -4,6 +4,7 @@
 
 #include "host/log_text.h"
 #include "host/thread_id.h"
+#include "support/MutexLock.h"
 #include "support/Util.h"
 #include "support/os.h"
 
@@ -33,7 +34,7 @@ bool HostLogger::StartLoggingToFunc(void (*log)(char*)) {
     if (log == nullptr) {
         return true;
     }
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     function = log;
     file.reset();
     to_stdout = false;
@@ -45,7 +46,7 @@ bool HostLogger::StartLoggingToFile(const char* file_name) {
     if (!opened) {
         return true;
     }
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     function = nullptr;
     file = std::move(opened);
     to_stdout = false;
@@ -53,7 +54,7 @@ bool HostLogger::StartLoggingToFile(const char* file_name) {
 }
 
 bool HostLogger::StartLoggingToStdout() {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     function = nullptr;
     file.reset();
     to_stdout = true;
@@ -61,24 +62,24 @@ bool HostLogger::StartLoggingToStdout() {
 }
 
 void HostLogger::EndLogging() {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     function = nullptr;
     file.reset();
     to_stdout = false;
 }
 
 void HostLogger::EnableLogTimeStamp(bool enable) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     with_time = enable;
 }
 
 void HostLogger::EnableLogPidThreadId(bool enable) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     with_thread = enable;
 }
 
 void HostLogger::EnableLogClassMethod(bool enable) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     with_origin = enable;
 }
 
@@ -98,17 +99,17 @@ void HostLogger::Log(const char* cls, const char* method, const char* message) {
 }
 
 void HostLogger::Enable(int a, int b) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     enabled.emplace(a, b);
 }
 
 void HostLogger::Disable(int a, int b) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     enabled.erase({a, b});
 }
 
 bool HostLogger::IsEnabled(int a, int b) {
-    const std::lock_guard<std::mutex> lock(mutex);
+    const MutexLock lock(mutex);
     return enabled.count({a, b}) != 0;
 }
 
@@ -116,7 +117,7 @@ void HostLogger::log_line(const char* cls, const char* method, const std::string
     void (*receiver)(char*) = nullptr;
     std::string line;
     {
-        const std::lock_guard<std::mutex> lock(mutex);
+        const MutexLock lock(mutex);
         line = (with_time ? time_text() : "") + (with_thread ? thread_text() : "") +
                (with_origin ? origin_text(cls, method) : "") + message;
         receiver = function;

@@ -2,12 +2,12 @@
 
 #include <cstdio>
 #include <memory>
-#include <mutex>
 #include <set>
 #include <string>
 #include <utility>
 
 #include "support/ILogger.h"
+#include "support/SimpleMutex.h"
 
 namespace zolt {
 
@@ -43,7 +43,7 @@ private:
 
     void log_line(const char* cls, const char* method, const std::string& message);
 
-    std::mutex mutex;
+    SimpleMutex mutex;
     void (*function)(char*) = nullptr;
     File file{nullptr, std::fclose};
     bool to_stdout = false;

@@ -1,16 +1,15 @@
 #pragma once
 
-#include <mutex>
+#include "support/MutexLock.h"
 
 namespace zolt {
 
-// An object made for its first user and deleted with its last one. Trivially destroyed: users that
-// have not given the object back may call it until the process ends.
+// An object made for its first user and deleted with its last one.
 template <class T>
 class SharedObject {
 public:
     T* get() {
-        const std::lock_guard<std::mutex> lock(mutex);
+        const MutexLock lock(mutex);
         if (users == 0) {
             object = new T;
         }
@@ -20,7 +19,7 @@ public:
 
     // Nothing happens without a user.
     void give_back() {
-        const std::lock_guard<std::mutex> lock(mutex);
+        const MutexLock lock(mutex);
         if (users > 0 && --users == 0) {
             delete object;
             object = nullptr;
@@ -28,7 +27,7 @@ public:
     }
 
 private:
-    std::mutex mutex;
+    SimpleMutex mutex;
     int users = 0;
     T* object = nullptr;
 };

@@ -1,3 +1,5 @@
+#include <new>
+
 #include "host/HostErrMgr.h"
 #include "host/HostLogger.h"
 #include "host/SharedObject.h"
@@ -5,23 +7,29 @@
 
 namespace {
 
-zolt::SharedObject<zolt::HostErrMgr> err_mgr;
-zolt::SharedObject<zolt::HostLogger> logger;
+// Never destroyed: users that have not given the object back may call it until the process ends.
+template <class T>
+zolt::SharedObject<T>& shared() {
+    using Shared = zolt::SharedObject<T>;
+    alignas(Shared) static unsigned char storage[sizeof(Shared)];
+    static Shared* const object = new (storage) Shared;
+    return *object;
+}
 
 }  // namespace
 
 IErrMgr* GetErrMgr() {
-    return err_mgr.get();
+    return shared<zolt::HostErrMgr>().get();
 }
 
 void DeleteErrMgr() {
-    err_mgr.give_back();
+    shared<zolt::HostErrMgr>().give_back();
 }
 
 ILogger* GetLogger() {
-    return logger.get();
+    return shared<zolt::HostLogger>().get();
 }
 
 void DeleteLogger() {
-    logger.give_back();
+    shared<zolt::HostLogger>().give_back();
 }

@@ -1,9 +1,5 @@
 #include "io/ByteReader.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
@@ -11,24 +7,25 @@
 
 #include "io/StopSignal.h"
 #include "io/ToolError.h"
+#include "io/os.h"
 
 namespace zolt {
 
 ByteReader::ByteReader(const std::string& file_name)
     : name_(file_name == "-" ? "standard input" : file_name), buffer_(kBufferSize) {
     if (file_name == "-") {
-        descriptor_ = STDIN_FILENO;
+        descriptor_ = kStandardInput;
         return;
     }
-    descriptor_ = open(file_name.c_str(), O_RDONLY | O_CLOEXEC);
+    descriptor_ = os_open_input(file_name);
     if (descriptor_ < 0) {
         throw ToolError(name_ + ": cannot be read: " + std::strerror(errno));
     }
 }
 
 ByteReader::~ByteReader() {
-    if (descriptor_ > STDIN_FILENO) {
-        close(descriptor_);
+    if (descriptor_ > kStandardInput) {
+        os_close(descriptor_);
     }
 }
 
@@ -90,21 +87,16 @@ ByteReader::Line ByteReader::read_line(std::string& line, std::size_t max_length
 }
 
 std::optional<std::int64_t> ByteReader::bytes_left() const {
-    struct stat status;
-    if (fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) {
+    const std::optional<std::int64_t> unread = os_bytes_left(descriptor_);
+    if (!unread) {
         return std::nullopt;
     }
-    const off_t position = lseek(descriptor_, 0, SEEK_CUR);
-    if (position < 0) {
-        return std::nullopt;
-    }
-    return std::max<std::int64_t>(0, status.st_size - position) +
-           static_cast<std::int64_t>(buffered());
+    return std::max<std::int64_t>(0, *unread) + static_cast<std::int64_t>(buffered());
 }
 
 std::size_t ByteReader::read_some(unsigned char* data, std::size_t size) {
     while (StopSignal::received() == 0) {
-        const ssize_t got = ::read(descriptor_, data, size);
+        const std::ptrdiff_t got = os_read(descriptor_, data, size);
         if (got >= 0) {
             return static_cast<std::size_t>(got);
         }

@@ -1,15 +1,13 @@
 #include "io/OutputFile.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <cerrno>
 #include <cstring>
-#include <filesystem>
 #include <set>
 
 #include "io/ToolError.h"
+#include "io/os.h"
+#include "support/dl.h"
+#include "support/os.h"
 
 namespace zolt {
 namespace {
@@ -20,7 +18,7 @@ class UnfinishedFiles {
 public:
     ~UnfinishedFiles() {
         for (const std::string& file : names) {
-            unlink(file.c_str());
+            os_remove(file);
         }
     }
     std::set<std::string> names;
@@ -35,35 +33,23 @@ UnfinishedFiles& unfinished_files() {
 
 OutputFile::OutputFile(const std::string& file_name)
     : name_(file_name == "-" ? "standard output" : file_name) {
-    if (file_name == "-") {
-        descriptor_ = fcntl(STDOUT_FILENO, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
+    const std::optional<FileStatus> there = file_name == "-" ? std::nullopt : os_status(file_name);
+    if (file_name == "-" || (there && !there->is_regular)) {
+        descriptor_ = file_name == "-" ? os_duplicate_output() : os_open_output(file_name);
         if (descriptor_ < 0) {
             fail(std::strerror(errno));
         }
         return;
     }
-    struct stat status;
-    const bool exists = stat(file_name.c_str(), &status) == 0;
-    if (exists && !S_ISREG(status.st_mode)) {
-        descriptor_ = open(file_name.c_str(), O_WRONLY | O_CLOEXEC);
-        if (descriptor_ < 0) {
-            fail(std::strerror(errno));
-        }
-        return;
-    }
-    if (exists && access(file_name.c_str(), W_OK) != 0) {
+    if (there && !os_may_write(file_name)) {
         fail(std::strerror(errno));
     }
     // A link stays a link: what it points to is replaced.
-    std::error_code error;
-    place_ = std::filesystem::weakly_canonical(file_name, error).string();
-    if (error) {
-        fail(error.message());
+    place_ = os_resolved_name(file_name);
+    if (place_.empty()) {
+        fail(std::strerror(errno));
     }
-    open_beside();
-    if (exists) {
-        fchmod(descriptor_, status.st_mode & 07777);
-    }
+    open_beside(there);
 }
 
 OutputFile::~OutputFile() {
@@ -71,21 +57,20 @@ OutputFile::~OutputFile() {
 }
 
 bool OutputFile::would_replace(const std::string& input) const {
-    struct stat ours;
-    struct stat theirs;
-    const int found = input == "-" ? fstat(STDIN_FILENO, &theirs) : stat(input.c_str(), &theirs);
-    return found == 0 && !place_.empty() && stat(place_.c_str(), &ours) == 0 &&
-           ours.st_dev == theirs.st_dev && ours.st_ino == theirs.st_ino;
+    const std::optional<FileStatus> theirs =
+        input == "-" ? os_status(kStandardInput) : os_status(input);
+    const std::optional<FileStatus> ours = place_.empty() ? std::nullopt : os_status(place_);
+    return ours && theirs && ours->is_same_file(*theirs);
 }
 
 bool OutputFile::would_replace(const OutputFile& other) const {
-    return !place_.empty() && place_ == other.place_;
+    return !place_.empty() && os_is_same_name(place_, other.place_);
 }
 
 void OutputFile::write(const void* data, std::size_t size) {
     const auto* bytes = static_cast<const unsigned char*>(data);
     while (size > 0) {
-        const ssize_t written = ::write(descriptor_, bytes, size);
+        const std::ptrdiff_t written = os_write(descriptor_, bytes, size);
         if (written < 0) {
             if (errno == EINTR) {
                 continue;
@@ -101,26 +86,25 @@ void OutputFile::commit() {
     const int descriptor = descriptor_;
     descriptor_ = -1;
     // Some file systems report a failed write only here.
-    if (close(descriptor) != 0) {
+    if (!os_close(descriptor)) {
         fail(std::strerror(errno));
     }
     if (place_.empty()) {
         return;
     }
-    if (std::rename(temporary_.c_str(), place_.c_str()) != 0) {
+    if (!os_replace(temporary_, place_)) {
         fail(std::strerror(errno));
     }
     unfinished_files().names.erase(temporary_);
     temporary_.clear();
 }
 
-void OutputFile::open_beside() {
-    const std::filesystem::path folder = std::filesystem::path(place_).parent_path();
+void OutputFile::open_beside(const std::optional<FileStatus>& like) {
+    const std::string folder = place_.substr(0, place_.rfind(kDirSeparator) + 1);
     for (int attempt = 0; descriptor_ < 0; ++attempt) {
-        temporary_ = (folder / (".zolt-" + std::to_string(getpid()) + "-" +
-                                std::to_string(attempt) + ".part"))
-                         .string();
-        descriptor_ = open(temporary_.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666);
+        temporary_ = folder + ".zolt-" + std::to_string(os_process_id()) + "-" +
+                     std::to_string(attempt) + ".part";
+        descriptor_ = os_create(temporary_, like);
         if (descriptor_ < 0 && errno != EEXIST) {
             temporary_.clear();
             fail(std::strerror(errno));
@@ -135,10 +119,10 @@ void OutputFile::fail(const std::string& what) const {
 
 void OutputFile::discard() {
     if (descriptor_ >= 0) {
-        close(descriptor_);
+        os_close(descriptor_);
     }
     if (!temporary_.empty()) {
-        unlink(temporary_.c_str());
+        os_remove(temporary_);
         unfinished_files().names.erase(temporary_);
     }
 }

@@ -1,7 +1,10 @@
 #pragma once
 
 #include <cstddef>
+#include <optional>
 #include <string>
+
+#include "io/os.h"
 
 namespace zolt {
 
@@ -30,7 +33,7 @@ public:
     void commit();
 
 private:
-    void open_beside();
+    void open_beside(const std::optional<FileStatus>& like);
     [[noreturn]] void fail(const std::string& what) const;
     void discard();
 

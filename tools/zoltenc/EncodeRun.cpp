@@ -6,6 +6,7 @@
 #include "io/RawReader.h"
 #include "io/StopSignal.h"
 #include "io/ToolError.h"
+#include "io/os.h"
 #include "media/IConfigVideoAvc.h"
 #include "zoltenc/EncoderLibrary.h"
 #include "zoltenc/EncoderSession.h"
@@ -15,8 +16,6 @@
 
 namespace zolt {
 namespace {
-
-constexpr const char* kLibraryName = "libVideoH264ZoltEnc.so";
 
 std::string size_text(int width, int height) {
     return std::to_string(width) + "x" + std::to_string(height);
@@ -54,11 +53,10 @@ void EncodeRun::run() {
     skip_frames();
 
     // What the library prints on standard output must not enter the stream.
-    HostServices::divert_library_output(options_.verbose);
+    os_divert_output(options_.verbose);
     HostServices::announce();
-    const EncoderLibrary library(options_.plugin.empty()
-                                     ? (HostServices::directory() / kLibraryName).string()
-                                     : options_.plugin);
+    const EncoderLibrary library(
+        options_.plugin.empty() ? os_program_directory() + ZOLT_ENCODER_LIBRARY : options_.plugin);
     EncoderSession session(library, source_->format(), frame_rate_,
                            {options_.bit_rate_kbs, options_.key_frame_interval}, consumer_);
     describe(library);

@@ -1,24 +1,23 @@
 #include "zoltenc/EncoderLibrary.h"
 
-#include <dlfcn.h>
-
 #include "io/ToolError.h"
 #include "media/IMediaEncoder.h"
 #include "media/MediaType.h"
+#include "support/dl.h"
 
 namespace zolt {
 namespace {
 
 // Without a directory in its name, dlopen would look for the file where the system's libraries are.
 std::string as_path(const std::string& file_name) {
-    return file_name.find('/') == std::string::npos ? "./" + file_name : file_name;
+    const char separators[] = {'/', kDirSeparator, '\0'};
+    return file_name.find_first_of(separators) == std::string::npos ? "./" + file_name : file_name;
 }
 
 }  // namespace
 
 EncoderLibrary::EncoderLibrary(const std::string& file_name)
-    : file_name_(file_name),
-      handle_(dlopen(as_path(file_name).c_str(), RTLD_NOW | RTLD_LOCAL), dlclose) {
+    : file_name_(file_name), handle_(dlopen(as_path(file_name).c_str(), RTLD_NOW), dlclose) {
     if (!handle_) {
         throw ToolError(file_name + ": cannot be loaded as the encoder library (" + dlerror() +
                         "); name the right one with --plugin");
@@ -35,8 +34,8 @@ EncoderLibrary::EncoderLibrary(const std::string& file_name)
 
 EncoderLibrary::~EncoderLibrary() = default;
 
-std::unique_ptr<IMediaEncoder> EncoderLibrary::new_encoder() const {
-    std::unique_ptr<IMediaEncoder> encoder(get_new_encoder_());
+std::unique_ptr<IMediaEncoder, Delete> EncoderLibrary::new_encoder() const {
+    std::unique_ptr<IMediaEncoder, Delete> encoder(get_new_encoder_());
     if (!encoder) {
         throw ToolError(file_name_ + ": gives no encoder object");
     }

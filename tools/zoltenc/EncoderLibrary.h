@@ -3,6 +3,8 @@
 #include <memory>
 #include <string>
 
+#include "media/abi.h"
+
 class IMediaEncoder;
 
 namespace zolt {
@@ -22,7 +24,7 @@ public:
     // The encoder's display name.
     const char* encoder_name() const { return get_encoder_name_(); }
 
-    std::unique_ptr<IMediaEncoder> new_encoder() const;
+    std::unique_ptr<IMediaEncoder, Delete> new_encoder() const;
 
 private:
     template <class Function>

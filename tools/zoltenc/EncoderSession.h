@@ -59,7 +59,7 @@ private:
     InputConfig input_config_;
     MediaStreamConfig stream_config_;
     MediaSample sample_;
-    std::unique_ptr<IMediaEncoder> encoder_;
+    std::unique_ptr<IMediaEncoder, Delete> encoder_;
 };
 
 }  // namespace zolt

@@ -1,36 +1,31 @@
 #include "zoltenc/HostServices.h"
 
-#include <dlfcn.h>
-#include <fcntl.h>
-#include <unistd.h>
-
-#include <cstdlib>
 #include <memory>
 
 #include "host/IErrData.h"
+#include "io/os.h"
 #include "support/IErrMgr.h"
+#include "support/dl.h"
+#include "support/os.h"
 
 namespace zolt {
 namespace {
 
 constexpr const char* kDirectoryVariable = "STREAMING_ENGINE_LIB";
-constexpr const char* kHostLibrary = "zolt_host.so";
 
 }  // namespace
 
-std::filesystem::path HostServices::directory() {
-    return std::filesystem::read_symlink("/proc/self/exe").parent_path();
-}
-
 void HostServices::announce() {
-    setenv(kDirectoryVariable, directory().c_str(), 0);
+    if (os_environment(kDirectoryVariable).empty()) {
+        os_set_environment(kDirectoryVariable, os_program_directory().c_str());
+    }
 }
 
 std::string HostServices::last_error() {
     // The encoder library loads the host's library with the first error that it reports. When it
     // has not loaded this one, there is nothing to ask.
     const std::unique_ptr<void, int (*)(void*)> library(
-        dlopen((directory() / kHostLibrary).c_str(), RTLD_NOW | RTLD_NOLOAD), dlclose);
+        os_loaded_library(os_program_directory() + ZOLT_HOST_LIBRARY), dlclose);
     if (!library) {
         return "";
     }
@@ -40,18 +35,6 @@ std::string HostServices::last_error() {
     std::string message = error == nullptr ? "" : error->Message();
     delete_err_mgr();
     return message;
-}
-
-void HostServices::divert_library_output(bool visible) {
-    if (visible) {
-        dup2(STDERR_FILENO, STDOUT_FILENO);
-        return;
-    }
-    const int nowhere = open("/dev/null", O_WRONLY);
-    if (nowhere >= 0) {
-        dup2(nowhere, STDOUT_FILENO);
-        close(nowhere);
-    }
 }
 
 }  // namespace zolt

@@ -109,7 +109,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.add_option("--stats", options.stats, "Write a CSV file with one row per picture")
         ->type_name("FILE");
     app.add_option("--plugin", options.plugin,
-                   "Encoder library (otherwise libVideoH264ZoltEnc.so beside this program)")
+                   "Encoder library (otherwise " ZOLT_ENCODER_LIBRARY " beside this program)")
         ->type_name("FILE");
     app.add_flag("--keep-partial", options.keep_partial,
                  "Keep what was written when coding fails in mid-stream");
@@ -123,6 +123,8 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
     Options options;
     OptionTexts texts;
     CLI::App app("Codes video to an H.264 elementary stream (Annex B).", "zoltenc");
+    // A file's name may begin with '/' on any system.
+    app.allow_windows_style_options(false);
     app.get_formatter()->column_width(34);
     add_options(app, options, texts);
     try {

@@ -1,11 +1,11 @@
 #include "zoltenc/Progress.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <cmath>
 #include <cstdio>
 #include <string>
+
+#include "io/os.h"
 
 namespace zolt {
 namespace {
@@ -30,7 +30,7 @@ std::string clock_text(double seconds) {
 Progress::Progress(std::optional<std::int64_t> total, const FrameRate& frame_rate, bool visible)
     : total_(total),
       frame_rate_(frame_rate.per_second()),
-      on_terminal_(visible && isatty(STDERR_FILENO) == 1) {}
+      on_terminal_(visible && os_has_terminal()) {}
 
 void Progress::update(std::int64_t frames, std::int64_t bytes) {
     const Clock::time_point now = Clock::now();

@@ -1,14 +1,10 @@
-#include <fcntl.h>
-#include <signal.h>
-#include <unistd.h>
-
 #include <cstdio>
-#include <cstdlib>
 #include <exception>
 #include <optional>
 
 #include "io/StopSignal.h"
 #include "io/ToolError.h"
+#include "io/os.h"
 #include "zoltenc/EncodeRun.h"
 #include "zoltenc/Options.h"
 
@@ -16,19 +12,6 @@ namespace {
 
 constexpr int kFailure = 1;
 constexpr int kWrongUsage = 2;
-
-// A standard stream that the caller closed must not become the descriptor of a file that is opened
-// later. It is replaced by one on which reading (standard input) or writing (the others) fails.
-void occupy_standard_streams() {
-    for (const int stream : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
-        if (fcntl(stream, F_GETFD) == -1) {
-            const int mode = stream == STDIN_FILENO ? O_WRONLY : O_RDONLY;
-            if (open("/dev/null", mode) != stream) {
-                std::exit(kFailure);
-            }
-        }
-    }
-}
 
 // Returns the exit status of a run that went well; that of a stopped one is the one of a process
 // that the signal has ended.
@@ -55,11 +38,10 @@ int report(const std::exception& error, int status) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    occupy_standard_streams();
-    // A closed pipe is an error of the write, which names the output.
-    signal(SIGPIPE, SIG_IGN);
+    zolt::os_prepare_streams();
     try {
-        const std::optional<zolt::Options> options = zolt::Options::parse(argc, argv);
+        const char* const* const arguments = zolt::os_command_line(&argc, argv);
+        const std::optional<zolt::Options> options = zolt::Options::parse(argc, arguments);
         if (!options) {
             return 0;
         }

@@ -1,0 +1,5 @@
+set(CMAKE_SYSTEM_PROCESSOR x86_64)
+set(triple x86_64-w64-mingw32)
+set(wine wine64)
+set(wine_arch win64)
+include(${CMAKE_CURRENT_LIST_DIR}/windows.cmake)
