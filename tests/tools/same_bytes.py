@@ -3,7 +3,7 @@
 
 Whether builds give the same bytes for the clips in the folder that ZOLT_TEST_CLIPS names: zoltenc at
 several bit rates, and the engine at several QPs and bit rates with every table of kernels. A BUILD is
-a build directory; Windows programs in it are run with the command in EMULATOR (otherwise "wine64").
+a build directory; Windows programs in it are run with the command in EMULATOR (otherwise "wine").
 Prints a line for every clip and setting; ends with status 1 when any two builds or tables differ.
 """
 
@@ -17,7 +17,7 @@ import tempfile
 
 BIT_RATES = (0, 100, 500, 2000)  # kbit/s
 SETTINGS = ("qp10", "qp28", "qp45", "100k", "2000k")
-EMULATOR = shlex.split(os.environ.get("EMULATOR", "wine64"))
+EMULATOR = shlex.split(os.environ.get("EMULATOR", "wine"))
 
 
 def command(build, program):
