@@ -90,10 +90,9 @@ struct _mv {
 class CEncoder {
 public:
     // width, height: luma samples, from 16 to 16880 each, at most 139264 macroblocks in all (else
-    // exitOnError, status -1). Sizes that are
-    // not multiples of 16 are accepted; the picture coded is the top left part of the size rounded
-    // down. kernels: the table of sample loops to use, borrowed; null: the fastest of this
-    // processor.
+    // exitOnError, status -1). Sizes that are not multiples of 16 are accepted; the picture coded
+    // is the top left part of the size rounded down. kernels: the table of sample loops to use,
+    // borrowed; null: the fastest of this processor.
     CEncoder(int width, int height, const zolt::Kernels* kernels = nullptr);
     CEncoder(const CEncoder&) = delete;
     CEncoder& operator=(const CEncoder&) = delete;

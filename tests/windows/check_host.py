@@ -20,7 +20,7 @@ SKIPPED = 77
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--host", required=True, type=pathlib.Path)
-    parser.add_argument("--library", required=True, type=pathlib.Path)
+    parser.add_argument("--plugin", required=True, type=pathlib.Path)
     parser.add_argument("--zoltenc", required=True, type=pathlib.Path)
     parser.add_argument("--directory", required=True, type=pathlib.Path)
     parser.add_argument("emulator", nargs="*")
@@ -35,7 +35,7 @@ def main():
     shutil.rmtree(arguments.directory, ignore_errors=True)
     services = arguments.directory / "services"
     services.mkdir(parents=True)
-    shutil.copy(arguments.library, arguments.directory)
+    shutil.copy(arguments.plugin, arguments.directory)
     shutil.copy(arguments.host.with_name("services_msabi.dll"), services)
     host = subprocess.run(
         [*arguments.emulator, arguments.host], cwd=arguments.directory, text=True,
