@@ -4,12 +4,12 @@
 #include <limits>
 #include <numeric>
 
+#include "io/PictureTime.h"
 #include "io/numbers.h"
 
 namespace zolt {
 namespace {
 
-constexpr std::int64_t kMicrosecondsPerSecond = 1000000;
 constexpr std::size_t kMaxDecimalPlaces = 6;
 
 std::optional<FrameRate> reduced(std::int64_t numerator, std::int64_t denominator) {
@@ -60,13 +60,7 @@ double FrameRate::per_second() const {
 }
 
 std::int64_t FrameRate::sample_time(std::int64_t index) const {
-    // index * 1000000 * denominator / numerator, split so that no product leaves 64 bits: only an
-    // absurdly low rate has times that do.
-    constexpr std::int64_t kMaxSeconds =
-        std::numeric_limits<std::int64_t>::max() / kMicrosecondsPerSecond - 1;
-    const std::int64_t scaled = index * denominator;
-    return std::min(scaled / numerator, kMaxSeconds) * kMicrosecondsPerSecond +
-           scaled % numerator * kMicrosecondsPerSecond / numerator;
+    return microseconds(index, {denominator, numerator});
 }
 
 std::string FrameRate::to_string() const {

@@ -6,6 +6,8 @@
 
 #include "io/FrameRate.h"
 #include "io/PictureFormat.h"
+#include "io/PictureTime.h"
+#include "io/VideoTraits.h"
 
 namespace zolt {
 
@@ -21,6 +23,15 @@ public:
 
     // The rate that the source states; nothing where it states none.
     virtual std::optional<FrameRate> frame_rate() const = 0;
+
+    virtual VideoTraits traits() const { return {}; }
+
+    // The clock of the pictures' own times; nothing where they have none and come at the frame
+    // rate.
+    virtual std::optional<TimeBase> time_base() const { return std::nullopt; }
+
+    // The time of the picture that was read last, where there is a time base.
+    virtual PictureTime time() const { return {}; }
 
     // What the user should know about the pictures, as part of a one-line note; empty for nothing.
     virtual std::string remark() const { return ""; }

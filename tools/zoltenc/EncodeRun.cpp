@@ -12,6 +12,7 @@
 #include "zoltenc/EncoderSession.h"
 #include "zoltenc/HostServices.h"
 #include "zoltenc/Progress.h"
+#include "zoltenc/open_sink.h"
 #include "zoltenc/open_source.h"
 
 namespace zolt {
@@ -34,12 +35,18 @@ std::string hex_text(const unsigned char* data, int size) {
 }  // namespace
 
 EncodeRun::EncodeRun(const Options& options)
-    : options_(options), source_(open_source(options)), output_(options.output) {
+    : options_(options),
+      source_(open_source(options)),
+      sink_(open_sink(options)),
+      consumer_(*sink_) {
     if (!options_.stats.empty()) {
         stats_.emplace(options_.stats);
     }
     check_outputs();
     choose_frame_rate();
+    time_base_ =
+        source_->time_base().value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
+    consumer_.describe_input(frame_rate_, time_base_, source_->traits(), options_.bit_rate_kbs);
     if (options_.raw_format && dynamic_cast<RawReader*>(source_.get()) == nullptr) {
         note(source_->name() + " has a size and a format of its own; --size and --format are for " +
              "raw input");
@@ -83,18 +90,18 @@ void EncodeRun::run() {
     }
     commit();
     if (StopSignal::received() != 0) {
-        note("stopped by a signal; what was coded so far is in " + output_.name());
+        note("stopped by a signal; what was coded so far is in " + sink_->name());
     }
     if (!options_.quiet) {
-        std::fprintf(stderr, "%s: %s\n", output_.name().c_str(),
-                     progress.summary(consumer_.pictures(), consumer_.bytes()).c_str());
+        std::fprintf(stderr, "%s: %s\n", sink_->name().c_str(),
+                     progress.summary(consumer_.pictures(), sink_->bytes()).c_str());
     }
     if (options_.demonstration && !options_.quiet) {
         std::fprintf(stderr, "To look at it: ffplay %s (or any player of H.264 streams)\n",
-                     output_.name().c_str());
+                     sink_->name().c_str());
     }
     if (!cut_.empty()) {
-        throw ToolError(cut_ + "; the pictures before it are in " + output_.name());
+        throw ToolError(cut_ + "; the pictures before it are in " + sink_->name());
     }
 }
 
@@ -104,13 +111,16 @@ void EncodeRun::check_outputs() const {
             throw UsageError(file.name() + ": is the input too; name another file to write");
         }
     };
-    refuse_input(output_);
+    const OutputFile* const output = sink_->file();
+    if (output != nullptr) {
+        refuse_input(*output);
+    }
     if (!stats_) {
         return;
     }
     refuse_input(stats_->file());
-    if (stats_->file().would_replace(output_)) {
-        throw UsageError(output_.name() + ": cannot hold both the stream and --stats");
+    if (output != nullptr && stats_->file().would_replace(*output)) {
+        throw UsageError(sink_->name() + ": cannot hold both the stream and --stats");
     }
 }
 
@@ -157,18 +167,20 @@ void EncodeRun::describe(const EncoderLibrary& library) const {
 
 void EncodeRun::encode_all(EncoderSession& session, Progress& progress) {
     if (stats_) {
-        consumer_.set_picture_listener(
-            [this](const unsigned char* nal, std::size_t size, std::int64_t time) {
-                stats_->add(*consumer_.stream(), nal, size, time);
-            });
+        consumer_.set_picture_listener([this](const CodedPicture& picture) {
+            stats_->add(*consumer_.stream(), picture.nal, picture.size,
+                        microseconds(picture.time.start, time_base_));
+        });
     }
     std::vector<unsigned char> picture(source_->format().sample_bytes());
     for (std::int64_t frame = 0; frame != options_.frames.value_or(-1); ++frame) {
         if (!read_picture(picture)) {
             break;
         }
-        session.encode(picture, frame_rate_.sample_time(frame));
-        progress.update(consumer_.pictures(), consumer_.bytes());
+        const PictureTime time = picture_time(frame);
+        consumer_.set_time(time);
+        session.encode(picture, microseconds(time.start, time_base_));
+        progress.update(consumer_.pictures(), sink_->bytes());
     }
     session.end();
 }
@@ -189,8 +201,13 @@ bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
     }
 }
 
+// The time of the picture read last, which is number `frame` of those coded.
+PictureTime EncodeRun::picture_time(std::int64_t frame) const {
+    return source_->time_base() ? source_->time() : PictureTime{frame, 1};
+}
+
 void EncodeRun::commit() {
-    output_.commit();
+    sink_->commit();
     if (stats_) {
         stats_->commit();
     }

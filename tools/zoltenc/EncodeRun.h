@@ -7,10 +7,10 @@
 #include <vector>
 
 #include "io/FrameSource.h"
-#include "io/OutputFile.h"
-#include "zoltenc/AnnexBConsumer.h"
 #include "zoltenc/Options.h"
+#include "zoltenc/PictureSink.h"
 #include "zoltenc/PictureStats.h"
+#include "zoltenc/SinkConsumer.h"
 
 namespace zolt {
 
@@ -38,15 +38,17 @@ private:
     void describe(const EncoderLibrary& library) const;
     void encode_all(EncoderSession& session, Progress& progress);
     bool read_picture(std::vector<unsigned char>& picture);
+    PictureTime picture_time(std::int64_t frame) const;
     void commit();
     void note(const std::string& text) const;
 
     const Options& options_;
     std::unique_ptr<FrameSource> source_;
     FrameRate frame_rate_;
-    OutputFile output_;
+    TimeBase time_base_;
+    std::unique_ptr<PictureSink> sink_;
     std::optional<PictureStats> stats_;
-    AnnexBConsumer consumer_{output_};
+    SinkConsumer consumer_;
     std::string cut_;  // how the input is cut off within a picture; empty when it is not
 };
 

@@ -10,7 +10,7 @@ namespace zolt {
 
 EncoderSession::EncoderSession(const EncoderLibrary& library, const PictureFormat& format,
                                const FrameRate& frame_rate, const Settings& settings,
-                               AnnexBConsumer& consumer)
+                               SinkConsumer& consumer)
     : consumer_(consumer),
       input_config_(format, frame_rate),
       stream_config_(MediaType::kVideoUncompressed, &input_config_),

@@ -9,8 +9,8 @@
 #include "media/IConfigVideoUncompressed.h"
 #include "media/MediaSample.h"
 #include "media/MediaStreamConfig.h"
-#include "zoltenc/AnnexBConsumer.h"
 #include "zoltenc/EncoderLibrary.h"
+#include "zoltenc/SinkConsumer.h"
 
 class IMediaEncoder;
 
@@ -27,7 +27,7 @@ public:
 
     // `library` and `consumer` are the caller's and outlive the session.
     EncoderSession(const EncoderLibrary& library, const PictureFormat& format,
-                   const FrameRate& frame_rate, const Settings& settings, AnnexBConsumer& consumer);
+                   const FrameRate& frame_rate, const Settings& settings, SinkConsumer& consumer);
     ~EncoderSession();
     EncoderSession(const EncoderSession&) = delete;
     EncoderSession& operator=(const EncoderSession&) = delete;
@@ -55,7 +55,7 @@ private:
 
     [[noreturn]] void fail(const std::string& what) const;
 
-    AnnexBConsumer& consumer_;
+    SinkConsumer& consumer_;
     InputConfig input_config_;
     MediaStreamConfig stream_config_;
     MediaSample sample_;

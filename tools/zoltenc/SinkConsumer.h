@@ -1,36 +1,39 @@
 #pragma once
 
 #include <cstdint>
+#include <exception>
 #include <functional>
-#include <optional>
-#include <string>
-#include <vector>
 
-#include "io/OutputFile.h"
 #include "media/ISampleConsumer.h"
+#include "zoltenc/PictureSink.h"
 
 class IConfigVideoAvc;
 
 namespace zolt {
 
-// Writes an encoder's samples as an Annex B byte stream (ITU-T H.264 clause B.1): each NAL unit
-// behind a four-byte start code, the parameter sets before the first picture that uses them.
+// Takes an encoder's samples and hands them to a sink, with what the encoder does not carry: the
+// input's own times and traits.
 //
 // A failed write must not unwind through the encoder, so it is kept and thrown by `check`.
-class AnnexBConsumer : public ISampleConsumer {
+class SinkConsumer : public ISampleConsumer {
 public:
-    // Is told of every coded picture after it was written; the bytes are a bare NAL unit.
-    using PictureListener =
-        std::function<void(const unsigned char* nal, std::size_t size, std::int64_t time)>;
+    // Is told of every coded picture after it was written.
+    using PictureListener = std::function<void(const CodedPicture&)>;
 
-    explicit AnnexBConsumer(OutputFile& output) : output_(output) {}
+    explicit SinkConsumer(PictureSink& sink) : sink_(sink) {}
+
+    // What the sink is told of the stream beside what the encoder says of it.
+    void describe_input(const FrameRate& frame_rate, const TimeBase& time_base,
+                        const VideoTraits& traits, int bit_rate_kbs);
 
     void set_picture_listener(PictureListener listener) { listener_ = std::move(listener); }
+
+    // The time of the picture that the encoder is about to be given.
+    void set_time(const PictureTime& time) { time_ = time; }
 
     // Of the encoder that feeds this consumer; null until its stream configuration came.
     IConfigVideoAvc* stream() const { return stream_; }
     std::int64_t pictures() const { return pictures_; }
-    std::int64_t bytes() const { return bytes_; }
 
     // Throws what went wrong since the last call.
     void check();
@@ -41,16 +44,13 @@ public:
     void EndOfSamples() override {}
 
 private:
-    void write_nal(const unsigned char* nal, std::size_t size);
-
-    OutputFile& output_;
+    PictureSink& sink_;
     PictureListener listener_;
     IConfigVideoAvc* stream_ = nullptr;
-    std::vector<unsigned char> seq_par_set_;  // as of the last stream configuration
-    std::vector<unsigned char> pic_par_set_;
-    bool parameter_sets_written_ = false;
+    StreamDescription description_;
+    bool described_ = false;  // the sink knows the stream as it is now
+    PictureTime time_;
     std::int64_t pictures_ = 0;
-    std::int64_t bytes_ = 0;
     std::exception_ptr failure_;
 };
 

@@ -1,0 +1,13 @@
+#pragma once
+
+#include <memory>
+
+#include "zoltenc/Options.h"
+#include "zoltenc/PictureSink.h"
+
+namespace zolt {
+
+// Where the options say that the coded pictures go. Throws a ToolError when it cannot be written.
+std::unique_ptr<PictureSink> open_sink(const Options& options);
+
+}  // namespace zolt
