@@ -11,6 +11,8 @@
 
 namespace zolt {
 
+class SideStreams;
+
 // Pictures of one size and format, one after the other.
 class FrameSource {
 public:
@@ -32,6 +34,10 @@ public:
 
     // The time of the picture that was read last, where there is a time base.
     virtual PictureTime time() const { return {}; }
+
+    // The audio and subtitles beside the pictures; null where the source has none. Read with the
+    // pictures; the source's own.
+    virtual SideStreams* side_streams() { return nullptr; }
 
     // What the user should know about the pictures, as part of a one-line note; empty for nothing.
     virtual std::string remark() const { return ""; }
