@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "io/FrameSource.h"
+#include "io/PictureSink.h"
 #include "zoltenc/Options.h"
-#include "zoltenc/PictureSink.h"
 #include "zoltenc/PictureStats.h"
 #include "zoltenc/SinkConsumer.h"
 

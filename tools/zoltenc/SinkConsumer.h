@@ -4,8 +4,8 @@
 #include <exception>
 #include <functional>
 
+#include "io/PictureSink.h"
 #include "media/ISampleConsumer.h"
-#include "zoltenc/PictureSink.h"
 
 class IConfigVideoAvc;
 

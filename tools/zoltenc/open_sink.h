@@ -2,8 +2,8 @@
 
 #include <memory>
 
+#include "io/PictureSink.h"
 #include "zoltenc/Options.h"
-#include "zoltenc/PictureSink.h"
 
 namespace zolt {
 
