@@ -2,12 +2,14 @@
 
 #include <memory>
 
+#include "io/FrameSource.h"
 #include "io/PictureSink.h"
 #include "zoltenc/Options.h"
 
 namespace zolt {
 
-// Where the options say that the coded pictures go. Throws a ToolError when it cannot be written.
-std::unique_ptr<PictureSink> open_sink(const Options& options);
+// Where the options say that the coded pictures go. `source`, whose audio and subtitles a container
+// takes over, outlives the sink. Throws a ToolError when the output cannot be written.
+std::unique_ptr<PictureSink> open_sink(const Options& options, FrameSource& source);
 
 }  // namespace zolt
