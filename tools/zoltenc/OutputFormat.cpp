@@ -9,6 +9,7 @@
 
 #include "io/ToolError.h"
 #include "io/os.h"
+#include "zoltenc/open_container.h"
 
 namespace zolt {
 namespace {
@@ -133,12 +134,15 @@ std::string OutputFormat::list() {
         text.resize(std::max(width, text.size() + 1), ' ');
         return text;
     };
-    std::string text = "Outputs, by the file's ending or by --container NAME:\n";
+    std::string text = "Files, by their ending or by --container NAME:\n";
     for (const OutputFormat& format : kFormats) {
-        text += "  " + padded(format.name, kNameWidth) + padded(format.endings, kEndingsWidth) +
-                format.description + "\n";
+        text +=
+            "  " + padded(format.name, kNameWidth) + padded(format.endings, kEndingsWidth) +
+            format.description +
+            (format.kind == Kind::container && !has_containers() ? " (not in this build)" : "") +
+            "\n";
     }
-    text += "Live addresses, with the container that they get without --container:\n";
+    text += "Live addresses, with their container where --container names none:\n";
     for (const Address& address : kAddresses) {
         text += "  " + padded(address.scheme, kNameWidth) + address.format + "\n";
     }

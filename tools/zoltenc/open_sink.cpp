@@ -2,38 +2,17 @@
 
 #include <utility>
 
-#include "io/ToolError.h"
 #include "zoltenc/AnnexBSink.h"
 #include "zoltenc/DigestSink.h"
 #include "zoltenc/NullSink.h"
 #include "zoltenc/PlayerHeadersSink.h"
 #include "zoltenc/VerifiedSink.h"
-#ifdef ZOLT_LIBAV
-#include "libav/ContainerSink.h"
-#endif
+#include "zoltenc/open_container.h"
 
 namespace zolt {
 namespace {
 
 using Kind = OutputFormat::Kind;
-
-std::unique_ptr<PictureSink> open_container([[maybe_unused]] const Options& options,
-                                            [[maybe_unused]] FrameSource& source) {
-#ifdef ZOLT_LIBAV
-    libav_prepare(options.verbose);
-    ContainerSink::Settings settings;
-    settings.muxer = options.output_format->muxer;
-    settings.is_live = OutputFormat::is_address(options.output);
-    settings.needs_seeking = options.output_format->needs_seeking;
-    settings.ends_early = options.frames.has_value();
-    return std::make_unique<ContainerSink>(options.output, settings, source.traits(),
-                                           options.copy_streams ? source.side_streams() : nullptr);
-#else
-    throw ToolError(options.output + ": this build of zoltenc lacks libavformat and writes no " +
-                    options.output_format->name + "; name it .264, or build with Debian's " +
-                    "libavformat-dev, libavcodec-dev, libavdevice-dev and libswscale-dev");
-#endif
-}
 
 std::unique_ptr<PictureSink> open_output(const Options& options, FrameSource& source) {
     switch (options.output_format->kind) {
@@ -51,10 +30,13 @@ std::unique_ptr<PictureSink> open_output(const Options& options, FrameSource& so
 
 }  // namespace
 
+bool writes_container(const Options& options) {
+    return options.output_format->kind == Kind::container;
+}
+
 std::unique_ptr<PictureSink> open_sink(const Options& options, FrameSource& source) {
     std::unique_ptr<PictureSink> sink = open_output(options, source);
-    const bool is_container = options.output_format->kind == Kind::container;
-    if (is_container && !options.plain_headers && !options.rewrite_headers) {
+    if (writes_container(options) && !options.plain_headers && !options.rewrite_headers) {
         sink = std::make_unique<PlayerHeadersSink>(std::move(sink));
     }
     // The digest is that of the elementary stream which the same options give, whatever holds it.
