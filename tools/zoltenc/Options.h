@@ -11,6 +11,9 @@ namespace zolt {
 
 // What the command line asks for.
 struct Options {
+    // The largest bit rate of level 2.2, Main profile (ITU-T H.264 Table A-1).
+    static constexpr int kMaxBitRateKbs = 4000;
+
     std::string input = "synthetic";  // a file, "-" or "synthetic..."
     std::string output;               // a file or "-"
     bool demonstration = false;       // no input was named: the test picture goes to out.264
@@ -23,6 +26,10 @@ struct Options {
     std::int64_t skip = 0;                    // frames to leave out first
 
     std::string stats;   // CSV file, empty for none
+    std::string report;  // HTML file, empty for none
+    bool psnr = false;   // measure the quality
+    bool json = false;   // tell programs of the run
+    bool match_rate = false;
     std::string plugin;  // shared library, empty for the one beside the program
     bool keep_partial = false;
     bool quiet = false;
