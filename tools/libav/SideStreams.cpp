@@ -10,9 +10,17 @@ void SideStreams::keep(int index) {
     kept_.push_back(index);
 }
 
+void SideStreams::settle() {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    settled_ = true;
+    packets_.erase(std::remove_if(packets_.begin(), packets_.end(),
+                                  [this](const auto& packet) { return !is_kept(*packet); }),
+                   packets_.end());
+}
+
 void SideStreams::push(const AVPacket& packet) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    if (std::find(kept_.begin(), kept_.end(), packet.stream_index) == kept_.end()) {
+    if (settled_ && !is_kept(packet)) {
         return;
     }
     LibavPtr<AVPacket> reference(av_packet_clone(&packet));
@@ -30,6 +38,10 @@ bool SideStreams::pop(AVPacket* packet) {
     av_packet_move_ref(packet, packets_.front().get());
     packets_.pop_front();
     return true;
+}
+
+bool SideStreams::is_kept(const AVPacket& packet) const {
+    return std::find(kept_.begin(), kept_.end(), packet.stream_index) != kept_.end();
 }
 
 }  // namespace zolt

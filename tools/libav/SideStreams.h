@@ -25,9 +25,12 @@ public:
 
     const std::vector<Stream>& streams() const { return streams_; }
 
-    // The sink's choice of a stream, to be made before the first picture is read. Packets of others
-    // are dropped.
+    // The sink's choice of a stream, to be made before the first picture is read.
     void keep(int index);
+
+    // To be called by the source with the first picture: packets of streams that are not kept are
+    // dropped, also those that were pushed before.
+    void settle();
 
     // Takes a reference to the packet's data.
     void push(const AVPacket& packet);
@@ -37,9 +40,12 @@ public:
     bool pop(AVPacket* packet);
 
 private:
+    bool is_kept(const AVPacket& packet) const;
+
     std::vector<Stream> streams_;
     std::mutex mutex_;  // of what follows
     std::vector<int> kept_;
+    bool settled_ = false;
     std::deque<LibavPtr<AVPacket>> packets_;
 };
 

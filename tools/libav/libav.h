@@ -18,6 +18,10 @@ struct LibavDelete {
     void operator()(AVCodecParameters* parameters) const { avcodec_parameters_free(&parameters); }
     void operator()(AVDictionary* dictionary) const { av_dict_free(&dictionary); }
     void operator()(AVFrame* frame) const { av_frame_free(&frame); }
+    void operator()(AVIOContext* io) const {
+        av_freep(&io->buffer);
+        avio_context_free(&io);
+    }
     void operator()(AVPacket* packet) const { av_packet_free(&packet); }
     void operator()(SwsContext* scaler) const { sws_freeContext(scaler); }
 };

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "io/RawReader.h"
 #include "io/StopSignal.h"
 #include "io/SyntheticSource.h"
 #include "io/ToolError.h"
@@ -13,6 +12,8 @@
 #include "zoltenc/EncoderSession.h"
 #include "zoltenc/HostServices.h"
 #include "zoltenc/JsonLines.h"
+#include "zoltenc/Pacer.h"
+#include "zoltenc/coded_traits.h"
 #include "zoltenc/open_probe.h"
 #include "zoltenc/open_sink.h"
 #include "zoltenc/open_source.h"
@@ -41,16 +42,14 @@ EncodeRun::EncodeRun(const Options& options, JsonLines* json, const Pass& pass)
       json_(json),
       pass_(pass),
       source_(open_source(options)),
-      sink_(open_sink(options)),
+      sink_(open_sink(options, *source_)),
       recorder_(options),
       consumer_(*sink_) {
     check_outputs();
     choose_frame_rate();
-    time_base_ =
-        source_->time_base().value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
-    consumer_.describe_input(frame_rate_, time_base_, source_->traits(), options_.bit_rate_kbs);
-    recorder_.begin(source_->format(), source_->traits(), frame_rate_, time_base_);
-    if (options_.raw_format && dynamic_cast<RawReader*>(source_.get()) == nullptr) {
+    describe_input();
+    recorder_.begin(source_->format(), coded_traits(*source_), frame_rate_, time_base_);
+    if (options_.raw_format && source_->states_format()) {
         first_note(source_->name() +
                    " has a size and a format of its own; --size and --format are for raw input");
     }
@@ -60,6 +59,9 @@ EncodeRun::EncodeRun(const Options& options, JsonLines* json, const Pass& pass)
     if (!options_.report.empty() && !has_probe()) {
         first_note(options_.report +
                    ": has plots alone: this zoltenc was built without libavcodec");
+    }
+    if (!sink_->remark().empty()) {
+        first_note(sink_->name() + ": " + sink_->remark());
     }
 }
 
@@ -100,6 +102,9 @@ void EncodeRun::encode() {
     progress.clear();
     const bool stopped = StopSignal::received() != 0;
     sum_up(progress, stopped ? "stopped" : cut_.empty() ? "end" : "cut");
+    if (!source_->closing_remark().empty()) {
+        first_note(source_->name() + ": " + source_->closing_remark());
+    }
     if (consumer_.pictures() == 0 && !stopped) {
         throw ToolError(!cut_.empty()
                             ? cut_
@@ -129,7 +134,9 @@ void EncodeRun::require_repeatable() const {
                          " cannot be read again: name a file as the input");
     }
     const OutputFile* const output = sink_->file();
-    if (output != nullptr && output->is_written_directly()) {
+    const bool is_sent = output == nullptr ? writes_container(options_)  // to an address
+                                           : output->is_written_directly();
+    if (is_sent) {
         throw UsageError("--match-rate: " + sink_->name() +
                          " would hold every run: name a file as the output");
     }
@@ -167,6 +174,19 @@ void EncodeRun::choose_frame_rate() {
     }
 }
 
+// What the consumer hands on of the input.
+void EncodeRun::describe_input() {
+    const std::optional<TimeBase> own_clock = source_->time_base();
+    time_base_ = own_clock.value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
+    StreamDescription input;
+    input.frame_rate = frame_rate_;
+    input.is_constant_rate = !own_clock;
+    input.time_base = time_base_;
+    input.traits = coded_traits(*source_);
+    input.bit_rate_kbs = options_.bit_rate_kbs;
+    consumer_.describe_input(input);
+}
+
 std::optional<std::int64_t> EncodeRun::expected_frames() const {
     const std::optional<std::int64_t> left = source_->frames_left();
     return left && options_.frames ? std::min(*left, *options_.frames)
@@ -197,12 +217,16 @@ void EncodeRun::describe(const EncoderLibrary& library) const {
 void EncodeRun::encode_all(EncoderSession& session, Progress& progress) {
     consumer_.set_picture_listener(
         [this](const CodedPicture& picture) { recorder_.add(*consumer_.stream(), picture); });
+    Pacer pacer;
     std::vector<unsigned char> picture(source_->format().sample_bytes());
     for (std::int64_t frame = 0; frame != options_.frames.value_or(-1); ++frame) {
         if (!read_picture(picture)) {
             break;
         }
         const PictureTime time = picture_time(frame);
+        if (options_.realtime) {
+            pacer.wait_for(microseconds(time.start, time_base_));
+        }
         consumer_.set_time(time);
         recorder_.set_source(picture.data());
         session.encode(picture, microseconds(time.start, time_base_));
@@ -227,9 +251,19 @@ bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
     }
 }
 
-// The time of the picture read last, which is number `frame` of those coded.
-PictureTime EncodeRun::picture_time(std::int64_t frame) const {
-    return source_->time_base() ? source_->time() : PictureTime{frame, 1};
+// The time of the picture read last, which is number `frame` of those coded. Behind skipped
+// pictures the first one's is 0.
+PictureTime EncodeRun::picture_time(std::int64_t frame) {
+    if (!source_->time_base()) {
+        return {frame, 1};
+    }
+    PictureTime time = source_->time();
+    if (frame == 0 && options_.skip > 0) {
+        time_offset_ = time.start;
+        consumer_.set_time_offset(time_offset_);
+    }
+    time.start -= time_offset_;
+    return time;
 }
 
 void EncodeRun::begin_summary(const EncoderLibrary& library) {

@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "io/FrameSource.h"
+#include "io/PictureSink.h"
 #include "zoltenc/Options.h"
-#include "zoltenc/PictureSink.h"
 #include "zoltenc/Progress.h"
 #include "zoltenc/RunRecorder.h"
 #include "zoltenc/RunSummary.h"
@@ -61,12 +61,13 @@ private:
     void check_outputs() const;
     void skip_frames();
     void choose_frame_rate();
+    void describe_input();
     std::optional<std::int64_t> expected_frames() const;
     void describe(const EncoderLibrary& library) const;
     void begin_summary(const EncoderLibrary& library);
     void encode_all(EncoderSession& session, Progress& progress);
     bool read_picture(std::vector<unsigned char>& picture);
-    PictureTime picture_time(std::int64_t frame) const;
+    PictureTime picture_time(std::int64_t frame);
     void sum_up(const Progress& progress, const char* exit);
     void commit();
     void tell_summary() const;
@@ -78,6 +79,7 @@ private:
     std::unique_ptr<FrameSource> source_;
     FrameRate frame_rate_;
     TimeBase time_base_;
+    std::int64_t time_offset_ = 0;  // what the input's own times lose, in ticks
     std::unique_ptr<PictureSink> sink_;
     RunRecorder recorder_;
     SinkConsumer consumer_;

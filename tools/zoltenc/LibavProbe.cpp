@@ -32,15 +32,6 @@ LibavProbe::LibavProbe(const PictureFormat& format, const VideoTraits& traits, b
     if (!converter_ || !source_) {
         throw std::bad_alloc();
     }
-    // What the converter makes of RGB is full range, by the rule of BT.601.
-    const bool is_yuv = format.fourcc_code == PictureFormat::kIyuv ||
-                        format.fourcc_code == PictureFormat::kYuy2 ||
-                        format.fourcc_code == ColorConverter::kAYUV;
-    if (!is_yuv) {
-        colour_ = {};
-        colour_.matrix_coefficients = 6;
-        colour_.video_full_range = true;
-    }
     const int width = converter_->GetOutputWidth();
     const int height = converter_->GetOutputHeight();
     source_->format = AV_PIX_FMT_YUV420P;

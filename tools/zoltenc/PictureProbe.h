@@ -2,8 +2,8 @@
 
 #include <vector>
 
+#include "io/PictureSink.h"
 #include "zoltenc/PictureRecord.h"
-#include "zoltenc/PictureSink.h"
 #include "zoltenc/report/ReportPicture.h"
 
 namespace zolt {

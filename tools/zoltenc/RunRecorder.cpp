@@ -32,7 +32,7 @@ void RunRecorder::begin(const PictureFormat& format, const VideoTraits& traits,
     time_base_ = time_base;
     usual_duration_ = 1 / frame_rate.per_second();
     if (options_.psnr || report_) {
-        probe_ = open_probe(format, traits, report_.has_value());
+        probe_ = open_probe(options_, format, traits);
     }
 }
 

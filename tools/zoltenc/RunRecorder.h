@@ -7,10 +7,10 @@
 #include "avc/ParameterSets.h"
 #include "io/OutputFile.h"
 #include "io/PictureFormat.h"
+#include "io/PictureSink.h"
 #include "io/VideoTraits.h"
 #include "zoltenc/Options.h"
 #include "zoltenc/PictureProbe.h"
-#include "zoltenc/PictureSink.h"
 #include "zoltenc/PictureStats.h"
 #include "zoltenc/RunSummary.h"
 #include "zoltenc/StreamTally.h"
@@ -28,7 +28,7 @@ public:
     // The files that `commit` leaves.
     std::vector<const OutputFile*> files() const;
 
-    // The pictures that follow.
+    // The pictures that follow; the traits are those of the coded ones.
     void begin(const PictureFormat& format, const VideoTraits& traits, const FrameRate& frame_rate,
                const TimeBase& time_base);
 
