@@ -18,6 +18,7 @@ namespace zolt {
 struct PictureFormat {
     static constexpr int kIyuv = fourcc("IYUV");
     static constexpr int kYuy2 = fourcc("YUY2");
+    static constexpr int kAyuv = fourcc("AYUV");
     // The smallest picture that the encoder takes; and the largest frame of any level, in
     // macroblocks of 16x16 (ITU-T H.264 Table A-1), with the longest side that clause A.3.1 gives
     // it.
@@ -33,6 +34,9 @@ struct PictureFormat {
     // or without the blank that ends their codes), letters of either case; nothing for any other
     // text.
     static std::optional<int> parse_fourcc(std::string_view text);
+
+    // The format's code as text, without a blank at its end.
+    std::string fourcc_text() const;
 
     // What is wrong with a picture size, with what would be right; empty when it can be coded.
     static std::string size_error(int width, int height);
