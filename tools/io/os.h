@@ -55,9 +55,16 @@ int os_duplicate_output();
 bool os_may_write(const std::string& name);
 bool os_close(int descriptor);
 
-// How many of the bytes were read or written, -1 on failure; EINTR: a stop signal came first.
+// How many of the bytes were read or written, -1 on failure; EINTR: a stop signal came first, or
+// nothing to read for a moment, so that the caller can look whether it still wants it.
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size);
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size);
+
+// Moves the position, from the start of the file; false on failure.
+bool os_seek(int descriptor, std::int64_t position);
+
+// Waits; a stop signal may end it early.
+void os_sleep(std::int64_t microseconds);
 
 // The value of errno for the C library's last failed write to a stream: EPIPE for a closed pipe.
 int os_stream_error();

@@ -1,5 +1,6 @@
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -7,12 +8,15 @@
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <filesystem>
 
 #include "io/os.h"
 
 namespace zolt {
 namespace {
+
+constexpr int kPollMilliseconds = 100;
 
 std::optional<FileStatus> file_status(int result, const struct stat& status) {
     if (result != 0) {
@@ -97,11 +101,28 @@ bool os_close(int descriptor) {
 }
 
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size) {
+    pollfd input = {descriptor, POLLIN, 0};
+    const int ready = poll(&input, 1, kPollMilliseconds);
+    if (ready <= 0) {
+        errno = ready == 0 ? EINTR : errno;
+        return -1;
+    }
     return read(descriptor, data, size);
 }
 
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size) {
     return write(descriptor, data, size);
+}
+
+bool os_seek(int descriptor, std::int64_t position) {
+    return lseek(descriptor, position, SEEK_SET) == position;
+}
+
+void os_sleep(std::int64_t microseconds) {
+    constexpr std::int64_t kPerSecond = 1000000;
+    const timespec time = {static_cast<time_t>(microseconds / kPerSecond),
+                           static_cast<long>(microseconds % kPerSecond * 1000)};
+    nanosleep(&time, nullptr);
 }
 
 int os_stream_error() {
