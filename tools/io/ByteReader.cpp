@@ -34,7 +34,8 @@ ByteReader::ByteReader(ByteReader&& other) noexcept
       descriptor_(std::exchange(other.descriptor_, -1)),
       buffer_(std::move(other.buffer_)),
       begin_(std::exchange(other.begin_, 0)),
-      end_(std::exchange(other.end_, 0)) {}
+      end_(std::exchange(other.end_, 0)),
+      interrupted_(other.interrupted_.load()) {}
 
 std::string_view ByteReader::peek(std::size_t count) {
     if (buffered() < count) {
@@ -67,6 +68,13 @@ std::size_t ByteReader::read(void* data, std::size_t size) {
     return taken;
 }
 
+std::size_t ByteReader::read_available(void* data, std::size_t size) {
+    if (buffered() == 0) {
+        return read_some(static_cast<unsigned char*>(data), size);
+    }
+    return read(data, std::min(size, buffered()));
+}
+
 ByteReader::Line ByteReader::read_line(std::string& line, std::size_t max_length) {
     line.clear();
     while (true) {
@@ -95,7 +103,7 @@ std::optional<std::int64_t> ByteReader::bytes_left() const {
 }
 
 std::size_t ByteReader::read_some(unsigned char* data, std::size_t size) {
-    while (StopSignal::received() == 0) {
+    while (StopSignal::received() == 0 && !interrupted_) {
         const std::ptrdiff_t got = os_read(descriptor_, data, size);
         if (got >= 0) {
             return static_cast<std::size_t>(got);

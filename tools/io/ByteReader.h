@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -32,12 +33,18 @@ public:
     // Takes `size` bytes; returns how many there were.
     std::size_t read(void* data, std::size_t size);
 
+    // Takes what is there, at most `size` bytes, and waits only for the first; 0 at the end.
+    std::size_t read_available(void* data, std::size_t size);
+
     // Takes a line of at most `max_length` characters and its line end; `line` comes without it.
     // On `too_long` the characters seen so far are in `line` and the reader stands behind them.
     Line read_line(std::string& line, std::size_t max_length);
 
     // Bytes from the current position to the end; nothing where that cannot be known, as on a pipe.
     std::optional<std::int64_t> bytes_left() const;
+
+    // Ends the input where it is, also for a read that waits on another thread.
+    void interrupt() { interrupted_ = true; }
 
     static constexpr std::size_t kBufferSize = 65536;
 
@@ -50,6 +57,7 @@ private:
     std::vector<unsigned char> buffer_;
     std::size_t begin_ = 0;  // the unread part of the buffer
     std::size_t end_ = 0;
+    std::atomic<bool> interrupted_{false};
 };
 
 }  // namespace zolt

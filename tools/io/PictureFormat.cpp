@@ -48,6 +48,10 @@ std::string PictureFormat::size_error(int width, int height) {
     return "";
 }
 
+int PictureFormat::rounded_up(int side) {
+    return (side + kMacroblockSide - 1) / kMacroblockSide * kMacroblockSide;
+}
+
 std::size_t PictureFormat::sample_bytes() const {
     std::size_t bytes = 0;
     for (const Plane& plane : planes()) {

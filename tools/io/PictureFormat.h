@@ -37,15 +37,14 @@ struct PictureFormat {
     // What is wrong with a picture size, with what would be right; empty when it can be coded.
     static std::string size_error(int width, int height);
 
+    // A side rounded up to whole macroblocks.
+    static int rounded_up(int side);
+
     // Bytes of a picture in a media sample and in a file.
     std::size_t sample_bytes() const;
     std::size_t file_bytes() const;
 
-    // Reads one picture as files hold it into `sample` (sample_bytes() long). Returns the bytes
-    // taken from the input: file_bytes(), or fewer where it ends.
-    std::size_t read(ByteReader& input, unsigned char* sample) const;
-
-private:
+    // A plane or a packed picture, as a media sample and a file hold it.
     struct Plane {
         std::size_t rows;
         std::size_t row_bytes;
@@ -53,6 +52,10 @@ private:
         std::size_t file_row_bytes;
     };
     std::vector<Plane> planes() const;
+
+    // Reads one picture as files hold it into `sample` (sample_bytes() long). Returns the bytes
+    // taken from the input: file_bytes(), or fewer where it ends.
+    std::size_t read(ByteReader& input, unsigned char* sample) const;
 };
 
 }  // namespace zolt

@@ -12,9 +12,11 @@ public:
 
     std::string name() const override { return input_.name(); }
     PictureFormat format() const override { return format_; }
+    bool states_format() const override { return false; }
     std::optional<FrameRate> frame_rate() const override { return std::nullopt; }
     std::optional<std::int64_t> frames_left() const override;
     bool read(unsigned char* sample) override;
+    void interrupt() override { input_.interrupt(); }
 
 private:
     ByteReader input_;

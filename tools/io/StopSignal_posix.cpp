@@ -2,10 +2,13 @@
 
 #include <signal.h>
 
+#include <atomic>
+
 namespace zolt {
 namespace {
 
-volatile sig_atomic_t received_signal = 0;
+// Lock-free, so that a handler may set it.
+std::atomic<int> received_signal{0};
 
 void note_signal(int number) {
     received_signal = number;

@@ -36,6 +36,7 @@ public:
     std::optional<FrameRate> frame_rate() const override { return settings_.frame_rate; }
     std::optional<std::int64_t> frames_left() const override { return settings_.frames - next_; }
     bool read(unsigned char* sample) override;
+    void interrupt() override {}
 
 private:
     struct Disc {

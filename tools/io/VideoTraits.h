@@ -24,6 +24,9 @@ struct VideoTraits {
     std::int32_t sar_height = 0;
     // Degrees clockwise by which a player turns the pictures: 0, 90, 180 or 270.
     int rotation = 0;
+    // The top left part that a player shows; 0 for all of the picture.
+    int shown_width = 0;
+    int shown_height = 0;
 };
 
 }  // namespace zolt

@@ -22,6 +22,7 @@ public:
     std::optional<std::int64_t> frames_left() const override;
     std::string remark() const override;
     bool read(unsigned char* sample) override;
+    void interrupt() override { input_.interrupt(); }
 
 private:
     bool read_frame_header();

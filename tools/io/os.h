@@ -55,7 +55,8 @@ int os_duplicate_output();
 bool os_may_write(const std::string& name);
 bool os_close(int descriptor);
 
-// How many of the bytes were read or written, -1 on failure; EINTR: a stop signal came first.
+// How many of the bytes were read or written, -1 on failure; EINTR: a stop signal came first, or
+// nothing to read for a moment, so that the caller can look whether it still wants it.
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size);
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size);
 

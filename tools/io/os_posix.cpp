@@ -1,5 +1,6 @@
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -13,6 +14,8 @@
 
 namespace zolt {
 namespace {
+
+constexpr int kPollMilliseconds = 100;
 
 std::optional<FileStatus> file_status(int result, const struct stat& status) {
     if (result != 0) {
@@ -97,6 +100,11 @@ bool os_close(int descriptor) {
 }
 
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size) {
+    pollfd input = {descriptor, POLLIN, 0};
+    if (poll(&input, 1, kPollMilliseconds) == 0) {
+        errno = EINTR;
+        return -1;
+    }
     return read(descriptor, data, size);
 }
 

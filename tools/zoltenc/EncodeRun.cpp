@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "io/RawReader.h"
 #include "io/StopSignal.h"
 #include "io/ToolError.h"
 #include "io/os.h"
@@ -47,7 +46,7 @@ EncodeRun::EncodeRun(const Options& options)
     time_base_ =
         source_->time_base().value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
     consumer_.describe_input(frame_rate_, time_base_, source_->traits(), options_.bit_rate_kbs);
-    if (options_.raw_format && dynamic_cast<RawReader*>(source_.get()) == nullptr) {
+    if (options_.raw_format && source_->states_format()) {
         note(source_->name() + " has a size and a format of its own; --size and --format are for " +
              "raw input");
     }
@@ -79,6 +78,9 @@ void EncodeRun::run() {
         throw;
     }
     progress.clear();
+    if (!source_->closing_remark().empty()) {
+        note(source_->name() + ": " + source_->closing_remark());
+    }
     if (consumer_.pictures() == 0) {
         if (StopSignal::received() != 0) {
             return;

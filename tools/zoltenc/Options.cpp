@@ -7,6 +7,7 @@
 #include "io/SyntheticSource.h"
 #include "io/ToolError.h"
 #include "io/numbers.h"
+#include "zoltenc/libav_input.h"
 
 namespace zolt {
 namespace {
@@ -66,19 +67,42 @@ PictureFormat parse_raw_format(const std::string& size, const std::string& fourc
     return format;
 }
 
+Fit parse_fit(const std::string& text) {
+    if (text == "crop") {
+        return Fit::crop;
+    }
+    if (text == "pad") {
+        return Fit::pad;
+    }
+    if (text == "scale") {
+        return Fit::scale;
+    }
+    throw UsageError("--fit: '" + text + "' is not one of crop, pad, scale");
+}
+
 // Options whose values are read after the whole line, since they depend on each other.
 struct OptionTexts {
     std::string fps;
     std::string size;
     std::string format;
+    std::string fit;
 };
+
+void add_input_options(CLI::App& app, OptionTexts& texts) {
+    app.add_option("--fit", texts.fit,
+                   "How pictures get sides that are multiples of 16: crop (their middle), pad "
+                   "(repeat the edges; players show the input's size) or scale; otherwise pad in "
+                   "containers and crop elsewhere")
+        ->type_name("HOW");
+    app.add_flag("--list-formats", "List what can be read and written, and leave");
+}
 
 // One entry after the other, in the order of the help text.
 void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.set_version_flag("--version", "zoltenc " ZOLT_VERSION);
     app.add_option("INPUT", options.input,
-                   "Y4M or raw file, '-' for standard input, or the built-in moving test "
-                   "picture synthetic[:WxH[@FPS[:FRAMES]]]")
+                   "Video file, device (KIND:NAME) or URL, Y4M or raw pictures, '-' for standard "
+                   "input, or the built-in moving test picture synthetic[:WxH[@FPS[:FRAMES]]]")
         ->type_name("");
     app.add_option("-o,--output", options.output, "File to write, '-' for standard output")
         ->type_name("FILE");
@@ -106,6 +130,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.add_option("--skip", options.skip, "Leave out this many frames first")
         ->check(whole_number(0, kMaxCount))
         ->type_name("N");
+    add_input_options(app, texts);
     app.add_option("--stats", options.stats, "Write a CSV file with one row per picture")
         ->type_name("FILE");
     app.add_option("--plugin", options.plugin,
@@ -136,6 +161,10 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
         throw UsageError(std::string(error.what()) + " (zoltenc --help lists the options)");
     }
 
+    if (app.count("--list-formats") > 0) {
+        std::cout << "Input\n\n" << list_inputs();
+        return std::nullopt;
+    }
     if (app.count("--output") == 0) {
         if (app.count("INPUT") > 0) {
             throw UsageError("-o is missing: name the file to write, or '-' for standard output");
@@ -151,6 +180,9 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
     }
     if (!texts.fps.empty()) {
         options.frame_rate = parse_frame_rate(texts.fps);
+    }
+    if (app.count("--fit") > 0) {
+        options.fit = parse_fit(texts.fit);
     }
     if (!texts.size.empty()) {
         options.raw_format = parse_raw_format(texts.size, texts.format);

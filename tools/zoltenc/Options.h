@@ -9,6 +9,10 @@
 
 namespace zolt {
 
+// How pictures are brought to sides that are multiples of 16: their middle is coded, they are
+// extended, or they are scaled.
+enum class Fit { crop, pad, scale };
+
 // What the command line asks for.
 struct Options {
     std::string input = "synthetic";  // a file, "-" or "synthetic..."
@@ -21,6 +25,7 @@ struct Options {
     std::optional<PictureFormat> raw_format;  // of raw input, when its size was given
     std::optional<std::int64_t> frames;       // most frames to code
     std::int64_t skip = 0;                    // frames to leave out first
+    std::optional<Fit> fit;                   // nothing: as the output needs it
 
     std::string stats;   // CSV file, empty for none
     std::string plugin;  // shared library, empty for the one beside the program
