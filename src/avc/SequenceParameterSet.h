@@ -7,6 +7,9 @@
 
 namespace zolt {
 
+class BitStreamWriter;
+struct VuiParameters;
+
 // Every field of a sequence parameter set, named as in clause 7.3.2.1.1, up to its VUI parameters;
 // a field that does not occur has its inferred value, one that damaged data lack is 0.
 struct SequenceParameterSet {
@@ -58,6 +61,10 @@ struct SequenceParameterSet {
 
     // Reads the bytes of the NAL unit, header byte first, without emulation prevention.
     static SequenceParameterSet read(const std::vector<unsigned char>& rbsp);
+
+    // Writes seq_parameter_set_data() of a complete set, with these VUI parameters whatever
+    // vui_parameters_present_flag is.
+    void write(BitStreamWriter& bits, const VuiParameters& vui) const;
 
     // Whether sets of this profile tell their chroma format.
     bool has_chroma_format() const;

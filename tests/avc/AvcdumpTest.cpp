@@ -11,7 +11,7 @@
 
 namespace {
 
-using zolt::BitWriter;
+using zolt::BitStreamWriter;
 using zolt::FrameRate;
 using zolt::idr_slice;
 using zolt::pic_par_set;
@@ -21,14 +21,14 @@ using zolt::UnitLister;
 using zolt::UnitRow;
 using Bytes = std::vector<unsigned char>;
 
-Bytes unit_of(const BitWriter& bits) {
+Bytes unit_of(const BitStreamWriter& bits) {
     Bytes unit = {0, 0, 1};
     const Bytes nal = bits.escaped();
     unit.insert(unit.end(), nal.begin(), nal.end());
     return unit;
 }
 
-UnitRow add(UnitLister& lister, const BitWriter& bits) {
+UnitRow add(UnitLister& lister, const BitStreamWriter& bits) {
     const Bytes unit = unit_of(bits);
     return lister.add(unit.data(), static_cast<int>(unit.size()));
 }
@@ -38,7 +38,7 @@ UnitRow add(UnitLister& lister, const BitWriter& bits) {
 TEST(Avcdump, KnowsTheProfilesWithChromaFormatFields) {
     const std::set<int> with_fields = {100, 110, 122, 244, 44, 83, 86, 118, 128};
     for (int profile_idc = 0; profile_idc < 256; ++profile_idc) {
-        BitWriter bits;
+        BitStreamWriter bits;
         bits.u(8, 0x67).u(8, static_cast<unsigned>(profile_idc)).u(16, 31).ue(0);
         if (with_fields.count(profile_idc) != 0) {
             bits.ue(1).ue(0).ue(0).u(2, 0);
@@ -67,12 +67,12 @@ TEST(Avcdump, CountsPicturesAndTheirTimes) {
 
     // Frames: field_pic_flag is 0 before idr_pic_id.
     const auto idr = [](unsigned first_mb, unsigned idr_pic_id) {
-        BitWriter bits;
+        BitStreamWriter bits;
         bits.u(8, 0x65).ue(first_mb).ue(7).ue(0).u(16, 0).u(1, 0).ue(idr_pic_id).u(16, 0).se(0);
         return bits.u(2, 0).se(4).u(20, 0xabcde).trailing();
     };
     const auto field = [](bool is_bottom) {
-        BitWriter bits;
+        BitStreamWriter bits;
         bits.u(8, 0x61).ue(0).ue(7).ue(0).u(16, 1).u(1, 1).u(1, is_bottom).u(16, 2);
         return bits.u(1, 0).se(0).u(20, 0xabcde).trailing();
     };

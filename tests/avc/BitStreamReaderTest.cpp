@@ -8,11 +8,11 @@
 #include <random>
 #include <vector>
 
-#include "BitWriter.h"
+#include "avc/BitStreamWriter.h"
 
 namespace {
 
-using zolt::BitWriter;
+using zolt::BitStreamWriter;
 using Bytes = std::vector<unsigned char>;
 
 BitStreamReader reader_of(const Bytes& bytes) {
@@ -31,7 +31,7 @@ TEST(BitStreamReader, ReadsExpGolombCodes) {
         EXPECT_EQ(reader.ReadExpGolomb(), c.value);
         EXPECT_EQ(reader.GetBitPos(), c.bits);
     }
-    const Bytes codes = BitWriter().ue(1).ue(2).ue(3).ue(4).ue(0).bytes();
+    const Bytes codes = BitStreamWriter().ue(1).ue(2).ue(3).ue(4).ue(0).bytes();
     BitStreamReader reader = reader_of(codes);
     for (const std::int64_t expected : {1, -1, 2, -2, 0}) {
         EXPECT_EQ(reader.ReadSignedExpGolomb(), expected);
@@ -40,14 +40,15 @@ TEST(BitStreamReader, ReadsExpGolombCodes) {
 
 TEST(BitStreamReader, ReadsTheLargestCodesAndRefusesLongerOnes) {
     const std::uint64_t with_32_zeros = (std::uint64_t{1} << 33) - 2;
-    const Bytes longest = BitWriter().u(3, 5).ue(with_32_zeros).se(-2147483647).u(1, 1).bytes();
+    const Bytes longest =
+        BitStreamWriter().u(3, 5).ue(with_32_zeros).se(-2147483647).u(1, 1).bytes();
     BitStreamReader reader = reader_of(longest);
     reader.SkipBits(3);
     EXPECT_EQ(reader.ReadExpGolomb(), with_32_zeros);
     EXPECT_EQ(reader.ReadSignedExpGolomb(), -2147483647);
     EXPECT_TRUE(reader.ReadBoolean());
 
-    const Bytes too_long = BitWriter().u(33, 0).u(34, 1).u(64, ~0ULL).bytes();
+    const Bytes too_long = BitStreamWriter().u(33, 0).u(34, 1).u(64, ~0ULL).bytes();
     reader = reader_of(too_long);
     EXPECT_EQ(reader.ReadExpGolomb(), 0U);
     EXPECT_EQ(reader.GetNumBytesRead(), static_cast<int>(too_long.size()));

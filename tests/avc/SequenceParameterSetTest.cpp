@@ -6,18 +6,18 @@
 #include <cstdint>
 #include <vector>
 
-#include "BitWriter.h"
+#include "avc/BitStreamWriter.h"
 
 namespace {
 
-using zolt::BitWriter;
+using zolt::BitStreamWriter;
 using zolt::SequenceParameterSet;
 using Bytes = std::vector<unsigned char>;
 
 // Every field that can occur in one set, each with a value of its own, and where the data must
 // reach for the set to be valid and to be complete.
 TEST(SequenceParameterSet, HoldsEveryField) {
-    BitWriter bits;
+    BitStreamWriter bits;
     bits.u(8, 0x67).u(8, 244).u(8, 0x5c).u(8, 41).ue(17);
     bits.ue(3).u(1, 1).ue(5).ue(6).u(1, 1).u(1, 1);
     std::vector<std::vector<std::int64_t>> lists(12);
@@ -86,7 +86,7 @@ TEST(SequenceParameterSet, HoldsEveryField) {
 // set cannot be written again from its record.
 TEST(SequenceParameterSet, HoldsNoMoreOffsetsThanAValidSetHas) {
     for (const unsigned count : {255U, 256U, 3000U}) {
-        BitWriter bits;
+        BitStreamWriter bits;
         bits.u(8, 0x67).u(8, 77).u(8, 0).u(8, 31).ue(0).ue(0).ue(1).u(1, 0).se(0).se(0).ue(count);
         for (unsigned i = 0; i < count; ++i) {
             bits.se(-static_cast<int>(i));

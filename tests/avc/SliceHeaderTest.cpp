@@ -11,7 +11,7 @@
 
 namespace {
 
-using zolt::BitWriter;
+using zolt::BitStreamWriter;
 using zolt::idr_slice;
 using zolt::ParameterSets;
 using zolt::pic_par_set;
@@ -20,7 +20,7 @@ using zolt::seq_par_set;
 using zolt::SliceHeader;
 using Bytes = std::vector<unsigned char>;
 
-void add_set(ParameterSets& sets, const BitWriter& bits) {
+void add_set(ParameterSets& sets, const BitStreamWriter& bits) {
     const Bytes nal = bits.escaped();
     if (VideoAvcParser::GetNaluType(nal.data()) == 7) {
         sets.add_seq_par_set(nal.data(), static_cast<int>(nal.size()));
@@ -29,7 +29,7 @@ void add_set(ParameterSets& sets, const BitWriter& bits) {
     }
 }
 
-std::optional<SliceHeader> header_of(const ParameterSets& sets, const BitWriter& bits) {
+std::optional<SliceHeader> header_of(const ParameterSets& sets, const BitStreamWriter& bits) {
     const Bytes nal = bits.escaped();
     return SliceHeader::read(nal.data(), static_cast<int>(nal.size()), sets);
 }
@@ -63,7 +63,7 @@ TEST(SliceHeader, ReadsWholeSliceHeaders) {
             add_set(sets, seq_par_set(0, false, false));
             add_set(sets, pic_par_set(fields));
 
-            BitWriter bits;
+            BitStreamWriter bits;
             bits.u(8, 0x61).ue(0).ue(is_b ? 6 : 0).ue(0).u(16, 0).u(1, 0).u(16, 2).se(0).ue(0);
             bits.u(is_b ? 1 : 0, 1);
             bits.u(1, 1).ue(1);  // two entries in list 0, one in list 1
@@ -108,7 +108,7 @@ TEST(SliceHeader, FollowsParameterSetsByTheirIdentifiers) {
     add_set(sets, pic_par_set(fields));
 
     EXPECT_TRUE(header_of(sets, idr_slice(0, 0))->is_complete);
-    BitWriter bits;  // with colour_plane_id
+    BitStreamWriter bits;  // with colour_plane_id
     bits.u(8, 0x65).ue(0).ue(7).ue(255).u(2, 1).u(16, 9).ue(0).u(16, 0).se(0).u(2, 0).se(4);
     const std::optional<SliceHeader> header = header_of(sets, bits.u(8, 0xff).trailing());
     EXPECT_TRUE(header->is_complete);
@@ -128,10 +128,10 @@ TEST(SliceHeader, MarksDamagedHeaders) {
         EXPECT_FALSE(header && header->is_complete) << size;
         EXPECT_EQ(header.has_value(), size > 2) << size;
     }
-    BitWriter bad_type;
+    BitStreamWriter bad_type;
     bad_type.u(8, 0x65).ue(0).ue(10).ue(0).u(32, 1);
     EXPECT_FALSE(header_of(sets, bad_type));
-    BitWriter endless_modification;
+    BitStreamWriter endless_modification;
     endless_modification.u(8, 0x41).ue(0).ue(0).ue(0).u(16, 1).u(16, 1).se(0).u(1, 0).u(1, 1);
     for (int i = 0; i < 200; ++i) {
         endless_modification.ue(0).ue(0);
@@ -139,12 +139,12 @@ TEST(SliceHeader, MarksDamagedHeaders) {
     EXPECT_FALSE(header_of(sets, endless_modification.trailing())->is_complete);
 
     // A set that announces four billion slice groups costs no more than its bytes.
-    BitWriter many_groups;
+    BitStreamWriter many_groups;
     many_groups.u(8, 0x68).ue(1).ue(0).u(2, 0).ue(2).ue(6).ue(0xfffffffe).u(43, 0x155555);
     add_set(sets, many_groups);
 
     // A damaged set does not replace a good one.
-    BitWriter bad_set;
+    BitStreamWriter bad_set;
     bad_set.u(8, 0x67).u(8, 77).u(8, 0).u(8, 31).ue(0).ue(13).ue(0).ue(0).u(32, ~0U);
     add_set(sets, bad_set);
     EXPECT_TRUE(header_of(sets, idr_slice(0, 0))->is_complete);

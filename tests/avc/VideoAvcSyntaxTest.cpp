@@ -6,30 +6,31 @@
 #include <string>
 #include <vector>
 
-#include "BitWriter.h"
+#include "avc/BitStreamWriter.h"
 #include "avc/VideoAvcParser.h"
 
 namespace {
 
-using zolt::BitWriter;
+using zolt::BitStreamWriter;
 using Bytes = std::vector<unsigned char>;
 
 int size_of(const Bytes& bytes) {
     return static_cast<int>(bytes.size());
 }
 
-BitWriter seq_par_set_head(int profile_idc) {
-    return BitWriter().u(8, 0x67).u(8, static_cast<unsigned>(profile_idc)).u(8, 0).u(8, 31);
+BitStreamWriter seq_par_set_head(int profile_idc) {
+    return BitStreamWriter().u(8, 0x67).u(8, static_cast<unsigned>(profile_idc)).u(8, 0).u(8, 31);
 }
 
 // What follows pic_order_cnt_type and its fields.
-BitWriter& picture_size(BitWriter& bits, std::uint64_t width_in_mbs, std::uint64_t height_in_mbs) {
+BitStreamWriter& picture_size(BitStreamWriter& bits, std::uint64_t width_in_mbs,
+                              std::uint64_t height_in_mbs) {
     return bits.ue(3).u(1, 1).ue(width_in_mbs - 1).ue(height_in_mbs - 1).u(1, 1).u(3, 0).trailing();
 }
 
 TEST(VideoAvcSyntax, ReadsASeqParSetOfEachPicOrderCntType) {
     for (const int type : {0, 1, 2}) {
-        BitWriter bits = seq_par_set_head(77);
+        BitStreamWriter bits = seq_par_set_head(77);
         bits.ue(5).ue(12).ue(static_cast<unsigned>(type));
         if (type == 0) {
             bits.ue(9);
@@ -57,7 +58,7 @@ TEST(VideoAvcSyntax, ReadsASeqParSetOfEachPicOrderCntType) {
 TEST(VideoAvcSyntax, ReadsASeqParSetWithChromaFormat) {
     for (const int profile_idc : {100, 110, 122, 244, 44, 83, 86, 118, 128}) {
         for (const int chroma_format_idc : {1, 3}) {
-            BitWriter bits = seq_par_set_head(profile_idc);
+            BitStreamWriter bits = seq_par_set_head(profile_idc);
             bits.ue(0).ue(static_cast<unsigned>(chroma_format_idc));
             if (chroma_format_idc == 3) {
                 bits.u(1, 0);
@@ -89,7 +90,7 @@ TEST(VideoAvcSyntax, ReadsASeqParSetWithChromaFormat) {
 }
 
 TEST(VideoAvcSyntax, ReadsASeqParSetWithEmulationPrevention) {
-    BitWriter bits = seq_par_set_head(66);
+    BitStreamWriter bits = seq_par_set_head(66);
     // The operands of type 1 give runs of zero bytes.
     bits.ue(0).ue(0).ue(1).u(1, 0).se(1 << 24).se(1 << 24).ue(0);
     picture_size(bits, 11, 9);
@@ -108,7 +109,7 @@ TEST(VideoAvcSyntax, GivesNoSizeThatNoPictureHas) {
     };
     for (const Case& c : {Case{1, 16}, Case{65535, 1048560}, Case{65536, 0},
                           Case{std::uint64_t{1} << 32, 0}, Case{(std::uint64_t{1} << 33) - 1, 0}}) {
-        BitWriter bits = seq_par_set_head(77);
+        BitStreamWriter bits = seq_par_set_head(77);
         bits.ue(0).ue(0).ue(2);
         const Bytes nal = picture_size(bits, c.mbs, c.mbs).bytes();
         int width = -1;
@@ -120,7 +121,7 @@ TEST(VideoAvcSyntax, GivesNoSizeThatNoPictureHas) {
 }
 
 TEST(VideoAvcSyntax, EndsTheOffsetLoopWithTheData) {
-    BitWriter bits = seq_par_set_head(77);
+    BitStreamWriter bits = seq_par_set_head(77);
     bits.ue(0).ue(0).ue(1).u(1, 0).se(0).se(0).ue(0xfffffffe).se(1).se(1);
     VideoAvcSeqParSet set;
     VideoAvcParser::ParseSeqParSet(bits.bytes().data(), size_of(bits.bytes()), &set);
@@ -129,7 +130,7 @@ TEST(VideoAvcSyntax, EndsTheOffsetLoopWithTheData) {
 }
 
 TEST(VideoAvcSyntax, ReadsAPicParSet) {
-    const Bytes bytes = BitWriter().ue(200).ue(17).u(1, 1).u(1, 1).ue(6).trailing().bytes();
+    const Bytes bytes = BitStreamWriter().ue(200).ue(17).u(1, 1).u(1, 1).ue(6).trailing().bytes();
     VideoAvcPicParSet set;
     VideoAvcParser::ParsePicParSet(bytes.data(), size_of(bytes), &set);
     EXPECT_EQ(set.pic_parameter_set_id, 200U);
@@ -161,7 +162,7 @@ VideoAvcSeqParSet cif_set() {
 }
 
 TEST(VideoAvcSyntax, DescribesAnIdrSlice) {
-    const Bytes nal = BitWriter()
+    const Bytes nal = BitStreamWriter()
                           .u(8, 0x65)
                           .ue(7)
                           .ue(2)
@@ -224,7 +225,8 @@ TEST(VideoAvcSyntax, DescribesInterSlices) {
         pps.entropy_coding_mode_flag = c.is_cabac ? 1 : 0;
         const bool is_b = c.slice_type % 5 == 1;
 
-        BitWriter bits = BitWriter().u(8, 0x41).ue(0).ue(static_cast<unsigned>(c.slice_type)).ue(0);
+        BitStreamWriter bits =
+            BitStreamWriter().u(8, 0x41).ue(0).ue(static_cast<unsigned>(c.slice_type)).ue(0);
         bits.u(16, 77);
         if (c.order_type == 0) {
             bits.u(8, 97).se(1);
@@ -272,7 +274,7 @@ TEST(VideoAvcSyntax, ReadsFieldSlices) {
     sps.frame_mbs_only_flag = 0;
     VideoAvcPicParSet pps;
     pps.pic_order_present_flag = 1;
-    const Bytes field = BitWriter()
+    const Bytes field = BitStreamWriter()
                             .u(8, 0x41)
                             .ue(0)
                             .ue(0)
@@ -292,7 +294,7 @@ TEST(VideoAvcSyntax, ReadsFieldSlices) {
     EXPECT_NE(lines.find("mb_skip_run       =     0 (total =   396)\n"), std::string::npos);
     EXPECT_NE(lines.find("mb_type    = 9\n"), std::string::npos);
 
-    const Bytes frame = BitWriter()
+    const Bytes frame = BitStreamWriter()
                             .u(8, 0x41)
                             .ue(0)
                             .ue(0)

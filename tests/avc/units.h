@@ -1,12 +1,12 @@
 #pragma once
 
-#include "BitWriter.h"
+#include "avc/BitStreamWriter.h"
 
 namespace zolt {
 
 // A sequence parameter set with 16-bit frame_num and pic_order_cnt_lsb.
-inline BitWriter seq_par_set(unsigned id, bool frame_mbs_only, bool is_444 = false) {
-    BitWriter bits;
+inline BitStreamWriter seq_par_set(unsigned id, bool frame_mbs_only, bool is_444 = false) {
+    BitStreamWriter bits;
     bits.u(8, 0x67).u(8, is_444 ? 244 : 77).u(8, 0).u(8, 31).ue(id);
     if (is_444) {
         bits.ue(3).u(1, 1).ue(0).ue(0).u(1, 0).u(1, 1).u(1, 1).se(5).se(-13).u(11, 0);
@@ -25,8 +25,8 @@ struct PicParSetFields {
     bool redundant_pic_cnt_present = false;
 };
 
-inline BitWriter pic_par_set(const PicParSetFields& fields) {
-    BitWriter bits;
+inline BitStreamWriter pic_par_set(const PicParSetFields& fields) {
+    BitStreamWriter bits;
     bits.u(8, 0x68).ue(fields.id).ue(fields.seq_par_set_id).u(1, fields.is_cabac).u(1, 1);
     bits.ue(fields.slice_group_type < 0 ? 0 : 2);
     if (fields.slice_group_type >= 0) {
@@ -57,8 +57,8 @@ inline BitWriter pic_par_set(const PicParSetFields& fields) {
 }
 
 // An IDR slice of the parameter sets above, up to and with the data behind slice_qp_delta.
-inline BitWriter idr_slice(unsigned set_id, unsigned idr_pic_id, unsigned first_mb = 0) {
-    BitWriter bits;
+inline BitStreamWriter idr_slice(unsigned set_id, unsigned idr_pic_id, unsigned first_mb = 0) {
+    BitStreamWriter bits;
     bits.u(8, 0x65).ue(first_mb).ue(7).ue(set_id).u(16, 0).ue(idr_pic_id).u(16, 0).se(0);
     return bits.u(2, 0).se(4).u(20, 0xabcde).trailing();
 }

@@ -82,6 +82,12 @@ void OutputFile::write(const void* data, std::size_t size) {
     }
 }
 
+void OutputFile::seek(std::int64_t position) {
+    if (!os_seek(descriptor_, position)) {
+        fail(std::strerror(errno));
+    }
+}
+
 void OutputFile::commit() {
     const int descriptor = descriptor_;
     descriptor_ = -1;

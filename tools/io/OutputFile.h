@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 
@@ -27,7 +28,15 @@ public:
     bool would_replace(const std::string& input) const;
     bool would_replace(const OutputFile& other) const;
 
+    // Where the bytes are until `commit`; empty where they go straight to their place, and there is
+    // no way back to them.
+    const std::string& temporary_name() const { return temporary_; }
+
     void write(const void* data, std::size_t size);
+
+    // Moves the place of the next write, from the start of the file; only where there is a
+    // temporary name.
+    void seek(std::int64_t position);
 
     // Ends the file and gives it its name.
     void commit();

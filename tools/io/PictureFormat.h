@@ -18,6 +18,7 @@ namespace zolt {
 struct PictureFormat {
     static constexpr int kIyuv = fourcc("IYUV");
     static constexpr int kYuy2 = fourcc("YUY2");
+    static constexpr int kAyuv = fourcc("AYUV");
     // The smallest picture that the encoder takes; and the largest frame of any level, in
     // macroblocks of 16x16 (ITU-T H.264 Table A-1), with the longest side that clause A.3.1 gives
     // it.

@@ -60,6 +60,12 @@ bool os_close(int descriptor);
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size);
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size);
 
+// Moves the position, from the start of the file; false on failure.
+bool os_seek(int descriptor, std::int64_t position);
+
+// Waits; a stop signal may end it early.
+void os_sleep(std::int64_t microseconds);
+
 // The value of errno for the C library's last failed write to a stream: EPIPE for a closed pipe.
 int os_stream_error();
 

@@ -8,6 +8,7 @@
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <filesystem>
 
 #include "io/os.h"
@@ -110,6 +111,17 @@ std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size) {
 
 std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size) {
     return write(descriptor, data, size);
+}
+
+bool os_seek(int descriptor, std::int64_t position) {
+    return lseek(descriptor, position, SEEK_SET) == position;
+}
+
+void os_sleep(std::int64_t microseconds) {
+    constexpr std::int64_t kPerSecond = 1000000;
+    const timespec time = {static_cast<time_t>(microseconds / kPerSecond),
+                           static_cast<long>(microseconds % kPerSecond * 1000)};
+    nanosleep(&time, nullptr);
 }
 
 int os_stream_error() {

@@ -282,6 +282,20 @@ std::ptrdiff_t os_write(int descriptor, const void* data, std::size_t size) {
     return static_cast<std::ptrdiff_t>(count);
 }
 
+bool os_seek(int descriptor, std::int64_t position) {
+    LARGE_INTEGER target;
+    target.QuadPart = position;
+    if (!SetFilePointerEx(handle_of(descriptor), target, nullptr, FILE_BEGIN)) {
+        set_errno();
+        return false;
+    }
+    return true;
+}
+
+void os_sleep(std::int64_t microseconds) {
+    Sleep(static_cast<DWORD>((microseconds + 999) / 1000));
+}
+
 int os_stream_error() {
     // The C library makes an invalid argument of a pipe that is being closed.
     return _doserrno == ERROR_NO_DATA || _doserrno == ERROR_PIPE_NOT_CONNECTED ? EPIPE : errno;

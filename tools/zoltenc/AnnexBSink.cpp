@@ -1,11 +1,8 @@
 #include "zoltenc/AnnexBSink.h"
 
+#include "io/annex_b.h"
+
 namespace zolt {
-namespace {
-
-constexpr unsigned char kStartCode[] = {0, 0, 0, 1};
-
-}  // namespace
 
 void AnnexBSink::begin(const StreamDescription& stream) {
     write_nal(stream.seq_par_set.data(), stream.seq_par_set.size());

@@ -1,7 +1,7 @@
 #pragma once
 
 #include "io/OutputFile.h"
-#include "zoltenc/PictureSink.h"
+#include "io/PictureSink.h"
 
 namespace zolt {
 

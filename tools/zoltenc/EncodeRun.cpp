@@ -10,7 +10,9 @@
 #include "zoltenc/EncoderLibrary.h"
 #include "zoltenc/EncoderSession.h"
 #include "zoltenc/HostServices.h"
+#include "zoltenc/Pacer.h"
 #include "zoltenc/Progress.h"
+#include "zoltenc/coded_traits.h"
 #include "zoltenc/open_sink.h"
 #include "zoltenc/open_source.h"
 
@@ -36,22 +38,23 @@ std::string hex_text(const unsigned char* data, int size) {
 EncodeRun::EncodeRun(const Options& options)
     : options_(options),
       source_(open_source(options)),
-      sink_(open_sink(options)),
+      sink_(open_sink(options, *source_)),
       consumer_(*sink_) {
     if (!options_.stats.empty()) {
         stats_.emplace(options_.stats);
     }
     check_outputs();
     choose_frame_rate();
-    time_base_ =
-        source_->time_base().value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
-    consumer_.describe_input(frame_rate_, time_base_, source_->traits(), options_.bit_rate_kbs);
+    describe_input();
     if (options_.raw_format && source_->states_format()) {
         note(source_->name() + " has a size and a format of its own; --size and --format are for " +
              "raw input");
     }
     if (!source_->remark().empty()) {
         note(source_->name() + ": " + source_->remark());
+    }
+    if (!sink_->remark().empty()) {
+        note(sink_->name() + ": " + sink_->remark());
     }
 }
 
@@ -140,6 +143,19 @@ void EncodeRun::choose_frame_rate() {
     }
 }
 
+// What the consumer hands on of the input.
+void EncodeRun::describe_input() {
+    const std::optional<TimeBase> own_clock = source_->time_base();
+    time_base_ = own_clock.value_or(TimeBase{frame_rate_.denominator, frame_rate_.numerator});
+    StreamDescription input;
+    input.frame_rate = frame_rate_;
+    input.is_constant_rate = !own_clock;
+    input.time_base = time_base_;
+    input.traits = coded_traits(*source_);
+    input.bit_rate_kbs = options_.bit_rate_kbs;
+    consumer_.describe_input(input);
+}
+
 std::optional<std::int64_t> EncodeRun::expected_frames() const {
     const std::optional<std::int64_t> left = source_->frames_left();
     return left && options_.frames ? std::min(*left, *options_.frames)
@@ -174,12 +190,16 @@ void EncodeRun::encode_all(EncoderSession& session, Progress& progress) {
                         microseconds(picture.time.start, time_base_));
         });
     }
+    Pacer pacer;
     std::vector<unsigned char> picture(source_->format().sample_bytes());
     for (std::int64_t frame = 0; frame != options_.frames.value_or(-1); ++frame) {
         if (!read_picture(picture)) {
             break;
         }
         const PictureTime time = picture_time(frame);
+        if (options_.realtime) {
+            pacer.wait_for(microseconds(time.start, time_base_));
+        }
         consumer_.set_time(time);
         session.encode(picture, microseconds(time.start, time_base_));
         progress.update(consumer_.pictures(), sink_->bytes());
@@ -203,9 +223,19 @@ bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
     }
 }
 
-// The time of the picture read last, which is number `frame` of those coded.
-PictureTime EncodeRun::picture_time(std::int64_t frame) const {
-    return source_->time_base() ? source_->time() : PictureTime{frame, 1};
+// The time of the picture read last, which is number `frame` of those coded. Behind skipped
+// pictures the first one's is 0.
+PictureTime EncodeRun::picture_time(std::int64_t frame) {
+    if (!source_->time_base()) {
+        return {frame, 1};
+    }
+    PictureTime time = source_->time();
+    if (frame == 0 && options_.skip > 0) {
+        time_offset_ = time.start;
+        consumer_.set_time_offset(time_offset_);
+    }
+    time.start -= time_offset_;
+    return time;
 }
 
 void EncodeRun::commit() {

@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "io/FrameSource.h"
+#include "io/PictureSink.h"
 #include "zoltenc/Options.h"
-#include "zoltenc/PictureSink.h"
 #include "zoltenc/PictureStats.h"
 #include "zoltenc/SinkConsumer.h"
 
@@ -34,11 +34,12 @@ private:
     void check_outputs() const;
     void skip_frames();
     void choose_frame_rate();
+    void describe_input();
     std::optional<std::int64_t> expected_frames() const;
     void describe(const EncoderLibrary& library) const;
     void encode_all(EncoderSession& session, Progress& progress);
     bool read_picture(std::vector<unsigned char>& picture);
-    PictureTime picture_time(std::int64_t frame) const;
+    PictureTime picture_time(std::int64_t frame);
     void commit();
     void note(const std::string& text) const;
 
@@ -46,6 +47,7 @@ private:
     std::unique_ptr<FrameSource> source_;
     FrameRate frame_rate_;
     TimeBase time_base_;
+    std::int64_t time_offset_ = 0;  // what the input's own times lose, in ticks
     std::unique_ptr<PictureSink> sink_;
     std::optional<PictureStats> stats_;
     SinkConsumer consumer_;

@@ -1,6 +1,8 @@
 #include "zoltenc/Options.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cctype>
 #include <iostream>
 #include <limits>
 
@@ -82,11 +84,69 @@ Fit parse_fit(const std::string& text) {
 
 // Options whose values are read after the whole line, since they depend on each other.
 struct OptionTexts {
+    std::string container;
     std::string fps;
     std::string size;
     std::string format;
     std::string fit;
 };
+
+void add_output_options(CLI::App& app, Options& options, OptionTexts& texts) {
+    app.add_option("-o,--output", options.output,
+                   "File to write, whose ending tells the format; '-' for an elementary stream on "
+                   "standard output; or an address (--list-formats)")
+        ->type_name("FILE");
+    app.add_option("--container", texts.container,
+                   "Format whatever the name: " + OutputFormat::names())
+        ->type_name("NAME");
+    CLI::Option* const plain = app.add_flag("--plain-headers", options.plain_headers,
+                                            "Keep the encoder's parameter sets in a container");
+    app.add_flag("--rewrite-headers", options.rewrite_headers,
+                 "Write parameter sets for players in an elementary stream too")
+        ->excludes(plain);
+    app.add_flag("!--no-copy", options.copy_streams,
+                 "Leave out the input's audio and subtitles, which a container takes over");
+    app.add_flag("--realtime", options.realtime, "Code pictures at their times, like a camera");
+    app.add_option("--verify", options.verify,
+                   "Fail unless the elementary stream has this digest (--container md5)")
+        ->type_name("DIGEST");
+}
+
+// Gives the digest its lower-case form.
+void check_digest(std::string& digest) {
+    constexpr std::size_t kDigits = 32;
+    std::transform(digest.begin(), digest.end(), digest.begin(),
+                   [](unsigned char digit) { return static_cast<char>(std::tolower(digit)); });
+    if (digest.size() != kDigits ||
+        digest.find_first_not_of("0123456789abcdef") != std::string::npos) {
+        throw UsageError("--verify: '" + digest +
+                         "' is not a digest of 32 hexadecimal digits as --container md5 gives it");
+    }
+}
+
+// Completes what the line says of the output.
+void choose_output(Options& options, const std::string& container, bool has_input) {
+    options.output_format = container.empty() ? nullptr : OutputFormat::named(container);
+    const bool writes_nothing =
+        options.output_format != nullptr && options.output_format->kind == OutputFormat::Kind::null;
+    if (writes_nothing && !options.output.empty()) {
+        throw UsageError("--container null: writes nothing; leave out -o " + options.output);
+    }
+    if (options.output.empty() && options.output_format != nullptr) {
+        options.output = options.output_format->output_without_name();
+    }
+    if (options.output.empty()) {
+        if (has_input) {
+            throw UsageError("-o is missing: name the file to write, or '-' for standard output");
+        }
+        options.output = kDemonstrationOutput;
+        options.demonstration = true;
+    }
+    if (options.output_format == nullptr) {
+        options.output_format = &OutputFormat::of(options.output);
+    }
+    options.output_format->check_address(options.output);
+}
 
 void add_input_options(CLI::App& app, OptionTexts& texts) {
     app.add_option("--fit", texts.fit,
@@ -104,8 +164,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
                    "Video file, device (KIND:NAME) or URL, Y4M or raw pictures, '-' for standard "
                    "input, or the built-in moving test picture synthetic[:WxH[@FPS[:FRAMES]]]")
         ->type_name("");
-    app.add_option("-o,--output", options.output, "File to write, '-' for standard output")
-        ->type_name("FILE");
+    add_output_options(app, options, texts);
     app.add_option(
            "-b,--bitrate", options.bit_rate_kbs,
            "Target bit rate in kbit/s, up to 4000; 0: no rate control, every picture at QP 28")
@@ -147,7 +206,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
 std::optional<Options> Options::parse(int argc, const char* const* argv) {
     Options options;
     OptionTexts texts;
-    CLI::App app("Codes video to an H.264 elementary stream (Annex B).", "zoltenc");
+    CLI::App app("Codes video to H.264.", "zoltenc");
     // A file's name may begin with '/' on any system.
     app.allow_windows_style_options(false);
     app.get_formatter()->column_width(34);
@@ -162,18 +221,16 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
     }
 
     if (app.count("--list-formats") > 0) {
-        std::cout << "Input\n\n" << list_inputs();
+        std::cout << "Input\n\n" << list_inputs() << "\nOutput\n\n" << OutputFormat::list();
         return std::nullopt;
     }
-    if (app.count("--output") == 0) {
-        if (app.count("INPUT") > 0) {
-            throw UsageError("-o is missing: name the file to write, or '-' for standard output");
-        }
-        options.output = kDemonstrationOutput;
-        options.demonstration = true;
-    }
-    if (options.output.empty() || (options.stats.empty() && app.count("--stats") > 0)) {
+    if ((options.output.empty() && app.count("--output") > 0) ||
+        (options.stats.empty() && app.count("--stats") > 0)) {
         throw UsageError("an output needs a file name");
+    }
+    choose_output(options, texts.container, app.count("INPUT") > 0);
+    if (app.count("--verify") > 0) {
+        check_digest(options.verify);
     }
     if (options.stats == "-") {
         throw UsageError("--stats: standard output is not taken: name a file");

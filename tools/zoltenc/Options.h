@@ -6,6 +6,7 @@
 
 #include "io/FrameRate.h"
 #include "io/PictureFormat.h"
+#include "zoltenc/OutputFormat.h"
 
 namespace zolt {
 
@@ -15,9 +16,10 @@ enum class Fit { crop, pad, scale };
 
 // What the command line asks for.
 struct Options {
-    std::string input = "synthetic";  // a file, "-" or "synthetic..."
-    std::string output;               // a file or "-"
-    bool demonstration = false;       // no input was named: the test picture goes to out.264
+    std::string input = "synthetic";              // a file, "-" or "synthetic..."
+    std::string output;                           // a file, "-" or an address; "null" for none
+    const OutputFormat* output_format = nullptr;  // never null once the line is read
+    bool demonstration = false;  // no input was named: the test picture goes to out.264
 
     int bit_rate_kbs = 200;  // 0: no rate control
     int key_frame_interval = 30;
@@ -26,6 +28,12 @@ struct Options {
     std::optional<std::int64_t> frames;       // most frames to code
     std::int64_t skip = 0;                    // frames to leave out first
     std::optional<Fit> fit;                   // nothing: as the output needs it
+
+    bool plain_headers = false;    // containers keep the encoder's parameter sets
+    bool rewrite_headers = false;  // elementary streams get those that players understand
+    bool copy_streams = true;      // audio and subtitles of the input go to a container
+    bool realtime = false;         // code pictures at their times
+    std::string verify;            // digest that the stream must have, empty for any
 
     std::string stats;   // CSV file, empty for none
     std::string plugin;  // shared library, empty for the one beside the program

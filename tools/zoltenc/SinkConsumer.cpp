@@ -9,14 +9,6 @@
 
 namespace zolt {
 
-void SinkConsumer::describe_input(const FrameRate& frame_rate, const TimeBase& time_base,
-                                  const VideoTraits& traits, int bit_rate_kbs) {
-    description_.frame_rate = frame_rate;
-    description_.time_base = time_base;
-    description_.traits = traits;
-    description_.bit_rate_kbs = bit_rate_kbs;
-}
-
 void SinkConsumer::check() {
     if (failure_) {
         std::rethrow_exception(std::exchange(failure_, nullptr));

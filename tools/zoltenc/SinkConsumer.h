@@ -4,8 +4,8 @@
 #include <exception>
 #include <functional>
 
+#include "io/PictureSink.h"
 #include "media/ISampleConsumer.h"
-#include "zoltenc/PictureSink.h"
 
 class IConfigVideoAvc;
 
@@ -22,11 +22,14 @@ public:
 
     explicit SinkConsumer(PictureSink& sink) : sink_(sink) {}
 
-    // What the sink is told of the stream beside what the encoder says of it.
-    void describe_input(const FrameRate& frame_rate, const TimeBase& time_base,
-                        const VideoTraits& traits, int bit_rate_kbs);
+    // What the sink is told of the stream beside what the encoder says of it, which replaces the
+    // parameter sets and the size of `input`. To be called before the first picture.
+    void describe_input(const StreamDescription& input) { description_ = input; }
 
     void set_picture_listener(PictureListener listener) { listener_ = std::move(listener); }
+
+    // How far the times of the pictures that follow are moved from those of the input, in ticks.
+    void set_time_offset(std::int64_t ticks) { description_.time_offset = ticks; }
 
     // The time of the picture that the encoder is about to be given.
     void set_time(const PictureTime& time) { time_ = time; }

@@ -21,7 +21,10 @@ struct StreamDescription {
     int width = 0;  // of the coded pictures, luma samples
     int height = 0;
     FrameRate frame_rate;
-    TimeBase time_base;  // of the pictures' times
+    bool is_constant_rate = false;  // pictures come at the frame rate exactly
+    TimeBase time_base;             // of the pictures' times
+    // What a time of the input has more than that of the same picture here, in ticks.
+    std::int64_t time_offset = 0;
     VideoTraits traits;
     int bit_rate_kbs = 0;  // 0: no rate control
 };
@@ -44,6 +47,9 @@ public:
 
     // The file that `commit` leaves; null where there is none.
     virtual const OutputFile* file() const = 0;
+
+    // What the user should know about the output, as a one-line note; empty for nothing.
+    virtual std::string remark() const { return ""; }
 
     // The stream that follows. Comes again in mid-stream where the encoder begins anew.
     virtual void begin(const StreamDescription& stream) = 0;
