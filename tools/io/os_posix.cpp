@@ -102,8 +102,9 @@ bool os_close(int descriptor) {
 
 std::ptrdiff_t os_read(int descriptor, void* data, std::size_t size) {
     pollfd input = {descriptor, POLLIN, 0};
-    if (poll(&input, 1, kPollMilliseconds) == 0) {
-        errno = EINTR;
+    const int ready = poll(&input, 1, kPollMilliseconds);
+    if (ready <= 0) {
+        errno = ready == 0 ? EINTR : errno;
         return -1;
     }
     return read(descriptor, data, size);

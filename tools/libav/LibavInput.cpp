@@ -13,7 +13,8 @@
 namespace zolt {
 namespace {
 
-constexpr const char* kRawHint = "; raw pictures need -s WIDTHxHEIGHT (and -f FOURCC)";
+// What an input's last packet may fall short of the end that the input states.
+constexpr std::int64_t kEndTolerance = AV_TIME_BASE / 2;
 
 // "SCHEME://..." with a scheme as RFC 3986 has it.
 bool is_url(const std::string& input) {
@@ -64,13 +65,16 @@ bool LibavInput::names_address(const std::string& input) {
 
 LibavInput::LibavInput(const std::string& input, bool with_side_streams) : name_(input) {
     const Device device = parse_device(input);
-    if (is_url(input)) {
-        open(input, nullptr);
-    } else if (device.format != nullptr) {
-        open(device.name, device.format);
+    if (is_url(input) || device.format != nullptr) {
+        const int opened =
+            device.format != nullptr ? open(device.name, device.format) : open(input, nullptr);
+        if (opened < 0) {
+            throw ToolError(name_ + ": cannot be read: " + libav_error(opened) +
+                            "; zoltenc --list-formats lists devices and addresses");
+        }
     } else {
         // What stands before a colon in a file's name is no protocol.
-        open("file:" + input, nullptr);
+        check_opened(open("file:" + input, nullptr));
     }
     choose_streams(with_side_streams);
 }
@@ -83,7 +87,7 @@ LibavInput::LibavInput(ByteReader bytes, bool with_side_streams)
     if (!io_) {
         throw std::bad_alloc();
     }
-    open("", nullptr);
+    check_opened(open("", nullptr));
     choose_streams(with_side_streams);
 }
 
@@ -116,20 +120,19 @@ bool LibavInput::read(AVPacket* packet) {
             continue;
         }
         if (result < 0) {
-            if (result != AVERROR_EOF && cut_.empty()) {
-                cut_ = libav_error(result);
-            }
+            note_end(result);
             return false;
         }
-        // What the input's last bytes are too few for.
-        const bool is_cut = (packet->flags & AV_PKT_FLAG_CORRUPT) != 0 && context_->pb != nullptr &&
-                            avio_feof(context_->pb) != 0;
-        if (is_cut) {
-            cut_ = "the input ends within a picture or sound";
-        } else if (packet->stream_index == video_->index) {
-            return true;
-        } else if (side_streams_) {
-            side_streams_->push(*packet);
+        if ((packet->flags & AV_PKT_FLAG_CORRUPT) != 0 && has_no_more_bytes()) {
+            cut_ = "its end is missing";
+        } else {
+            note_time(*packet);
+            if (packet->stream_index == video_->index) {
+                return true;
+            }
+            if (side_streams_) {
+                side_streams_->push(*packet);
+            }
         }
         av_packet_unref(packet);
     }
@@ -142,23 +145,27 @@ void LibavInput::interrupt() {
     }
 }
 
-void LibavInput::open(const std::string& url, const AVInputFormat* format) {
+int LibavInput::open(const std::string& url, const AVInputFormat* format) {
     AVFormatContext* context = avformat_alloc_context();
     if (context == nullptr) {
         throw std::bad_alloc();
     }
     context->interrupt_callback = {is_interrupted, this};
     context->pb = io_.get();
-    const int opened = avformat_open_input(&context, url.c_str(), format, nullptr);
+    int result = avformat_open_input(&context, url.c_str(), format, nullptr);
     context_.reset(context);
-    check();
-    if (opened < 0) {
-        fail("is not Y4M, nor can it be read as another video: " + libav_error(opened));
+    if (result >= 0) {
+        result = avformat_find_stream_info(context, nullptr);
     }
-    const int found = avformat_find_stream_info(context, nullptr);
     check();
-    if (found < 0) {
-        fail("cannot be read as a video: " + libav_error(found));
+    return result;
+}
+
+void LibavInput::check_opened(int result) const {
+    if (result < 0) {
+        throw ToolError(name_ + ": is not Y4M, nor can it be read as another video (" +
+                        libav_error(result) +
+                        "); raw pictures need -s WIDTHxHEIGHT (and -f FOURCC)");
     }
 }
 
@@ -172,13 +179,12 @@ void LibavInput::choose_streams(bool with_side_streams) {
         } else if (with_side_streams && is_side_stream(*stream)) {
             side_streams.push_back({stream->index, stream->codecpar, stream->time_base,
                                     stream->disposition, stream->metadata});
-        } else {
-            stream->discard = AVDISCARD_ALL;
         }
     }
     if (video_ == nullptr) {
         const std::string others = left_out();
-        fail("holds no video" + (others.empty() ? "" : ", only " + others));
+        throw ToolError(name_ + ": holds no video" + (others.empty() ? "" : ", only " + others) +
+                        "; a file with a video stream is needed");
     }
     if (!side_streams.empty()) {
         side_streams_.emplace(std::move(side_streams));
@@ -195,8 +201,33 @@ void LibavInput::check() {
     }
 }
 
-void LibavInput::fail(const std::string& what) const {
-    throw ToolError(name_ + ": " + what + kRawHint);
+bool LibavInput::has_no_more_bytes() const {
+    return context_->pb != nullptr && avio_feof(context_->pb) != 0;
+}
+
+// Notes how far the packets reach, in AV_TIME_BASE.
+void LibavInput::note_time(const AVPacket& packet) {
+    const std::int64_t start = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+    if (start != AV_NOPTS_VALUE) {
+        const AVRational base = context_->streams[packet.stream_index]->time_base;
+        const std::int64_t end = start + packet.duration;
+        end_ = std::max(end_, av_rescale_q(end, base, AV_TIME_BASE_Q));
+    }
+}
+
+// The libraries take most cuts for the end: it is a cut where the packets reach less far than the
+// file says.
+void LibavInput::note_end(int result) {
+    if (!cut_.empty()) {
+        return;
+    }
+    if (result != AVERROR_EOF) {
+        cut_ = libav_error(result);
+    } else if (has_no_more_bytes() &&
+               context_->duration_estimation_method == AVFMT_DURATION_FROM_STREAM &&
+               end_ + kEndTolerance < context_->duration) {
+        cut_ = "by its header it is longer";
+    }
 }
 
 int LibavInput::read_bytes(void* self, std::uint8_t* buffer, int size) {

@@ -48,10 +48,13 @@ public:
     void interrupt();
 
 private:
-    void open(const std::string& url, const AVInputFormat* format);
+    int open(const std::string& url, const AVInputFormat* format);
+    void check_opened(int result) const;
     void choose_streams(bool with_side_streams);
     void check();
-    [[noreturn]] void fail(const std::string& what) const;
+    bool has_no_more_bytes() const;
+    void note_time(const AVPacket& packet);
+    void note_end(int result);
 
     static int read_bytes(void* self, std::uint8_t* buffer, int size);
     static int is_interrupted(void* self);
@@ -62,6 +65,7 @@ private:
     LibavPtr<AVFormatContext> context_;
     AVStream* video_ = nullptr;
     std::optional<SideStreams> side_streams_;
+    std::int64_t end_ = 0;  // of the packets so far, in AV_TIME_BASE
     std::string cut_;
     std::exception_ptr failure_;  // of `bytes_`, until the library is left
     std::atomic<bool> interrupted_{false};

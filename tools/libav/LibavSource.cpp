@@ -129,8 +129,8 @@ std::string LibavSource::closing_remark() const {
     if (!other_size_.empty()) {
         append(text, other_size_);
     }
-    const bool has_times = (input_.context()->iformat->flags & AVFMT_NOTIMESTAMPS) == 0;
-    if (has_times && clock_->repairs() > 0) {
+    // Where none is stated, as in elementary streams, nobody expects any.
+    if (clock_->repairs() > 0 && clock_->repairs() < frames_read_) {
         append(text, count_text(clock_->repairs(), "time stamp") +
                          " did not grow or were missing, and were replaced");
     }

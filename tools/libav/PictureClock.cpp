@@ -7,7 +7,7 @@ namespace {
 constexpr std::int64_t kMaxTicks = std::int64_t{1} << 56;
 
 // A step back by more pictures than this is a clock that begins anew.
-constexpr std::int64_t kMaxWait = 50;
+constexpr std::int64_t kMaxWait = 4;
 
 }  // namespace
 
