@@ -33,7 +33,7 @@ _zoltenc() {
     case $previous in
         -f | --format) _zolt_words 'IYUV YUY2 AYUV BGRA RGBA ARGB BGR RGB' ;;
         --fit) _zolt_words 'crop pad scale' ;;
-        --container) _zolt_words '264 mp4 mov mkv flv ts null md5' ;;
+        --container) _zolt_words 'h264 mp4 mov mkv flv ts null md5' ;;
         -s | --size) _zolt_words '176x144 352x288 640x360 640x480 854x480 1280x720 1920x1080' ;;
         -r | --fps) _zolt_words '24000/1001 24 25 30000/1001 30 50 60000/1001 60' ;;
         -b | --bitrate | -g | --keyint | -n | --frames | --skip | --verify) COMPREPLY=() ;;

@@ -35,7 +35,7 @@ class KilledRuns(StreamTest):
         print(f"seed {SEED}, {RUNS} runs", file=sys.stderr)
         chance = random.Random(SEED)
         self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=176x144:rate=25", "-f", "lavfi", "-i", "sine",
-                    "-t", "600", "-c:v", "mpeg4", "-c:a", "aac", "in.mkv")
+                    "-t", "200", "-c:v", "mpeg4", "-c:a", "aac", "in.mkv")
         files = 0
         for run in range(RUNS):
             output = f"out{run}.{('mp4', 'mkv', 'ts')[run % 3]}"
