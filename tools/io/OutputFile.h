@@ -23,6 +23,9 @@ public:
     // What to call the output in a message.
     const std::string& name() const { return name_; }
 
+    // Whether there is nothing to replace: bytes are out as soon as they are written.
+    bool is_written_directly() const { return place_.empty(); }
+
     // Whether `commit` would replace the file `input` ("-": standard input), or what `other`
     // writes.
     bool would_replace(const std::string& input) const;

@@ -35,6 +35,14 @@ std::optional<int> PictureFormat::parse_fourcc(std::string_view text) {
     return known ? std::optional<int>(code) : std::nullopt;
 }
 
+std::string PictureFormat::fourcc_text() const {
+    std::string text;
+    for (const int shift : {24, 16, 8, 0}) {
+        text += static_cast<char>(fourcc_code >> shift & 0xFF);
+    }
+    return text.substr(0, text.find(' '));
+}
+
 std::string PictureFormat::size_error(int width, int height) {
     const std::string size = "picture size " + std::to_string(width) + "x" + std::to_string(height);
     if (width < kMinSide || height < kMinSide) {

@@ -35,6 +35,9 @@ struct PictureFormat {
     // text.
     static std::optional<int> parse_fourcc(std::string_view text);
 
+    // The format's code as text, without a blank at its end.
+    std::string fourcc_text() const;
+
     // What is wrong with a picture size, with what would be right; empty when it can be coded.
     static std::string size_error(int width, int height);
 

@@ -5,19 +5,19 @@
 #include <cctype>
 #include <iostream>
 #include <limits>
+#include <utility>
 
 #include "io/SyntheticSource.h"
 #include "io/ToolError.h"
 #include "io/numbers.h"
 #include "zoltenc/libav_input.h"
+#include "zoltenc/open_probe.h"
 
 namespace zolt {
 namespace {
 
 constexpr const char* kDemonstrationOutput = "out.264";
 constexpr FrameRate kMaxFrameRate{1000, 1};
-// The largest bit rate of level 2.2, Main profile (ITU-T H.264 Table A-1).
-constexpr int kMaxBitRateKbs = 4000;
 constexpr int kMaxCount = std::numeric_limits<std::int32_t>::max();
 
 // Refuses what is not a whole number of `low`..`high`.
@@ -90,6 +90,45 @@ struct OptionTexts {
     std::string format;
     std::string fit;
 };
+
+void add_report_options(CLI::App& app, Options& options) {
+    app.add_flag("--match-rate", options.match_rate,
+                 "Code the input up to four times, until the average is within 3 % of --bitrate");
+    app.add_flag("--psnr", options.psnr, "Measure PSNR and SSIM of the decoded output");
+    app.add_option("--stats", options.stats, "Write a CSV file with one row per picture")
+        ->type_name("FILE");
+    app.add_option("--report", options.report, "Write a page with plots and pictures of the run")
+        ->type_name("FILE.html");
+    app.add_flag("--json", options.json, "Tell of the run in JSON, one object a line");
+}
+
+// What these options need of each other and of the build.
+void check_report_options(const CLI::App& app, const Options& options) {
+    for (const auto& [name, file] :
+         {std::pair("--stats", options.stats), std::pair("--report", options.report)}) {
+        if (file.empty() && app.count(name) > 0) {
+            throw UsageError(std::string(name) + ": an output needs a file name");
+        }
+        if (file == "-") {
+            throw UsageError(std::string(name) + ": standard output is not taken: name a file");
+        }
+    }
+    if (options.psnr && !has_probe()) {
+        throw UsageError(
+            "--psnr: this zoltenc was built without libavcodec, which decodes the "
+            "output; build it where libavcodec-dev is installed");
+    }
+    if (!options.match_rate) {
+        return;
+    }
+    if (options.bit_rate_kbs == 0) {
+        throw UsageError("--match-rate: there is no rate to match: -b must be from 1 to " +
+                         std::to_string(Options::kMaxBitRateKbs));
+    }
+    if (options.input == "-") {
+        throw UsageError("--match-rate: standard input cannot be read again: name a file");
+    }
+}
 
 void add_output_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.add_option("-o,--output", options.output,
@@ -168,7 +207,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.add_option(
            "-b,--bitrate", options.bit_rate_kbs,
            "Target bit rate in kbit/s, up to 4000; 0: no rate control, every picture at QP 28")
-        ->check(whole_number(0, kMaxBitRateKbs))
+        ->check(whole_number(0, Options::kMaxBitRateKbs))
         ->type_name("KBPS")
         ->capture_default_str();
     app.add_option("-g,--keyint", options.key_frame_interval,
@@ -190,8 +229,7 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
         ->check(whole_number(0, kMaxCount))
         ->type_name("N");
     add_input_options(app, texts);
-    app.add_option("--stats", options.stats, "Write a CSV file with one row per picture")
-        ->type_name("FILE");
+    add_report_options(app, options);
     app.add_option("--plugin", options.plugin,
                    "Encoder library (otherwise " ZOLT_ENCODER_LIBRARY " beside this program)")
         ->type_name("FILE");
@@ -224,17 +262,14 @@ std::optional<Options> Options::parse(int argc, const char* const* argv) {
         std::cout << "Input\n\n" << list_inputs() << "\nOutput\n\n" << OutputFormat::list();
         return std::nullopt;
     }
-    if ((options.output.empty() && app.count("--output") > 0) ||
-        (options.stats.empty() && app.count("--stats") > 0)) {
+    if (options.output.empty() && app.count("--output") > 0) {
         throw UsageError("an output needs a file name");
     }
     choose_output(options, texts.container, app.count("INPUT") > 0);
     if (app.count("--verify") > 0) {
         check_digest(options.verify);
     }
-    if (options.stats == "-") {
-        throw UsageError("--stats: standard output is not taken: name a file");
-    }
+    check_report_options(app, options);
     if (!texts.fps.empty()) {
         options.frame_rate = parse_frame_rate(texts.fps);
     }

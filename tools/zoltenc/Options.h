@@ -16,6 +16,9 @@ enum class Fit { crop, pad, scale };
 
 // What the command line asks for.
 struct Options {
+    // The largest bit rate of level 2.2, Main profile (ITU-T H.264 Table A-1).
+    static constexpr int kMaxBitRateKbs = 4000;
+
     std::string input = "synthetic";              // a file, "-" or "synthetic..."
     std::string output;                           // a file, "-" or an address; "null" for none
     const OutputFormat* output_format = nullptr;  // never null once the line is read
@@ -36,6 +39,10 @@ struct Options {
     std::string verify;            // digest that the stream must have, empty for any
 
     std::string stats;   // CSV file, empty for none
+    std::string report;  // HTML file, empty for none
+    bool psnr = false;   // measure the quality
+    bool json = false;   // tell programs of the run
+    bool match_rate = false;
     std::string plugin;  // shared library, empty for the one beside the program
     bool keep_partial = false;
     bool quiet = false;

@@ -1,30 +1,29 @@
 #include "zoltenc/PictureStats.h"
 
-#include <optional>
-
-#include "avc/SliceHeader.h"
-#include "media/IConfigVideoAvc.h"
+#include <cstdio>
 
 namespace zolt {
 
-PictureStats::PictureStats(const std::string& file_name) : file_(file_name) {
-    write_row("index,time_us,type,bytes,qp");
+PictureStats::PictureStats(const std::string& file_name, bool with_quality) : file_(file_name) {
+    write_row(std::string("index,time_us,type,bytes,qp") +
+              (with_quality ? ",psnr_y,psnr_u,psnr_v,ssim_y" : ""));
 }
 
-void PictureStats::add(IConfigVideoAvc& stream, const unsigned char* nal, std::size_t size,
-                       std::int64_t time) {
-    parameter_sets_.add_seq_par_set(stream.GetSeqParSetData(), stream.GetSeqParSetSize());
-    parameter_sets_.add_pic_par_set(stream.GetPicParSetData(), stream.GetPicParSetSize());
-    const std::optional<SliceHeader> slice =
-        SliceHeader::read(nal, static_cast<int>(size), parameter_sets_);
-
-    std::string row = std::to_string(index_++) + "," + std::to_string(time) + ",";
-    if (slice) {
-        row += slice->slice_type == kSliceI ? "I" : "P";
+void PictureStats::add(const PictureRecord& picture) {
+    std::string row = std::to_string(picture.index) + "," + std::to_string(picture.time) + ",";
+    if (picture.type != '\0') {
+        row += picture.type;
     }
-    row += "," + std::to_string(size) + ",";
-    if (slice && slice->is_complete) {
-        row += std::to_string(slice->slice_qp);
+    row += "," + std::to_string(picture.bytes) + ",";
+    if (picture.qp) {
+        row += std::to_string(*picture.qp);
+    }
+    if (const auto& quality = picture.quality) {
+        char text[160];
+        std::snprintf(text, sizeof text, ",%.3f,%.3f,%.3f,%.5f",
+                      PictureQuality::psnr(quality->mse_y), PictureQuality::psnr(quality->mse_u),
+                      PictureQuality::psnr(quality->mse_v), quality->ssim_y);
+        row += text;
     }
     write_row(row);
 }

@@ -5,37 +5,48 @@
 #include <optional>
 #include <string>
 
-#include "io/FrameRate.h"
-
 namespace zolt {
 
-// Frames and bytes so far, as a line on a terminal that is written over and over, and as a summary.
+class JsonLines;
+class StreamTally;
+
+// How far a run is: a line on a terminal that is written over and over, a line every few seconds
+// where standard error is none, or JSON for programs.
 class Progress {
 public:
-    // `total` frames are expected, if known. Shows nothing when not `visible` or when standard
-    // error is no terminal.
-    Progress(std::optional<std::int64_t> total, const FrameRate& frame_rate, bool visible);
+    struct Settings {
+        std::optional<std::int64_t> frames;  // that are expected, if known
+        int target_kbs = 0;                  // 0: no rate control
+        int pass = 1;
+        int passes = 1;             // at most; 1: not worth telling
+        JsonLines* json = nullptr;  // borrowed; takes the place of lines for people
+        bool visible = true;
+    };
 
-    // To be called after every frame; draws the line a few times a second.
-    void update(std::int64_t frames, std::int64_t bytes);
+    // `tally` is borrowed.
+    Progress(const Settings& settings, const StreamTally& tally);
+
+    // To be called after every picture; shows something a few times a second at most.
+    void update();
 
     // Wipes the line away, so that other text can follow.
     void clear();
 
-    // "FRAMES frames in S s (F frames/s), B bytes, K kbit/s"; kbit/s at the stream's frame rate.
-    std::string summary(std::int64_t frames, std::int64_t bytes) const;
+    // Since the run began.
+    double seconds() const;
 
 private:
     using Clock = std::chrono::steady_clock;
 
-    double seconds() const;
-    double kilobits_per_second(std::int64_t frames, std::int64_t bytes) const;
+    std::string line() const;
+    void write_json() const;
 
-    std::optional<std::int64_t> total_;
-    double frame_rate_;
+    Settings settings_;
+    const StreamTally& tally_;
     bool on_terminal_;
+    Clock::duration interval_;
     Clock::time_point start_ = Clock::now();
-    Clock::time_point last_drawn_ = start_;
+    Clock::time_point last_shown_ = start_;
     bool drawn_ = false;
 };
 

@@ -1,25 +1,42 @@
 #include <cstdio>
 #include <exception>
 #include <optional>
+#include <string>
 
 #include "io/StopSignal.h"
 #include "io/ToolError.h"
 #include "io/os.h"
 #include "zoltenc/EncodeRun.h"
+#include "zoltenc/JsonLines.h"
 #include "zoltenc/Options.h"
+#include "zoltenc/RateMatch.h"
 
 namespace {
 
 constexpr int kFailure = 1;
 constexpr int kWrongUsage = 2;
 
+bool goes_to_standard_output(const std::string& output) {
+    const auto ours = zolt::os_status(zolt::kStandardOutput);
+    const auto theirs = zolt::os_status(output);
+    return output == "-" || (ours && theirs && ours->is_same_file(*theirs));
+}
+
 // Returns the exit status of a run that went well; that of a stopped one is the one of a process
 // that the signal has ended.
 int run(const zolt::Options& options) {
     constexpr int kSignalBase = 128;
     zolt::StopSignal::install();
+    std::optional<zolt::JsonLines> json;
+    if (options.json) {
+        json.emplace(goes_to_standard_output(options.output));
+    }
     try {
-        zolt::EncodeRun(options).run();
+        if (options.match_rate) {
+            zolt::RateMatch(options, json ? &*json : nullptr).run();
+        } else {
+            zolt::EncodeRun(options, json ? &*json : nullptr).run();
+        }
     } catch (const zolt::TruncatedInput&) {
         // A stop signal cuts off the input too.
         if (zolt::StopSignal::received() == 0) {
