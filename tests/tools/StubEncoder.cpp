@@ -67,8 +67,13 @@ public:
             index_ % key_frame_interval_ == 0 ? 0x65 : 0x41, index_, sample->GetSampleTime(),
             sample->GetSampleSize(), digest(sample->GetSampleData(), sample->GetSampleSize()));
         ++index_;
-        output_.SetSampleData(reinterpret_cast<unsigned char*>(text));
-        output_.SetSampleSize(length);
+        std::string unit(text, length);
+        if (misbehaves("echo")) {
+            unit.assign(sample->GetSampleData(), sample->GetSampleData() + sample->GetSampleSize());
+            unit.insert(0, 1, 0x65);
+        }
+        output_.SetSampleData(reinterpret_cast<unsigned char*>(unit.data()));
+        output_.SetSampleSize(static_cast<long>(unit.size()));
         output_.SetSampleTime(sample->GetSampleTime());
         consumer_->PutSample(&output_);
         output_.SetSampleData(nullptr);

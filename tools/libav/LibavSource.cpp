@@ -132,7 +132,7 @@ std::string LibavSource::closing_remark() const {
     // Where none is stated, as in elementary streams, nobody expects any.
     if (clock_->repairs() > 0 && clock_->repairs() < frames_read_) {
         append(text, count_text(clock_->repairs(), "time stamp") +
-                         " did not grow or were missing, and were replaced");
+                         " replaced, for missing or not growing");
     }
     return text;
 }

@@ -7,7 +7,7 @@
 #include "io/FrameSource.h"
 #include "libav/FrameConverter.h"
 #include "libav/LibavInput.h"
-#include "libav/PictureClock.h"
+#include "io/PictureClock.h"
 
 namespace zolt {
 

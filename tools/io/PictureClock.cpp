@@ -1,4 +1,4 @@
-#include "libav/PictureClock.h"
+#include "io/PictureClock.h"
 
 namespace zolt {
 namespace {
