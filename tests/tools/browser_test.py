@@ -48,7 +48,6 @@ return {width: canvas.width, height: canvas.height, duration: video.duration, pi
 class BrowserTest(StreamTest):
     def setUp(self):
         super().setUp()
-        self.server = self.enterContext(FileServer(self.folder))
         self.browser = self.enterContext(Chromium())
 
 
@@ -56,7 +55,8 @@ class Video(BrowserTest):
     def setUp(self):
         super().setUp()
         self.write("player.html", PAGE)
-        self.browser.open(self.server.address + "player.html")
+        server = self.enterContext(FileServer(self.folder))
+        self.browser.open(server.address + "player.html")
 
     def drawn(self, name, time, width, height):
         """R, G and B of each pixel that the browser shows of a file at a time in seconds."""
@@ -130,7 +130,7 @@ class Report(BrowserTest):
                                     (390, 844, True)):
             with self.subTest(width=width, dark=dark):
                 self.browser.show_as(width, height, dark)
-                self.browser.open(self.server.address + "report.html")
+                self.browser.open((self.folder / "report.html").as_uri())
                 self.browser.run("document.querySelectorAll('input').forEach(input => input.click())")
                 self.assertEqual(self.browser.messages(), [])
                 page = self.browser.run("""
