@@ -23,6 +23,7 @@ private:
     PictureFormat result_;
     std::vector<unsigned char> picture_;  // as the other source gives it
     LibavPtr<SwsContext> scaler_;
+    LibavPtr<AVFrame> frame_;  // the same for libswscale
     LibavPtr<AVFrame> scaled_;
 };
 

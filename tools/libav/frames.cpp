@@ -99,4 +99,26 @@ void copy_picture(const AVFrame& frame, const PictureFormat& format, unsigned ch
     }
 }
 
+void copy_picture(const unsigned char* sample, const PictureFormat& format, AVFrame& frame) {
+    const bool is_planar = format.fourcc_code == PictureFormat::kIyuv;
+    int plane = 0;
+    for (const PictureFormat::Plane& from : format.planes()) {
+        unsigned char* row = frame.data[plane];
+        for (std::size_t y = 0; y < from.rows; ++y, row += frame.linesize[plane]) {
+            std::copy_n(sample, from.row_bytes, row);
+            sample += from.row_bytes;
+            if (is_planar && from.row_bytes < from.file_row_bytes) {
+                row[from.row_bytes] = row[from.row_bytes - 1];
+            } else if (from.row_bytes < from.file_row_bytes) {
+                // Y0 U of a pair; Y1 V as in the pair before.
+                std::copy_n(row + from.row_bytes - 4, 2, row + from.row_bytes);
+            }
+        }
+        if (from.rows < from.file_rows) {
+            std::copy_n(row - frame.linesize[plane], from.file_row_bytes, row);
+        }
+        ++plane;
+    }
+}
+
 }  // namespace zolt
