@@ -155,7 +155,7 @@ bool LibavSource::read(unsigned char* sample) {
     }
     if (!has_frame_ && !decode()) {
         if (!input_.cut().empty()) {
-            throw TruncatedInput(name() + ": is cut off or damaged after " +
+            throw TruncatedInput(input_.name() + ": is cut off or damaged after " +
                                  count_text(frames_read_, "picture") + ": " + input_.cut());
         }
         return false;
@@ -186,12 +186,12 @@ void LibavSource::begin() {
     const std::string error =
         PictureFormat::size_error(stream->codecpar->width, stream->codecpar->height);
     if (stream->codecpar->width > 0 && !error.empty()) {
-        throw ToolError(name() + ": " + error);
+        throw ToolError(input_.name() + ": " + error);
     }
     open_decoder();
     if (!decode()) {
         const std::string what =
-            name() + ": " +
+            input_.name() + ": " +
             (undecodable_ > 0 ? "none of its pictures can be decoded; is it damaged?"
                               : "holds no picture");
         if (!input_.cut().empty()) {
@@ -207,7 +207,7 @@ void LibavSource::open_decoder() {
     const AVCodecParameters& parameters = *input_.video()->codecpar;
     const AVCodec* const codec = avcodec_find_decoder(parameters.codec_id);
     if (codec == nullptr) {
-        throw ToolError(name() + ": there is no decoder for its video, which is coded as " +
+        throw ToolError(input_.name() + ": there is no decoder for its video, which is coded as " +
                         avcodec_get_name(parameters.codec_id) +
                         "; zoltenc --list-formats lists "
                         "what is read");
@@ -224,7 +224,7 @@ void LibavSource::open_decoder() {
     decoder_->max_pixels = std::int64_t{2} * PictureFormat::kMaxMacroblocks * 256;
     const int opened = avcodec_open2(decoder_.get(), codec, nullptr);
     if (opened < 0) {
-        throw ToolError(name() + ": its video, coded as " + codec->name +
+        throw ToolError(input_.name() + ": its video, coded as " + codec->name +
                         ", cannot be decoded: " + libav_error(opened));
     }
 }
@@ -265,7 +265,7 @@ bool LibavSource::feed() {
 void LibavSource::look_at_first_frame() {
     AVFormatContext* const context = input_.context();
     AVStream* const stream = input_.video();
-    converter_.emplace(*frame_, name());
+    converter_.emplace(*frame_, input_.name());
     frame_rate_ = sensible_frame_rate(context, stream);
     // Pictures that last a tick are the shortest that a clock can tell.
     const FrameRate rate = frame_rate_.value_or(FrameRate{});
