@@ -51,7 +51,7 @@ class BrowserTest(StreamTest):
         self.browser = self.enterContext(Chromium())
 
 
-class Video(BrowserTest):
+class BrowserVideo(BrowserTest):
     def setUp(self):
         super().setUp()
         self.write("player.html", PAGE)
@@ -117,7 +117,7 @@ def mean_difference(a, b):
     return sum(abs(x - y) for x, y in zip(a, b)) / len(a)
 
 
-class Report(BrowserTest):
+class BrowserReport(BrowserTest):
     max_bytes = 3_000_000
 
     def test_the_page_of_a_report(self):

@@ -44,7 +44,7 @@ class ParallelTest(StreamTest):
         return result
 
 
-class Pieces(ParallelTest):
+class ParallelPieces(ParallelTest):
     def test_pieces_hold_the_pictures_of_one_run(self):
         name = "a 'b\" $c [*] {}.y4m"
         self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=25:duration=5",
@@ -111,7 +111,7 @@ class Pieces(ParallelTest):
                 self.assertEqual(self.files(), ["in.y4m"])
 
 
-class Failures(ParallelTest):
+class ParallelFailures(ParallelTest):
     arguments = ("synthetic:64x48", "--frames", "40", "--pieces", "4", "-j", "2", "-o", "out.264",
                  "--", "-g", "5")
 
@@ -198,7 +198,7 @@ class Failures(ParallelTest):
         self.assertEqual(status, 128 + signal.SIGTERM)
 
 
-class OtherMachines(ParallelTest):
+class ParallelMachines(ParallelTest):
     def test_pieces_are_coded_elsewhere(self):
         """The other machines are folders, reached by a program that stands in for ssh."""
         self.program("bin/ssh", f"""
