@@ -15,6 +15,7 @@ from fractions import Fraction
 from zoltenc_stream_test import StreamTest
 
 CONTAINERS = ("mp4", "mov", "mkv", "flv", "ts")
+WITH_ROTATION = ("mp4", "mov")
 # These hold no size beside the stream's own, which is cropped by pairs of samples.
 WITHOUT_SIZE = ("flv", "ts")
 CLIPS = os.environ.get("ZOLT_TEST_CLIPS", "")
@@ -55,14 +56,17 @@ class AnyToAny(StreamTest):
         near = coded["clock"] / 2 + Fraction(1, 500000)
         for index, (time, expected) in enumerate(zip(coded["times"], given["times"])):
             self.assertLessEqual(abs(time - expected), near, f"picture {index}")
-        self.assertLessEqual(abs(coded["duration"] - given["duration"]), given["clock"] + 2 * near)
+        near_end = given["clock"] + 2 * near
+        if container == "ts":
+            # It holds no durations, and readers guess that of the last picture.
+            near_end += max(b - a for a, b in zip(given["times"], given["times"][1:]))
+        self.assertLessEqual(abs(coded["duration"] - given["duration"]), near_end)
         size = given["size"]
         if container in WITHOUT_SIZE:
             size = tuple(even(side) for side in size)
-        else:
-            self.assertEqual(coded["rotation"], given["rotation"])
         self.assertEqual(coded["size"], size)
         self.assertEqual(coded["shape"], given["shape"])
+        self.assertEqual(coded["rotation"], given["rotation"] if container in WITH_ROTATION else 0)
 
     def assert_decodes(self, name, pictures):
         """Every stream, and the number of pictures; warnings count."""
@@ -116,24 +120,32 @@ class AnyFile(AnyToAny):
     def test_pictures_at_times_of_their_own(self):
         uneven = "setpts='(N*N+3*N)/90/TB'"
         for name, codec in (("uneven.mkv", "ffv1"), ("uneven.mp4", "mpeg4")):
-            self.check(self.make(name, codec=codec, filters=f"settb=1/90000,{uneven}",
-                                 options=("-fps_mode", "vfr", "-enc_time_base", "1/90000")))
+            self.check(self.make(name, codec=codec, filters=f"settb=1/9000,{uneven}",
+                                 options=("-fps_mode", "vfr", "-enc_time_base", "1/9000")))
 
     def test_rotation(self):
         self.make("upright.mp4", codec="mpeg4")
         self.ffmpeg("-i", "upright.mp4", "-c", "copy", "-metadata:s:v", "rotate=90", "turned.mp4")
         self.assertNotEqual(self.describe("turned.mp4")["rotation"], 0)
         self.check("turned.mp4")
+        for container in set(CONTAINERS) - set(WITH_ROTATION):
+            note = self.encode("turned.mp4", "-o", f"out.{container}").stderr
+            self.assertIn("the rotation by", note)
 
     def test_sound(self):
         self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=25", "-f", "lavfi", "-i", "sine",
                     "-t", "2", "-c:v", "mpeg4", "-c:a", "aac", "in.mp4")
         self.check("in.mp4")
+
+        def sound(name):
+            return self.ffmpeg("-i", name, "-map", "0:a", "-c", "copy", "-f", "adts", "-")
+
         for container in CONTAINERS:
             with self.subTest(container=container):
-                copied = self.ffmpeg("-i", f"out.{container}", "-map", "0:a", "-c", "copy", "-f", "adts", "-")
-                given = self.ffmpeg("-i", "in.mp4", "-map", "0:a", "-c", "copy", "-f", "adts", "-")
-                self.assertEqual(copied, given)
+                copied = sound(f"out.{container}")
+                # What starts the decoder before time 0 is left out where no time is below 0.
+                self.assertTrue(sound("in.mp4").endswith(copied))
+                self.assertGreater(len(copied), 0.97 * len(sound("in.mp4")))
 
     def test_pictures_of_one_column_are_an_error(self):
         self.make("thin.mkv", filters="crop=1:48:0:0:exact=1", pixels="yuv444p")

@@ -198,6 +198,56 @@ class ParallelFailures(ParallelTest):
         self.assertEqual(status, 128 + signal.SIGTERM)
 
 
+class ParallelTimes(ParallelTest):
+    def packets(self, name, stream, fields="pts_time,flags"):
+        text = subprocess.run(
+            ["ffprobe", "-v", "error", "-select_streams", stream, "-show_entries", f"packet={fields}",
+             "-of", "compact=p=0:nk=1", name],
+            cwd=self.folder, capture_output=True, text=True, check=True).stdout
+        return [line for line in text.splitlines() if line]
+
+    def test_joined_files_are_as_those_of_one_run(self):
+        """Pictures at uneven times that do not begin with 0, and sound."""
+        self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=30000/1001", "-f", "lavfi", "-i",
+                    "sine", "-t", "4", "-vf", "select='mod(n,7)-3*mod(n,2)',setpts=PTS+0.1/TB",
+                    "-fps_mode", "vfr", "-c:v", "mpeg4", "-c:a", "aac", "in.mp4")
+        self.ffmpeg("-i", "in.mp4", "-c", "copy", "in.mkv")
+        options = ("-g", "5", "-b", "0")
+        for source in ("in.mp4", "in.mkv"):
+            for ending in ("mp4", "mov", "mkv", "flv", "ts"):
+                with self.subTest(source=source, ending=ending):
+                    one, joined = f"one.{ending}", f"joined.{ending}"
+                    self.encode(source, "-o", one, *options)
+                    self.assert_succeeds(
+                        self.parallel(source, "-o", joined, "-j", "4", "--", *options))
+                    expected = self.packets(one, "v")
+                    self.assertEqual(self.packets(joined, "v"), expected)
+                    self.assertGreater(len(expected), 80)
+                    self.assertAlmostEqual(len(self.packets(joined, "a", "pts")),
+                                           len(self.packets(one, "a", "pts")), delta=1)
+                    self.assertEqual(self.pictures(joined), self.pictures(one))
+
+    def pictures(self, name):
+        """The digests of the decoded pictures."""
+        lines = self.ffmpeg("-i", name, "-map", "0:v", "-fps_mode", "passthrough", "-enc_time_base",
+                            "-1", "-f", "framemd5", "-")
+        return [line.split()[-1] for line in lines.splitlines() if not line.startswith(b"#")]
+
+    def test_times_without_an_input_that_states_any(self):
+        source = ["synthetic:64x48@30000/1001:95"]
+        self.encode(*source, "-o", "one.mp4", "-g", "5")
+        self.assert_succeeds(self.parallel(*source, "--frames", "95", "--pieces", "19", "-o",
+                                           "joined.mp4", "--", "-g", "5"))
+        self.assertEqual(self.packets("joined.mp4", "v", "pts,duration,flags"),
+                         self.packets("one.mp4", "v", "pts,duration,flags"))
+
+    def test_sound_can_be_left_out(self):
+        self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=25", "-f", "lavfi", "-i", "sine",
+                    "-t", "1", "-c:v", "mpeg4", "-c:a", "aac", "in.mkv")
+        self.assert_succeeds(self.parallel("in.mkv", "--no-copy", "-o", "out.mp4", "--", "-g", "5"))
+        self.assertEqual(self.packets("out.mp4", "a"), [])
+
+
 class ParallelMachines(ParallelTest):
     def test_pieces_are_coded_elsewhere(self):
         """The other machines are folders, reached by a program that stands in for ssh."""
