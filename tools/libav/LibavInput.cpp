@@ -97,6 +97,14 @@ bool LibavInput::is_live() const {
     return context_->pb == nullptr || (context_->pb->seekable & AVIO_SEEKABLE_NORMAL) == 0;
 }
 
+std::int64_t LibavInput::stated_end() const {
+    if (context_->duration_estimation_method != AVFMT_DURATION_FROM_STREAM ||
+        context_->duration <= 0) {
+        return 0;
+    }
+    return av_rescale_q(context_->duration, AV_TIME_BASE_Q, video_->time_base);
+}
+
 std::string LibavInput::left_out() const {
     std::map<std::string, int> kinds;
     for (unsigned i = 0; i < context_->nb_streams; ++i) {
@@ -210,7 +218,7 @@ void LibavInput::note_time(const AVPacket& packet) {
     const std::int64_t start = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
     if (start != AV_NOPTS_VALUE) {
         const AVRational base = context_->streams[packet.stream_index]->time_base;
-        const std::int64_t end = start + packet.duration;
+        const std::int64_t end = av_sat_add64(start, packet.duration);
         end_ = std::max(end_, av_rescale_q(end, base, AV_TIME_BASE_Q));
     }
 }
@@ -223,9 +231,8 @@ void LibavInput::note_end(int result) {
     }
     if (result != AVERROR_EOF) {
         cut_ = libav_error(result);
-    } else if (has_no_more_bytes() &&
-               context_->duration_estimation_method == AVFMT_DURATION_FROM_STREAM &&
-               end_ + kEndTolerance < context_->duration) {
+    } else if (has_no_more_bytes() && stated_end() > 0 &&
+               end_ < context_->duration - kEndTolerance) {
         cut_ = "by its header it is longer";
     }
 }

@@ -36,6 +36,9 @@ public:
     // Whether pictures come when somebody makes them: from a device, a pipe, a live address.
     bool is_live() const;
 
+    // The end that a file states, in the time base of the video; 0 where none does.
+    std::int64_t stated_end() const;
+
     // Which streams are left out, as part of a note; empty for none.
     std::string left_out() const;
 

@@ -144,7 +144,9 @@ std::optional<std::int64_t> LibavSource::frames_left() const {
         const double seconds = stream.duration > 0
                                    ? static_cast<double>(stream.duration) * av_q2d(stream.time_base)
                                    : static_cast<double>(input_.context()->duration) / AV_TIME_BASE;
-        frames = std::llround(seconds * frame_rate_->per_second());
+        // A file may state any duration.
+        constexpr double kMost = 1e15;
+        frames = std::llround(std::min(kMost, seconds * frame_rate_->per_second()));
     }
     return frames > frames_read_ ? std::optional(frames - frames_read_) : std::nullopt;
 }
@@ -172,6 +174,12 @@ bool LibavSource::read(unsigned char* sample) {
     const std::int64_t stated = frame_->best_effort_timestamp;
     time_ = clock_->next(stated == AV_NOPTS_VALUE ? std::nullopt : std::optional(stated),
                          frame_->pkt_duration);
+    // Ticks are coarse in some files: the last picture ends where the file says it does.
+    const std::int64_t end = time_.start + time_.duration;
+    const std::int64_t stated_end = input_.stated_end();
+    if (stated_end > time_.start && (stated_end == end - 1 || stated_end == end + 1)) {
+        time_.duration = stated_end - time_.start;
+    }
     ++frames_read_;
     return true;
 }

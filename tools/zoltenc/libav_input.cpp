@@ -17,7 +17,7 @@ bool names_address(const std::string& input) {
 std::unique_ptr<FrameSource> open_libav_source(const Options& options,
                                                std::optional<ByteReader> bytes) {
     libav_prepare(options.verbose);
-    const bool with_side_streams = writes_container(options);
+    const bool with_side_streams = writes_container(options) && options.copy_streams;
     if (bytes) {
         return std::make_unique<LibavSource>(std::move(*bytes), with_side_streams);
     }

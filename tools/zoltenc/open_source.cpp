@@ -41,8 +41,10 @@ std::unique_ptr<FrameSource> open_input(const Options& options) {
     return open_libav_source(options, std::move(input));
 }
 
+// Pictures are padded where the output tells players what to show of them.
 Fit chosen_fit(const Options& options) {
-    return options.fit.value_or(writes_container(options) ? Fit::pad : Fit::crop);
+    const bool tells_size = writes_container(options) && !options.plain_headers;
+    return options.fit.value_or(tells_size ? Fit::pad : Fit::crop);
 }
 
 std::unique_ptr<FrameSource> fitted(std::unique_ptr<FrameSource> source, Fit fit) {
