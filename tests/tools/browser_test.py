@@ -76,8 +76,9 @@ class BrowserVideo(BrowserTest):
             (318, 234, []),
             (320, 240, ["-colorspace", "bt709", "-color_primaries", "bt709", "-color_trc", "bt709",
                         "-color_range", "tv"]),
-            (320, 240, ["-colorspace", "smpte170m", "-color_primaries", "smpte170m", "-color_trc",
-                        "smpte170m", "-color_range", "pc"]),
+            (320, 240, ["-colorspace", "bt470bg", "-color_range", "pc"]),
+            (320, 240, ["-colorspace", "bt709"]),
+            (320, 240, ["-color_range", "pc"]),
         ):
             with self.subTest(size=(width, height), colours=colours):
                 name = f"{width}{''.join(colours)}.mp4"
