@@ -22,4 +22,6 @@ check_cxx_source_compiles("
     }
     int main() { avdevice_register_all(); }" ZOLT_LIBAV_LINKS)
 unset(CMAKE_REQUIRED_LIBRARIES)
-set(ZOLT_LIBAV ${ZOLT_LIBAV_LINKS})
+if(ZOLT_LIBAV_LINKS)
+    set(ZOLT_LIBAV ON)
+endif()

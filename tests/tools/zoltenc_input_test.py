@@ -161,7 +161,8 @@ class VideoFiles(InputTest):
                 _, pictures = self.given(name)
                 self.assertEqual([int(picture["time"]) for picture in pictures], expected)
         _, pictures = self.given("uneven.mkv", "--skip", "3", "-n", "4")
-        self.assertEqual([int(p["time"]) for p in pictures], self.times("uneven.mkv")[3:7])
+        first, *_ = times = self.times("uneven.mkv")[3:7]
+        self.assertEqual([int(p["time"]) for p in pictures], [time - first for time in times])
 
     def test_elementary_streams_get_times_at_their_rate(self):
         self.make("in.h264", "-c:v", "libx264", "-bf", "0", "-pix_fmt", "yuv420p")
@@ -208,6 +209,52 @@ class VideoFiles(InputTest):
         starts = [int(picture["time"]) for picture in pictures]
         steps = [later - earlier for earlier, later in zip(starts, starts[1:])]
         self.assertTrue(all(35000 <= step <= 85000 for step in steps), steps)
+
+
+class Traits(InputTest):
+    """What a container tells of the input's pictures."""
+
+    def probed(self, name):
+        output = subprocess.run(
+            [FFPROBE, "-v", "error", "-select_streams", "v:0", "-show_entries",
+             "stream=width,height,sample_aspect_ratio,color_range,color_space,color_transfer,"
+             "color_primaries,nb_read_frames:stream_side_data=rotation:format=duration",
+             "-count_frames", "-of", "json", name],
+            cwd=self.folder, capture_output=True, timeout=120, check=True,
+        ).stdout
+        result = json.loads(output)
+        stream = result["streams"][0]
+        side_data = stream.pop("side_data_list", [])
+        stream["rotation"] = [data["rotation"] for data in side_data if "rotation" in data]
+        stream["duration"] = result["format"]["duration"]
+        return stream
+
+    def test_size_shape_colours_and_duration_are_the_inputs(self):
+        odd = "testsrc=size=51x39:rate=60000/1001:duration=1,setsar=16/11"
+        self.make("odd.mkv", "-c:v", "ffv1", "-pix_fmt", "yuv420p", "-color_range", "pc",
+                  "-colorspace", "bt709", "-color_trc", "bt709", "-color_primaries", "bt709", source=odd)
+        self.make("ten.mkv", "-c:v", "ffv1", "-pix_fmt", "yuv422p10le", "-color_range", "tv",
+                  "-colorspace", "smpte170m")
+        self.make("gray.mkv", "-c:v", "ffv1", "-pix_fmt", "gray", "-color_range", "pc")
+        self.make("up.mp4", "-c:v", "mpeg4")
+        for degrees in ("90", "180", "270"):
+            self.ffmpeg("-i", "up.mp4", "-c", "copy", "-metadata:s:v", "rotate=" + degrees,
+                        f"turned{degrees}.mp4")
+        for name in ("odd.mkv", "ten.mkv", "gray.mkv", "turned90.mp4", "turned180.mp4", "turned270.mp4"):
+            with self.subTest(name=name):
+                self.assert_succeeds(self.zoltenc(name, "-o", "out.mp4", stub=False))
+                self.assertEqual(self.probed("out.mp4"), self.probed(name))
+
+    def test_scaled_pictures_are_shown_in_their_shape(self):
+        self.make("in.mkv", "-c:v", "ffv1", source="testsrc=size=100x50:duration=0.2,setsar=2/1")
+        self.assert_succeeds(self.zoltenc("in.mkv", "-o", "out.mp4", "--fit", "scale", stub=False))
+        stream = self.probed("out.mp4")
+        self.assertEqual((stream["width"], stream["height"]), (96, 48))
+        # 100 x 2 to 50 are 4 to 1, and so are 96 x 2 to 48.
+        self.assertEqual(stream["sample_aspect_ratio"], "2:1")
+        self.assert_succeeds(self.zoltenc("synthetic:1920x1080@25:1", "-o", "out.mp4", "--fit", "scale",
+                                          stub=False))
+        self.assertEqual(self.probed("out.mp4")["sample_aspect_ratio"], "136:135")
 
 
 class BadVideo(InputTest):
