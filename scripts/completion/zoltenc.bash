@@ -36,7 +36,7 @@ _zoltenc() {
         --container) _zolt_words 'h264 mp4 mov mkv flv ts null md5' ;;
         -s | --size) _zolt_words '176x144 352x288 640x360 640x480 854x480 1280x720 1920x1080' ;;
         -r | --fps) _zolt_words '24000/1001 24 25 30000/1001 30 50 60000/1001 60' ;;
-        -b | --bitrate | -g | --keyint | -n | --frames | --skip | --verify) COMPREPLY=() ;;
+        -b | --bitrate | -g | --keyint | -t | --threads | -n | --frames | --skip | --verify) COMPREPLY=() ;;
         *)
             case $cur in
                 -*) _zolt_words "$(_zolt_options "$1")" ;;

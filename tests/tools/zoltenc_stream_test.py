@@ -68,6 +68,13 @@ class Streams(StreamTest):
             self.assertEqual(units[1], bytes.fromhex("48 CE 03 C1 78 80"))
             self.assertEqual([unit[0] & 31 for unit in units[2:]], [5, 1])
 
+    def test_threads_do_not_change_the_stream(self):
+        streams = set()
+        for options in (["-t", "1"], ["-t", "2"], ["--threads", "5"], ["-t", "256"], []):
+            self.encode("synthetic:208x176@30:20", "-o", "out.264", "-g", "7", *options)
+            streams.add(self.read("out.264"))
+        self.assertEqual(len(streams), 1)
+
     def test_files_pipes_and_runs_give_the_same_stream(self):
         self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=25:duration=1", "-pix_fmt",
                     "yuv420p", "in.y4m")

@@ -35,6 +35,8 @@ class Usage(ToolTest):
             (["-b", "fast"], "--bitrate", "0 to 4000"),
             (["-b", "200.5"], "--bitrate", "0 to 4000"),
             (["-g", "0"], "--keyint", "from 1"),
+            (["-t", "0"], "--threads", "1 to 256"),
+            (["-t", "257"], "--threads", "1 to 256"),
             (["-g", "-30"], "--keyint", "from 1"),
             (["-g", "99999999999"], "--keyint", "from 1"),
             (["-n", "0"], "--frames", "from 1"),

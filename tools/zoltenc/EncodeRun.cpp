@@ -7,6 +7,7 @@
 #include "io/SyntheticSource.h"
 #include "io/ToolError.h"
 #include "io/os.h"
+#include "io/thread_runner.h"
 #include "media/IConfigVideoAvc.h"
 #include "zoltenc/EncoderLibrary.h"
 #include "zoltenc/EncoderSession.h"
@@ -79,7 +80,7 @@ void EncodeRun::encode() {
     const EncoderLibrary library(
         options_.plugin.empty() ? os_program_directory() + ZOLT_ENCODER_LIBRARY : options_.plugin);
     EncoderSession session(library, source_->format(), frame_rate_,
-                           {pass_.bit_rate_kbs, options_.key_frame_interval}, consumer_);
+                           {pass_.bit_rate_kbs, options_.key_frame_interval, threads()}, consumer_);
     describe(library);
     begin_summary(library);
 
@@ -163,6 +164,14 @@ void EncodeRun::check_outputs() const {
 void EncodeRun::skip_frames() {
     std::vector<unsigned char> picture(source_->format().sample_bytes());
     for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture.data()); ++frame) {}
+}
+
+// Two rows of macroblocks or more for each thread; what another one would do is too little.
+int EncodeRun::threads() const {
+    constexpr int kMacroblock = 16;
+    constexpr int kRowsOfAThread = 2;
+    const int rows = source_->format().height / kMacroblock;
+    return options_.threads.value_or(std::clamp(rows / kRowsOfAThread, 1, processor_count()));
 }
 
 void EncodeRun::choose_frame_rate() {

@@ -1,6 +1,7 @@
 #include "zoltenc/EncoderSession.h"
 
 #include "io/ToolError.h"
+#include "io/thread_runner.h"
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
 #include "media/MediaType.h"
@@ -14,12 +15,14 @@ EncoderSession::EncoderSession(const EncoderLibrary& library, const PictureForma
     : consumer_(consumer),
       input_config_(format, frame_rate),
       stream_config_(MediaType::kVideoUncompressed, &input_config_),
+      runner_(settings.threads > 1 ? make_thread_runner(settings.threads) : nullptr),
       encoder_(library.new_encoder()) {
     // The settings of a video encoder are IVideoEncSettings. Set before the encoder knows its
     // input, they cost no rebuild.
     auto* const video_settings = static_cast<IVideoEncSettings*>(encoder_->GetEncSettings());
     video_settings->SetBitRateKbs(settings.bit_rate_kbs);
     video_settings->SetKeyFrameInt(settings.key_frame_interval);
+    video_settings->SetParallelRunner(runner_.get());
     if (encoder_->Connect(&consumer_) != 0 || encoder_->PutStreamConfig(&stream_config_) != 0) {
         fail("the encoder refuses the input");
     }

@@ -13,6 +13,7 @@
 #include "zoltenc/SinkConsumer.h"
 
 class IMediaEncoder;
+class IParallelRunner;
 
 namespace zolt {
 
@@ -23,6 +24,7 @@ public:
     struct Settings {
         int bit_rate_kbs;        // 0: no rate control
         int key_frame_interval;  // frames
+        int threads;             // to code a picture on, from 1
     };
 
     // `library` and `consumer` are the caller's and outlive the session.
@@ -59,6 +61,7 @@ private:
     InputConfig input_config_;
     MediaStreamConfig stream_config_;
     MediaSample sample_;
+    std::shared_ptr<IParallelRunner> runner_;  // null: this thread alone
     std::unique_ptr<IMediaEncoder, Delete> encoder_;
 };
 

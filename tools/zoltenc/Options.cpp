@@ -18,6 +18,7 @@ namespace {
 
 constexpr const char* kDemonstrationOutput = "out.264";
 constexpr FrameRate kMaxFrameRate{1000, 1};
+constexpr int kMaxThreads = 256;
 constexpr int kMaxCount = std::numeric_limits<std::int32_t>::max();
 
 // Refuses what is not a whole number of `low`..`high`.
@@ -216,6 +217,11 @@ void add_options(CLI::App& app, Options& options, OptionTexts& texts) {
         ->check(whole_number(1, kMaxCount))
         ->type_name("N")
         ->capture_default_str();
+    app.add_option("-t,--threads", options.threads,
+                   "Threads to code each picture on (otherwise as many as there are processors and "
+                   "help); the stream is the same")
+        ->check(whole_number(1, kMaxThreads))
+        ->type_name("N");
     app.add_option("-r,--fps", texts.fps, "Frame rate where the input states none (otherwise 30)")
         ->type_name("FPS");
     app.add_option("-s,--size", texts.size, "Picture size of raw input")->type_name("WxH");

@@ -26,6 +26,7 @@ struct Options {
 
     int bit_rate_kbs = 200;  // 0: no rate control
     int key_frame_interval = 30;
+    std::optional<int> threads;               // to code a picture on; nothing: as many as help
     std::optional<FrameRate> frame_rate;      // for an input that states none
     std::optional<PictureFormat> raw_format;  // of raw input, when its size was given
     std::optional<std::int64_t> frames;       // most frames to code
