@@ -65,17 +65,19 @@ class ToolTest(unittest.TestCase):
     def files(self):
         return sorted(entry.name for entry in self.folder.iterdir())
 
-    def zoltenc(self, *arguments, stub=True, stub_does="", stdin=b"", environment=None):
-        """Runs to the end; the result has returncode, stdout (bytes) and stderr (text)."""
+    def zoltenc(self, *arguments, stub=True, stub_does="", stdin=b"", environment=None,
+                stdout=subprocess.PIPE, before=restore_sigpipe):
+        """Runs to the end; the result has returncode, stdout (bytes) and stderr (text). `before` is
+        called in the new process."""
         command = [*ZOLTENC, *(["--plugin", STUB_ENCODER] if stub else []), *arguments]
         result = subprocess.run(
             command,
             cwd=self.folder,
             input=stdin,
-            stdout=subprocess.PIPE,
+            stdout=stdout,
             stderr=subprocess.PIPE,
             env={**ENVIRONMENT, "ZOLT_STUB": stub_does, **(environment or {})},
-            preexec_fn=restore_sigpipe,
+            preexec_fn=before,
             timeout=120,
             check=False,
         )

@@ -143,8 +143,9 @@ void add_output_options(CLI::App& app, Options& options, OptionTexts& texts) {
     app.add_flag("--rewrite-headers", options.rewrite_headers,
                  "Write parameter sets for players in an elementary stream too")
         ->excludes(plain);
-    app.add_flag("!--no-copy", options.copy_streams,
-                 "Leave out the input's audio and subtitles, which a container takes over");
+    app.add_flag_callback(
+        "--no-copy", [&options] { options.copy_streams = false; },
+        "Leave out the input's audio and subtitles, which a container takes over");
     app.add_flag("--realtime", options.realtime, "Code pictures at their times, like a camera");
     app.add_option("--verify", options.verify,
                    "Fail unless the elementary stream has this digest (--container md5)")

@@ -91,6 +91,10 @@ const OutputFormat& OutputFormat::of(const std::string& output) {
     if (const Address* const address = find_address(output)) {
         return *find_format(address->format);
     }
+    if (output.find("://") != std::string::npos) {
+        throw UsageError(output + ": is no address that is written to; those that are begin with " +
+                         "udp: srt: rtmp:");
+    }
     const std::string ending = output == "-" ? "" : ending_of(output);
     for (const OutputFormat& format : kFormats) {
         if (!ending.empty() && has_ending(format, ending)) {
