@@ -1,8 +1,9 @@
 #include <algorithm>
 #include <cstdlib>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/bitops.h"
+#include "encoder/errors.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -215,26 +216,26 @@ int predicted_count(const std::uint8_t* counts, std::ptrdiff_t stride, bool left
     return left && up ? (n_a + n_b + 1) >> 1 : n_a + n_b;
 }
 
-// Collects codes, so that the NAL buffer is written to once for several of them.
+// Collects codes, so that the buffer is written to once for several of them.
 class CodeGroup {
 public:
-    explicit CodeGroup(CEncoder& encoder) : m_encoder(encoder) {}
+    explicit CodeGroup(BitWriter& bits) : m_bits(bits) {}
 
     void put(std::uint32_t code, int length) {
-        if (m_length + length > CEncoder::kMaxWrite) {
+        if (m_length + length > BitWriter::kMaxWrite) {
             flush();
         }
         m_codes = m_codes << length | code;
         m_length += length;
     }
     void flush() {
-        m_encoder.write_bits(m_codes, m_length);
+        m_bits.write_bits(m_codes, m_length);
         m_codes = 0;
         m_length = 0;
     }
 
 private:
-    CEncoder& m_encoder;
+    BitWriter& m_bits;
     std::uint64_t m_codes = 0;
     int m_length = 0;
 };
@@ -249,21 +250,21 @@ unsigned nonzero_mask(const std::int16_t* levels, int count) {
 
 }  // namespace
 
-void CEncoder::writeMBSyntax() {
-    write_uvlc_unsigned(static_cast<unsigned>(g_mb_type));
+void MacroblockCoder::writeMBSyntax() {
+    bits->write_uvlc_unsigned(static_cast<unsigned>(g_mb_type));
     if (g_cur_mb_mode == MB_INTRA4x4) {
         encode_I4Modes();
     }
-    write_uvlc_unsigned(g_chroma_mode);
+    bits->write_uvlc_unsigned(g_chroma_mode);
     encode_coded_blocks();
 }
 
-void CEncoder::writeMBSyntax_P() {
+void MacroblockCoder::writeMBSyntax_P() {
     if (encode_mb_skip()) {
         return;
     }
     if (g_cur_mb_mode == MB_P16x16) {
-        write_uvlc_unsigned(static_cast<unsigned>(g_mb_type));
+        bits->write_uvlc_unsigned(static_cast<unsigned>(g_mb_type));
         encode_MB_Pred_P();
         encode_coded_blocks();
     } else {
@@ -271,54 +272,60 @@ void CEncoder::writeMBSyntax_P() {
     }
 }
 
-// Counts a skipped macroblock and returns true, or writes the mb_skip_run before a coded one.
-bool CEncoder::encode_mb_skip() {
+// Counts a skipped macroblock and returns true, or writes the mb_skip_run before a coded one, which
+// the first of a row may have to leave to the appending of its bits.
+bool MacroblockCoder::encode_mb_skip() {
     if (g_skip_flag) {
         ++g_skip_run;
         return true;
     }
-    write_uvlc_unsigned(static_cast<unsigned>(g_skip_run));
+    if (keep_first_run && first_run < 0) {
+        first_run = g_skip_run;
+    } else {
+        bits->write_uvlc_unsigned(static_cast<unsigned>(g_skip_run));
+    }
     g_skip_run = 0;
     return false;
 }
 
-void CEncoder::encode_I4Modes() {
+void MacroblockCoder::encode_I4Modes() {
     for (int k = 0; k < 16; ++k) {
         if (g_prev_intra4x4_pred_mode_flag[k]) {
-            write_bits(1, 1);
+            bits->write_bits(1, 1);
         } else {
-            write_bits(g_rem_intra4x4_pred_mode[k], 4);  // a flag of 0 and three bits
+            bits->write_bits(g_rem_intra4x4_pred_mode[k], 4);  // a flag of 0 and three bits
         }
     }
 }
 
 // mb_pred() of P_L0_16x16: with one active reference no ref_idx_l0 is sent.
-void CEncoder::encode_MB_Pred_P() {
-    if (g_num_ref_active > 1) {
+void MacroblockCoder::encode_MB_Pred_P() {
+    if (picture.g_num_ref_active > 1) {
         exitOnError("Unsupported Macroblock type in encode_MB_Pred_P\n", 107);
     }
-    write_uvlc_signed(g_mvd_x);
-    write_uvlc_signed(g_mvd_y);
+    bits->write_uvlc_signed(g_mvd_x);
+    bits->write_uvlc_signed(g_mvd_y);
 }
 
 // coded_block_pattern, mb_qp_delta and residual(), as far as the macroblock has them.
-void CEncoder::encode_coded_blocks() {
+void MacroblockCoder::encode_coded_blocks() {
     if (g_cur_mb_mode != MB_INTRA16x16) {
         encode_CBP();
         if (g_coded_block_pattern == 0) {
             return;
         }
     }
-    write_uvlc_signed(0);  // mb_qp_delta: a picture has one QP
+    bits->write_uvlc_signed(0);  // mb_qp_delta: a picture has one QP
     encodeBlock();
 }
 
-void CEncoder::encode_CBP() {
-    write_uvlc_unsigned(cbp_map.code[g_coded_block_pattern][g_cur_mb_mode == MB_INTRA4x4 ? 0 : 1]);
+void MacroblockCoder::encode_CBP() {
+    bits->write_uvlc_unsigned(
+        cbp_map.code[g_coded_block_pattern][g_cur_mb_mode == MB_INTRA4x4 ? 0 : 1]);
 }
 
 // residual(), clause 7.3.5.3.
-void CEncoder::encodeBlock() {
+void MacroblockCoder::encodeBlock() {
     encode_luma_blocks();
     const int chroma = g_coded_block_pattern >> 4;
     if (chroma != 0) {
@@ -334,11 +341,11 @@ void CEncoder::encodeBlock() {
     }
 }
 
-void CEncoder::encode_luma_blocks() {
-    std::uint8_t* counts = g_cnum_l + first_block();
+void MacroblockCoder::encode_luma_blocks() {
+    std::uint8_t* counts = picture.g_cnum_l + first_block();
     const bool intra16x16 = g_cur_mb_mode == MB_INTRA16x16;
     if (intra16x16) {
-        const int nC = predicted_count(counts, g_blk_width, g_mb_left, g_mb_up);
+        const int nC = predicted_count(counts, picture.g_blk_width, g_mb_left, g_mb_up);
         encodeCAVLCBlock4x4(g_luma_dc, nonzero_mask(g_luma_dc, 16), 16, coeff_token_table(nC));
     }
     const int first = intra16x16 ? 1 : 0;  // the DC levels have been sent
@@ -347,9 +354,9 @@ void CEncoder::encode_luma_blocks() {
         for (int k = start; k < start + 4; ++k) {
             const int i = zolt::luma_scan_i[k];
             const int j = zolt::luma_scan_j[k];
-            std::uint8_t* count = counts + j * g_blk_width + i;
+            std::uint8_t* count = counts + j * picture.g_blk_width + i;
             const int nC =
-                predicted_count(count, g_blk_width, i > 0 || g_mb_left, j > 0 || g_mb_up);
+                predicted_count(count, picture.g_blk_width, i > 0 || g_mb_left, j > 0 || g_mb_up);
             const unsigned nonzero = (g_luma_mask >> k & 1) ? g_nonzero[k] >> first : 0u;
             *count = encodeCAVLCBlock4x4(g_scan_levels + 16 * k + first, nonzero, 16 - first,
                                          coeff_token_table(nC));
@@ -357,9 +364,9 @@ void CEncoder::encode_luma_blocks() {
     }
 }
 
-void CEncoder::encode_chroma_ac_blocks(int component) {
-    const std::ptrdiff_t stride = g_blk_width / 2;
-    std::uint8_t* counts = (component == 0 ? g_cnum_u : g_cnum_v) +
+void MacroblockCoder::encode_chroma_ac_blocks(int component) {
+    const std::ptrdiff_t stride = picture.g_blk_width / 2;
+    std::uint8_t* counts = (component == 0 ? picture.g_cnum_u : picture.g_cnum_v) +
                            static_cast<std::ptrdiff_t>(2 * g_mb_y) * stride + 2 * g_mb_x;
     for (int b = 0; b < 4; ++b) {
         const int i = b & 1;
@@ -375,8 +382,8 @@ void CEncoder::encode_chroma_ac_blocks(int component) {
 // residual_block_cavlc(), clauses 7.3.5.3.2 and 9.2: count levels in scan order, of which those in
 // the mask are not 0; returns the number of these. Longer than most functions because it is one
 // syntax structure.
-std::uint8_t CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count,
-                                           int table) {
+std::uint8_t MacroblockCoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero,
+                                                  int count, int table) {
     // Levels that are not 0 and the zeros in front of each, from the highest frequency down.
     int level[16];
     int run[16];
@@ -400,7 +407,7 @@ std::uint8_t CEncoder::encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned 
         ++trailing_ones;
     }
 
-    CodeGroup codes(*this);
+    CodeGroup codes(*bits);
     if (table == kChromaDcTable) {
         codes.put(chroma_dc_token_bits[total][trailing_ones],
                   chroma_dc_token_length[total][trailing_ones]);

@@ -2,8 +2,10 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/bitops.h"
+#include "encoder/errors.h"
+#include "encoder/idle.h"
 
 namespace {
 
@@ -131,7 +133,7 @@ constexpr int kFractions = 8;
 // candidate has a distortion below kGoodSad.
 class MotionSearch {
 public:
-    explicit MotionSearch(CEncoder& encoder);
+    explicit MotionSearch(MacroblockCoder& coder);
     void integer_stage(_mv& result);
     void half_stage(_mv& result);
     void quarter_stage(_mv& result);
@@ -171,11 +173,12 @@ private:
         }
     };
 
-    const std::uint8_t* sample(const CEncoder::plane_offset_t& s) const {
+    const std::uint8_t* sample(const Picture::plane_offset_t& s) const {
         return m_planes[s.plane] + s.offset;
     }
 
-    CEncoder& m_encoder;
+    MacroblockCoder& m_coder;
+    Picture& m_picture;
     const zolt::Kernels& m_kernels;
     const std::ptrdiff_t m_stride;
     const int m_px, m_py;       // the macroblock's position, samples
@@ -193,7 +196,7 @@ private:
 
 }  // namespace
 
-void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel) {
+void Picture::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t subpel) {
     g_search_range = range;
     g_search_method = method;
     g_subpel_enable = subpel;
@@ -216,49 +219,60 @@ void CEncoder::initDiamond(std::uint8_t range, std::uint8_t method, std::uint8_t
     }
 }
 
-// Prepares the reference for the macroblocks of a P picture.
-void CEncoder::framePredInitP() {
+void Picture::framePredInitP() {
     g_kernels->extend_edges(g_ref_y, g_width16, g_height16, g_stride_luma, g_pad_luma);
     g_kernels->extend_edges(g_ref_u, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
     g_kernels->extend_edges(g_ref_v, g_cwidth, g_cheight, g_stride_chroma, g_pad_chroma);
-    g_half_rows_end = -g_pad_luma;
+    g_half_rows_end.store(-g_pad_luma, std::memory_order_relaxed);
 }
 
-// Builds the rows of the half-sample planes above picture row `end`, as far as they are not there
-// yet: refinement asks for them when it needs them, so that they are still in the cache when it
-// reads them. The centre plane is filtered from the rounded samples of the vertical one: an
-// approximation that only the search reads.
-void CEncoder::make_half_pixel_sds(int end) {
+// Refinement asks for rows when it needs them, so that they are still in the cache when it reads
+// them.
+void Picture::make_half_pixel_sds(int end) {
+    zolt::Idle idle;
+    while (g_half_rows_end.load(std::memory_order_acquire) < end) {
+        if (g_half_rows_busy.exchange(true, std::memory_order_acquire)) {
+            idle.wait();
+            continue;
+        }
+        build_half_rows(end);
+        g_half_rows_busy.store(false, std::memory_order_release);
+    }
+}
+
+// Builds rows up to `end`, unless others have been faster. The centre plane is filtered from the
+// rounded samples of the vertical one: an approximation that only the search reads.
+void Picture::build_half_rows(int end) {
     constexpr int kMargin = 3;  // outermost rows and columns, which lack a filter tap
     const int count = g_stride_luma - 2 * kMargin;
-    g_half_rows_end = std::max(g_half_rows_end, kMargin - g_pad_luma);
-    for (; g_half_rows_end < end; ++g_half_rows_end) {
-        const std::ptrdiff_t row =
-            static_cast<std::ptrdiff_t>(g_half_rows_end) * g_stride_luma - g_pad_luma;
+    int y = std::max(g_half_rows_end.load(std::memory_order_relaxed), kMargin - g_pad_luma);
+    for (; y < end; ++y) {
+        const std::ptrdiff_t row = static_cast<std::ptrdiff_t>(y) * g_stride_luma - g_pad_luma;
         const std::ptrdiff_t inner = row + kMargin;
         g_kernels->half_vertical_row(g_ref_y + row, g_stride_luma, g_half_v_L0 + row,
                                      g_stride_luma);
         g_kernels->half_horizontal_row(g_ref_y + inner, g_half_h_L0 + inner, count);
         g_kernels->half_horizontal_row(g_half_v_L0 + inner, g_half_hv_L0 + inner, count);
     }
+    g_half_rows_end.store(y, std::memory_order_release);
 }
 
 // Motion search of the current macroblock: integer, half and quarter pels.
-void CEncoder::generateMBPred() {
+void MacroblockCoder::generateMBPred() {
     form_mv_prediction(&g_pmv_x, &g_pmv_y, 0, 0, 0, 16, 16);
     if (++g_visit_stamp == 0) {
         std::memset(g_visit_L0, 0,
-                    sizeof *g_visit_L0 * static_cast<std::size_t>(g_visit_dim) *
-                        static_cast<std::size_t>(g_visit_dim));
+                    sizeof *g_visit_L0 * static_cast<std::size_t>(picture.g_visit_dim) *
+                        static_cast<std::size_t>(picture.g_visit_dim));
         g_visit_stamp = 1;
     }
     MotionSearch search(*this);
-    _mv& result = g_mv_array[g_mapMBNumber];
+    _mv& result = picture.g_mv_array[g_mapMBNumber];
     search.integer_stage(result);
-    g_me_mb_L0[g_mapMBNumber] = result;
-    if (g_subpel_enable) {
+    picture.g_me_mb_L0[g_mapMBNumber] = result;
+    if (picture.g_subpel_enable) {
         // The block, and the row below it that fractions reach.
-        make_half_pixel_sds(16 * g_mb_y + result.y + 17);
+        picture.make_half_pixel_sds(16 * g_mb_y + result.y + 17);
         search.half_stage(result);
         search.quarter_stage(result);
     }
@@ -266,17 +280,18 @@ void CEncoder::generateMBPred() {
 
 namespace {
 
-MotionSearch::MotionSearch(CEncoder& encoder)
-    : m_encoder(encoder),
-      m_kernels(*encoder.g_kernels),
-      m_stride(encoder.g_stride_luma),
-      m_px(16 * encoder.g_mb_x),
-      m_py(16 * encoder.g_mb_y),
-      m_pmv{encoder.g_pmv_x, encoder.g_pmv_y},
-      m_lambda(encoder.g_sad_lambda),
-      m_ref(encoder.g_ref_y + m_py * m_stride + m_px),
-      m_visited(encoder.g_visit_L0 + encoder.g_visit_dim / 2 * (encoder.g_visit_dim + 1)) {
-    m_kernels.arrange_block(encoder.g_mb_src_y, m_stride, m_block);
+MotionSearch::MotionSearch(MacroblockCoder& coder)
+    : m_coder(coder),
+      m_picture(coder.picture),
+      m_kernels(*coder.g_kernels),
+      m_stride(m_picture.g_stride_luma),
+      m_px(16 * coder.g_mb_x),
+      m_py(16 * coder.g_mb_y),
+      m_pmv{coder.g_pmv_x, coder.g_pmv_y},
+      m_lambda(coder.g_sad_lambda),
+      m_ref(m_picture.g_ref_y + m_py * m_stride + m_px),
+      m_visited(coder.g_visit_L0 + m_picture.g_visit_dim / 2 * (m_picture.g_visit_dim + 1)) {
+    m_kernels.arrange_block(coder.g_mb_src_y, m_stride, m_block);
 }
 
 // Subsampled diamond search at integer pels.
@@ -291,20 +306,20 @@ void MotionSearch::integer_stage(_mv& result) {
 }
 
 void MotionSearch::search_integer_vectors() {
-    const int mb_width = m_encoder.g_mb_width;
-    const int range = m_encoder.g_search_range;
-    const int mb_x = m_encoder.g_mb_x;
-    const int mb_y = m_encoder.g_mb_y;
+    const int mb_width = m_picture.g_mb_width;
+    const int range = m_picture.g_search_range;
+    const int mb_x = m_coder.g_mb_x;
+    const int mb_y = m_coder.g_mb_y;
     const _mv none = {};
-    const _mv* record = m_encoder.g_me_mb_L0 + m_encoder.g_mapMBNumber;
+    const _mv* record = m_picture.g_me_mb_L0 + m_coder.g_mapMBNumber;
     const _mv& top = mb_y > 0 ? record[-mb_width] : none;
     const _mv& left = mb_x > 0 ? record[-1] : none;
     const _mv& top_right = mb_y > 0 && mb_x < mb_width - 1 ? record[1 - mb_width] : none;
 
-    const Vector predictor = {std::clamp((m_encoder.g_pmv_x + 2) >> 2, -range, range),
-                              std::clamp((m_encoder.g_pmv_y + 2) >> 2, -range, range)};
-    const Range window_x = vector_range(m_px, m_encoder.g_width16, predictor.x, range);
-    const Range window_y = vector_range(m_py, m_encoder.g_height16, predictor.y, range);
+    const Vector predictor = {std::clamp((m_coder.g_pmv_x + 2) >> 2, -range, range),
+                              std::clamp((m_coder.g_pmv_y + 2) >> 2, -range, range)};
+    const Range window_x = vector_range(m_px, m_picture.g_width16, predictor.x, range);
+    const Range window_y = vector_range(m_py, m_picture.g_height16, predictor.y, range);
     Vector group[kGroup];
     int count = 0;
     const auto add = [&](Vector v) {
@@ -347,7 +362,7 @@ void MotionSearch::search_integer_vectors() {
 
 // Square spiral around the zero vector, not clipped to the window. Returns true at an early end.
 bool MotionSearch::walk_spiral() {
-    const int range = m_encoder.g_search_range;
+    const int range = m_picture.g_search_range;
     Vector v = {0, 0};
     int step = kSpiralStep;
     Vector group[kGroup];
@@ -374,9 +389,9 @@ bool MotionSearch::walk_spiral() {
 // Small diamonds around the best vector until it stays or leaves the bounds. Returns true at an
 // early end.
 bool MotionSearch::walk_diamond() {
-    const int range = m_encoder.g_search_range;
-    const Range bounds_x = vector_range(m_px, m_encoder.g_width16, m_best.x, range);
-    const Range bounds_y = vector_range(m_py, m_encoder.g_height16, m_best.y, range);
+    const int range = m_picture.g_search_range;
+    const Range bounds_x = vector_range(m_px, m_picture.g_width16, m_best.x, range);
+    const Range bounds_y = vector_range(m_py, m_picture.g_height16, m_best.y, range);
     Vector centre;
     do {
         centre = m_best;
@@ -394,9 +409,9 @@ bool MotionSearch::walk_diamond() {
 
 // Marks a vector as visited; returns false when it already was.
 bool MotionSearch::first_visit(Vector v) {
-    std::uint32_t& stamp = m_visited[v.x * m_encoder.g_visit_dim + v.y];
-    const bool first = stamp != m_encoder.g_visit_stamp;
-    stamp = m_encoder.g_visit_stamp;
+    std::uint32_t& stamp = m_visited[v.x * m_picture.g_visit_dim + v.y];
+    const bool first = stamp != m_coder.g_visit_stamp;
+    stamp = m_coder.g_visit_stamp;
     return first;
 }
 
@@ -467,7 +482,7 @@ void MotionSearch::quarter_stage(_mv& result) {
     const Vector half = {result.dx, result.dy};
     const int kind = std::abs(half.x) / 2 + std::abs(half.y);
     if (kind > 3) {
-        CEncoder::exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
+        exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
     }
     set_planes((m_best.y - (half.y < 0 ? 1 : 0)) * m_stride + m_best.x - (half.x < 0 ? 1 : 0));
     const Fractions candidates(*this, kQuarterCandidates, 4 * m_best.x + half.x,
@@ -476,7 +491,7 @@ void MotionSearch::quarter_stage(_mv& result) {
     const std::uint8_t* centre = m_planes[kResultPlane[kind]];
     const std::uint8_t* refs[kFractions];
     for (int n = 0; n < (cross ? 4 : kFractions); ++n) {
-        refs[n] = sample(m_encoder.g_quarter_samples[kind][n]);
+        refs[n] = sample(m_picture.g_quarter_samples[kind][n]);
     }
     unsigned passed =
         (cross ? m_kernels.first_phases_below_cross : m_kernels.first_phases_below_star)(
@@ -509,10 +524,10 @@ void MotionSearch::record_fraction(_mv& result, Vector fraction) const {
 // Points the planes at the macroblock moved by `position` samples.
 void MotionSearch::set_planes(std::ptrdiff_t position) {
     position += m_py * m_stride + m_px;
-    m_planes[kFull] = m_encoder.g_ref_y + position;
-    m_planes[kVertical] = m_encoder.g_half_v_L0 + position;
-    m_planes[kHorizontal] = m_encoder.g_half_h_L0 + position;
-    m_planes[kCentre] = m_encoder.g_half_hv_L0 + position;
+    m_planes[kFull] = m_picture.g_ref_y + position;
+    m_planes[kVertical] = m_picture.g_half_v_L0 + position;
+    m_planes[kHorizontal] = m_picture.g_half_h_L0 + position;
+    m_planes[kCentre] = m_picture.g_half_hv_L0 + position;
 }
 
 // Makes a candidate the best one if its costs after every phase are below the thresholds and its

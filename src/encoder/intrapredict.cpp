@@ -1,6 +1,7 @@
 #include <cstring>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
+#include "encoder/errors.h"
 #include "kernels/clip.h"
 #include "kernels/predict_4x4.h"
 
@@ -45,9 +46,9 @@ void fill_4x4(std::uint8_t* pred, std::ptrdiff_t stride, int value) {
 
 }  // namespace
 
-void CEncoder::gather_neighbours4(std::uint8_t* neighbours, const std::uint8_t* src,
-                                  std::ptrdiff_t stride, int up, int left, int up_right,
-                                  int up_left) {
+void MacroblockCoder::gather_neighbours4(std::uint8_t* neighbours, const std::uint8_t* src,
+                                         std::ptrdiff_t stride, int up, int left, int up_right,
+                                         int up_left) {
     std::uint8_t* above = neighbours + 5;
     if (left) {
         for (int y = 0; y < 4; ++y) {
@@ -69,15 +70,15 @@ void CEncoder::gather_neighbours4(std::uint8_t* neighbours, const std::uint8_t* 
     }
 }
 
-void CEncoder::ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up, int left,
-                      int mode) {
+void MacroblockCoder::ipred4(std::uint8_t* pred, const std::uint8_t* neighbours, int up, int left,
+                             int mode) {
     if (mode < 0 || mode > 8) {
         exitOnError("Illegal intra prediction mode", kIllegalMode);
     }
     zolt::predict_4x4(pred, neighbours, ipred4_dc(neighbours, up, left), mode);
 }
 
-int CEncoder::ipred4_dc(const std::uint8_t* neighbours, int up, int left) {
+int MacroblockCoder::ipred4_dc(const std::uint8_t* neighbours, int up, int left) {
     const int above_sum = up ? sum(neighbours + 5, 1, 4) : 0;
     const int left_sum = left ? sum(neighbours, 1, 4) : 0;
     return up && left   ? (above_sum + left_sum + 4) >> 3
@@ -85,8 +86,8 @@ int CEncoder::ipred4_dc(const std::uint8_t* neighbours, int up, int left) {
                         : 128;
 }
 
-void CEncoder::ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
-                       int left, int mode) {
+void MacroblockCoder::ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride,
+                              int up, int left, int mode) {
     const std::uint8_t* above = src - stride;
     const bool possible =
         (mode == 0 && up) || (mode == 1 && left) || mode == 2 || (mode == 3 && up && left);
@@ -123,8 +124,8 @@ void CEncoder::ipred16(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff
     }
 }
 
-void CEncoder::ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride, int up,
-                       int left, int mode) {
+void MacroblockCoder::ipred_c(std::uint8_t* pred, const std::uint8_t* src, std::ptrdiff_t stride,
+                              int up, int left, int mode) {
     const std::uint8_t* above = src - stride;
     switch (mode) {
         case 0: {  // DC, clauses 8.3.4.1 to 8.3.4.3

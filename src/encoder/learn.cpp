@@ -1,6 +1,6 @@
 #include <algorithm>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -189,7 +189,7 @@ struct Candidates {
 
 // Inter (non-zero) or intra (0) for a macroblock of a P picture, from its source samples and the
 // prediction error of its inter prediction in g_mb_pred.
-int CEncoder::setLearnPIMode() {
+int MacroblockCoder::setLearnPIMode() {
     compute_block_features();
     std::int32_t residual[16];
     g_kernels->block_sums(g_mb_pred, 16, residual);
@@ -199,27 +199,30 @@ int CEncoder::setLearnPIMode() {
     std::int32_t energy[4];
     g_kernels->hadamard_energy(residual, energy);
     const int y = energy[0] + energy[1] + energy[2] + energy[3];
-    return decision_treePI(g_mbQp, kThresholds.inter_intra[g_mbQp], g_block_energy[3], y) ? 1 : 0;
+    return decision_treePI(picture.g_mbQp, kThresholds.inter_intra[picture.g_mbQp],
+                           g_block_energy[3], y)
+               ? 1
+               : 0;
 }
 
 // Intra 16x16 (16) or intra 4x4 (4). In P pictures the features are those of setLearnPIMode.
-int CEncoder::learn16_4() {
-    if (g_slp->sliceType == I_SLICE) {
+int MacroblockCoder::learn16_4() {
+    if (picture.g_slp->sliceType == I_SLICE) {
         compute_block_features();
     }
-    return decision_tree16_4(kThresholds.intra16_4[g_mbQp], g_block_energy[1], g_block_energy[2],
-                             g_block_energy[3])
+    return decision_tree16_4(kThresholds.intra16_4[picture.g_mbQp], g_block_energy[1],
+                             g_block_energy[2], g_block_energy[3])
                ? 16
                : 4;
 }
 
-void CEncoder::compute_block_features() {
-    g_kernels->block_sums(g_mb_src_y, g_stride_luma, g_block_sums);
+void MacroblockCoder::compute_block_features() {
+    g_kernels->block_sums(g_mb_src_y, picture.g_stride_luma, g_block_sums);
     g_kernels->hadamard_energy(g_block_sums, g_block_energy);
 }
 
 // Intra 16x16 mode of the macroblock; leaves its prediction in g_mb_pred.
-int CEncoder::learn16_mode() {
+int MacroblockCoder::learn16_mode() {
     alignas(64) std::uint8_t pred[4][256];
     std::int32_t distortion[4][16];
     Candidates<4> candidates;
@@ -227,8 +230,9 @@ int CEncoder::learn16_mode() {
     for (int mode = 0; mode < 4; ++mode) {
         candidates.enabled[mode] = possible[mode];
         if (possible[mode]) {
-            ipred16(pred[mode], g_mb_src_y, g_stride_luma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_sad_16x16(g_mb_src_y, g_stride_luma, pred[mode], distortion[mode]);
+            ipred16(pred[mode], g_mb_src_y, picture.g_stride_luma, g_mb_up, g_mb_left, mode);
+            g_kernels->phase_sad_16x16(g_mb_src_y, picture.g_stride_luma, pred[mode],
+                                       distortion[mode]);
         }
     }
     int best = -1;
@@ -251,7 +255,7 @@ int CEncoder::learn16_mode() {
 }
 
 // Chroma mode of the macroblock; leaves its predictions in g_mb_pred.
-int CEncoder::learn_chroma_mode() {
+int MacroblockCoder::learn_chroma_mode() {
     constexpr int kLastStep = 11;
     alignas(64) std::uint8_t pred[4][128];  // Cb, Cr
     std::int32_t distortion[4][2][16];
@@ -260,10 +264,11 @@ int CEncoder::learn_chroma_mode() {
     for (int mode = 0; mode < 4; ++mode) {
         candidates.enabled[mode] = possible[mode];
         if (possible[mode]) {
-            ipred_c(pred[mode], g_mb_src_u, g_stride_chroma, g_mb_up, g_mb_left, mode);
-            ipred_c(pred[mode] + 64, g_mb_src_v, g_stride_chroma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_satd_8x8(g_mb_src_u, g_stride_chroma, pred[mode], distortion[mode][0]);
-            g_kernels->phase_satd_8x8(g_mb_src_v, g_stride_chroma, pred[mode] + 64,
+            ipred_c(pred[mode], g_mb_src_u, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
+            ipred_c(pred[mode] + 64, g_mb_src_v, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
+            g_kernels->phase_satd_8x8(g_mb_src_u, picture.g_stride_chroma, pred[mode],
+                                      distortion[mode][0]);
+            g_kernels->phase_satd_8x8(g_mb_src_v, picture.g_stride_chroma, pred[mode] + 64,
                                       distortion[mode][1]);
         }
     }
@@ -293,18 +298,18 @@ int CEncoder::learn_chroma_mode() {
 
 // Mode of intra 4x4 block k, whose predicted mode is predicted_mode; leaves its prediction in pred.
 // The elimination takes every step for all modes at once: a mode that was dropped cannot win.
-int CEncoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
+int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
     const std::uint8_t* src =
-        g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
+        g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     const bool up = g_blk_up[k] != 0;
     const bool left = g_blk_left[k] != 0;
     std::uint8_t neighbours[16] = {};  // 13, and room for kernels to read
-    gather_neighbours4(neighbours, src, g_stride_luma, up, left, g_blk_up_right[k],
+    gather_neighbours4(neighbours, src, picture.g_stride_luma, up, left, g_blk_up_right[k],
                        g_blk_up_left[k]);
 
     std::int32_t d[4];
     ipred4(pred, neighbours, up, left, predicted_mode);
-    g_kernels->phase_satd_4x4(src, g_stride_luma, pred, d);
+    g_kernels->phase_satd_4x4(src, picture.g_stride_luma, pred, d);
     const int predicted_cost = d[0] + d[1] + d[2] + d[3];
     if ((!up && !left) || predicted_cost <= 8 * g_intra_lambda + 64) {
         return predicted_mode;
@@ -312,8 +317,8 @@ int CEncoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
 
     alignas(32) std::uint8_t modes[9][16];
     alignas(32) std::int16_t distortion[4][16];
-    g_kernels->intra_4x4_modes(src, g_stride_luma, neighbours, ipred4_dc(neighbours, up, left),
-                               modes[0], distortion[0]);
+    g_kernels->intra_4x4_modes(src, picture.g_stride_luma, neighbours,
+                               ipred4_dc(neighbours, up, left), modes[0], distortion[0]);
     const int share = predicted_cost >> 2;
     const std::int16_t rate = static_cast<std::int16_t>(2 * g_intra_lambda);
     // Sixteen lanes that the compiler can put into vectors; a cost is at most 4 * (2040 + 182).

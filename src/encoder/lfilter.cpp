@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <cstdlib>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -89,21 +89,21 @@ struct EdgeFilters {
 
 // The samples of a macroblock that is being filtered.
 struct Macroblock {
-    const CEncoder& encoder;
+    const Picture& picture;
     const int mb;
     const EdgeParameters luma, chroma;  // of its internal edges
     std::uint8_t* const y;
     std::uint8_t* const u;
     std::uint8_t* const v;
 
-    Macroblock(const CEncoder& e, int address, int mb_x, int mb_y)
-        : encoder(e),
+    Macroblock(const Picture& p, int address, int mb_x, int mb_y)
+        : picture(p),
           mb(address),
-          luma(e.g_mb_qp[address], e.g_lf_data[address]),
-          chroma(zolt::QP_SCALE_CR[e.g_mb_qp[address]], e.g_lf_data[address]),
-          y(e.g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * e.g_stride_luma + 16 * mb_x),
-          u(e.g_cur_u + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x),
-          v(e.g_cur_v + static_cast<std::ptrdiff_t>(8 * mb_y) * e.g_stride_chroma + 8 * mb_x) {}
+          luma(p.g_mb_qp[address], p.g_lf_data[address]),
+          chroma(zolt::QP_SCALE_CR[p.g_mb_qp[address]], p.g_lf_data[address]),
+          y(p.g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * p.g_stride_luma + 16 * mb_x),
+          u(p.g_cur_u + static_cast<std::ptrdiff_t>(8 * mb_y) * p.g_stride_chroma + 8 * mb_x),
+          v(p.g_cur_v + static_cast<std::ptrdiff_t>(8 * mb_y) * p.g_stride_chroma + 8 * mb_x) {}
 
     // One direction's edges by their strengths; neighbour: the macroblock beyond edge 0.
     void filter_edges(const std::uint32_t* strengths, int neighbour,
@@ -118,13 +118,13 @@ struct Macroblock {
 
     void filter_external_edge(std::uint32_t strengths, int neighbour,
                               const EdgeFilters& filters) const {
-        const int qp_q = encoder.g_mb_qp[mb];
-        const int qp_p = encoder.g_mb_qp[neighbour];
+        const int qp_q = picture.g_mb_qp[mb];
+        const int qp_p = picture.g_mb_qp[neighbour];
         if (qp_q == qp_p) {
             filter_external_edge(strengths, luma, chroma, filters);
             return;
         }
-        const lfdata& lf = encoder.g_lf_data[mb];
+        const lfdata& lf = picture.g_lf_data[mb];
         const EdgeParameters mean_luma((qp_q + qp_p + 1) >> 1, lf);
         const EdgeParameters mean_chroma(
             (zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1, lf);
@@ -134,27 +134,27 @@ struct Macroblock {
     void filter_external_edge(std::uint32_t strengths, const EdgeParameters& edge_luma,
                               const EdgeParameters& edge_chroma, const EdgeFilters& filters) const {
         if (strengths == kAllStrong) {
-            filters.luma_strong(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta);
-            filters.chroma_strong(u, v, encoder.g_stride_chroma, edge_chroma.alpha,
+            filters.luma_strong(y, picture.g_stride_luma, edge_luma.alpha, edge_luma.beta);
+            filters.chroma_strong(u, v, picture.g_stride_chroma, edge_chroma.alpha,
                                   edge_chroma.beta);
             return;
         }
-        filters.luma(y, encoder.g_stride_luma, edge_luma.alpha, edge_luma.beta, edge_luma.tc0,
+        filters.luma(y, picture.g_stride_luma, edge_luma.alpha, edge_luma.beta, edge_luma.tc0,
                      strengths);
-        filters.chroma(u, v, encoder.g_stride_chroma, edge_chroma.alpha, edge_chroma.beta,
+        filters.chroma(u, v, picture.g_stride_chroma, edge_chroma.alpha, edge_chroma.beta,
                        edge_chroma.tc0, strengths);
     }
 
     void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
         for (int edge = 1; edge < 4; ++edge) {
             if (strengths[edge] != 0) {
-                filters.luma(y + 4 * edge * filters.luma_step, encoder.g_stride_luma, luma.alpha,
+                filters.luma(y + 4 * edge * filters.luma_step, picture.g_stride_luma, luma.alpha,
                              luma.beta, luma.tc0, strengths[edge]);
             }
         }
         if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
             const std::ptrdiff_t offset = 4 * filters.chroma_step;
-            filters.chroma(u + offset, v + offset, encoder.g_stride_chroma, chroma.alpha,
+            filters.chroma(u + offset, v + offset, picture.g_stride_chroma, chroma.alpha,
                            chroma.beta, chroma.tc0, strengths[2]);
         }
     }
@@ -162,37 +162,31 @@ struct Macroblock {
 
 }  // namespace
 
-// Deblocks one macroblock row of the current picture in place (clause 8.7); rows go from the top.
-void CEncoder::filter_mb_row(int mb_y) {
-    for (int mb_x = 0; mb_x < g_mb_width; ++mb_x) {
-        filter_mb(mb_x, mb_y);
-    }
-}
-
-// Left, internal vertical, top and internal horizontal edges of one macroblock.
-void CEncoder::filter_mb(int mb_x, int mb_y) {
-    const int mb = mb_y * g_mb_width + mb_x;
-    if (g_lf_data[mb].disable_flag) {
+// Left, internal vertical, top and internal horizontal edges of one macroblock of the current
+// picture, in place (clause 8.7).
+void MacroblockCoder::filter_mb(int mb_x, int mb_y) {
+    const int mb = mb_y * picture.g_mb_width + mb_x;
+    if (picture.g_lf_data[mb].disable_flag) {
         return;
     }
     find_edge_strengths(mb_x, mb_y);
     const zolt::Kernels& k = *g_kernels;
-    const Macroblock macroblock(*this, mb, mb_x, mb_y);
+    const Macroblock macroblock(picture, mb, mb_x, mb_y);
     macroblock.filter_edges(bs_ver, mb - 1,
                             {k.deblock_luma_vertical, k.deblock_luma_vertical_strong,
                              k.deblock_chroma_vertical, k.deblock_chroma_vertical_strong, 1, 1});
     macroblock.filter_edges(
-        bs_hor, mb - g_mb_width,
+        bs_hor, mb - picture.g_mb_width,
         {k.deblock_luma_horizontal, k.deblock_luma_horizontal_strong, k.deblock_chroma_horizontal,
-         k.deblock_chroma_horizontal_strong, g_stride_luma, g_stride_chroma});
+         k.deblock_chroma_horizontal_strong, picture.g_stride_luma, picture.g_stride_chroma});
 }
 
 // Boundary strengths of all edges of a macroblock (clause 8.7.2.1). Every inter macroblock has one
 // vector, so that only its outer edges can have strength 1.
-void CEncoder::find_edge_strengths(int mb_x, int mb_y) {
-    const int mb = mb_y * g_mb_width + mb_x;
-    const bool intra = is_intra(g_mb_mode[mb]);
-    const unsigned coded = g_coded_blocks[mb];
+void MacroblockCoder::find_edge_strengths(int mb_x, int mb_y) {
+    const int mb = mb_y * picture.g_mb_width + mb_x;
+    const bool intra = is_intra(picture.g_mb_mode[mb]);
+    const unsigned coded = picture.g_coded_blocks[mb];
     const unsigned coded_columns = transpose_mask(coded);
     const unsigned inside_ver = coded_columns | coded_columns << 4;
     const unsigned inside_hor = coded | coded << 4;
@@ -203,26 +197,26 @@ void CEncoder::find_edge_strengths(int mb_x, int mb_y) {
 
     bs_ver[0] = 0;
     if (mb_x > 0) {
-        const unsigned left = transpose_mask(g_coded_blocks[mb - 1]) >> 12;
+        const unsigned left = transpose_mask(picture.g_coded_blocks[mb - 1]) >> 12;
         bs_ver[0] =
-            intra || is_intra(g_mb_mode[mb - 1])
+            intra || is_intra(picture.g_mb_mode[mb - 1])
                 ? kAllStrong
                 : kStrengths.packed[vectors_differ(mb, mb - 1)][(coded_columns | left) & 0xf];
     }
     bs_hor[0] = 0;
     if (mb_y > 0) {
-        const int above = mb - g_mb_width;
-        bs_hor[0] = intra || is_intra(g_mb_mode[above])
+        const int above = mb - picture.g_mb_width;
+        bs_hor[0] = intra || is_intra(picture.g_mb_mode[above])
                         ? kAllStrong
                         : kStrengths.packed[vectors_differ(mb, above)]
-                                           [(coded | g_coded_blocks[above] >> 12) & 0xf];
+                                           [(coded | picture.g_coded_blocks[above] >> 12) & 0xf];
     }
 }
 
 // Whether the vectors of two inter macroblocks differ by a sample or more; both have reference 0.
-bool CEncoder::vectors_differ(int mb, int other) const {
-    const _mv& a = g_mv_array[mb];
-    const _mv& b = g_mv_array[other];
+bool MacroblockCoder::vectors_differ(int mb, int other) const {
+    const _mv& a = picture.g_mv_array[mb];
+    const _mv& b = picture.g_mv_array[other];
     return std::abs(4 * (a.x - b.x) + a.dx - b.dx) >= 4 ||
            std::abs(4 * (a.y - b.y) + a.dy - b.dy) >= 4;
 }

@@ -1,7 +1,8 @@
 #include <algorithm>
 #include <cstring>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
+#include "encoder/errors.h"
 #include "encoder/prefetch.h"
 #include "encoder/tables.h"
 
@@ -25,81 +26,93 @@ std::uint16_t raster_mask(unsigned mask) {
 
 }  // namespace
 
+void MacroblockCoder::code_macroblock(int mb_x, int mb_y) {
+    g_mb_x = mb_x;
+    g_mb_y = mb_y;
+    g_mapMBNumber = mb_y * picture.g_mb_width + mb_x;
+    if (picture.g_slp->sliceType == P_SLICE) {
+        processCurrentMB_P();
+        writeMBSyntax_P();
+    } else {
+        processCurrentMB_I();
+        writeMBSyntax();
+    }
+}
+
 // A macroblock of an I picture: decisions, levels, reconstruction, maps.
-void CEncoder::processCurrentMB_I() {
+void MacroblockCoder::processCurrentMB_I() {
     setMBOffsets();
     code_intra();
 }
 
 // A macroblock of a P picture.
-void CEncoder::processCurrentMB_P() {
+void MacroblockCoder::processCurrentMB_P() {
     setMBOffsets();
     prefetch_reference();
     generatePredError16x16();
     g_skip_flag = 0;
     if (!setLearnPIMode()) {
         const std::ptrdiff_t block = first_block();
-        fill_blocks(g_blk_mvx + block, g_blk_width, std::int16_t{0});
-        fill_blocks(g_blk_mvy + block, g_blk_width, std::int16_t{0});
+        fill_blocks(picture.g_blk_mvx + block, picture.g_blk_width, std::int16_t{0});
+        fill_blocks(picture.g_blk_mvy + block, picture.g_blk_width, std::int16_t{0});
         code_intra();
         return;
     }
     g_cur_mb_mode = MB_P16x16;
-    g_mb_mode[g_mapMBNumber] = MB_P16x16;
+    picture.g_mb_mode[g_mapMBNumber] = MB_P16x16;
     quantTransform_luma_16x16P();
-    g_coded_blocks[g_mapMBNumber] = raster_mask(g_luma_mask);
+    picture.g_coded_blocks[g_mapMBNumber] = raster_mask(g_luma_mask);
     predict_inter_chroma();
     quantTransform_chroma();
     setMBValues_P();
 }
 
 // What every macroblock starts with.
-void CEncoder::setMBOffsets() {
-    lfdata& lf = g_lf_data[g_mapMBNumber];
-    lf.disable_flag = static_cast<std::uint8_t>(g_slp->disable_deblocking_filter_idc);
-    lf.alpha_offset = static_cast<std::int8_t>(g_slp->slice_alpha_c0_offset);
-    lf.beta_offset = static_cast<std::int8_t>(g_slp->slice_beta_offset);
+void MacroblockCoder::setMBOffsets() {
+    lfdata& lf = picture.g_lf_data[g_mapMBNumber];
+    lf.disable_flag = static_cast<std::uint8_t>(picture.g_slp->disable_deblocking_filter_idc);
+    lf.alpha_offset = static_cast<std::int8_t>(picture.g_slp->slice_alpha_c0_offset);
+    lf.beta_offset = static_cast<std::int8_t>(picture.g_slp->slice_beta_offset);
     g_chroma_mode = 0;
-    g_mb_qp[g_mapMBNumber] = static_cast<std::uint8_t>(g_mbQp);
+    picture.g_mb_qp[g_mapMBNumber] = static_cast<std::uint8_t>(picture.g_mbQp);
 
-    g_mb_y = g_mapMBNumber / g_mb_width;
-    g_mb_x = g_mapMBNumber % g_mb_width;
     g_mb_up = g_mb_y > 0;
     g_mb_left = g_mb_x > 0;
-    g_mb_src_y = g_cur_y + static_cast<std::ptrdiff_t>(16 * g_mb_y) * g_stride_luma + 16 * g_mb_x;
+    g_mb_src_y = picture.g_cur_y +
+                 static_cast<std::ptrdiff_t>(16 * g_mb_y) * picture.g_stride_luma + 16 * g_mb_x;
     const std::ptrdiff_t chroma =
-        static_cast<std::ptrdiff_t>(8 * g_mb_y) * g_stride_chroma + 8 * g_mb_x;
-    g_mb_src_u = g_cur_u + chroma;
-    g_mb_src_v = g_cur_v + chroma;
+        static_cast<std::ptrdiff_t>(8 * g_mb_y) * picture.g_stride_chroma + 8 * g_mb_x;
+    g_mb_src_u = picture.g_cur_u + chroma;
+    g_mb_src_v = picture.g_cur_v + chroma;
 
-    g_sad_lambda = zolt::QP2QUANT[std::max(0, g_mbQp - 12)];
+    g_sad_lambda = zolt::QP2QUANT[std::max(0, picture.g_mbQp - 12)];
     g_intra_lambda = g_sad_lambda;
 }
 
 // Asks for the samples of the reference that the macroblock row below will read first: a cache line
 // of four rows of luma and of one row of either chroma plane at a time, since 64 bytes are 4
 // macroblocks of luma and 8 of chroma.
-void CEncoder::prefetch_reference() const {
+void MacroblockCoder::prefetch_reference() const {
     const std::ptrdiff_t luma_row = 16 * g_mb_y + 16 + 4 * (g_mb_x & 3);
-    const std::uint8_t* luma = g_ref_y + luma_row * g_stride_luma + 16 * g_mb_x;
+    const std::uint8_t* luma = picture.g_ref_y + luma_row * picture.g_stride_luma + 16 * g_mb_x;
     for (int row = 0; row < 4; ++row) {
-        zolt::prefetch(luma + row * static_cast<std::ptrdiff_t>(g_stride_luma));
+        zolt::prefetch(luma + row * static_cast<std::ptrdiff_t>(picture.g_stride_luma));
     }
     const std::ptrdiff_t chroma_row = 8 * g_mb_y + 8 + (g_mb_x & 7);
-    const std::ptrdiff_t chroma = chroma_row * g_stride_chroma + 8 * g_mb_x;
-    zolt::prefetch(g_ref_u + chroma);
-    zolt::prefetch(g_ref_v + chroma);
+    const std::ptrdiff_t chroma = chroma_row * picture.g_stride_chroma + 8 * g_mb_x;
+    zolt::prefetch(picture.g_ref_u + chroma);
+    zolt::prefetch(picture.g_ref_v + chroma);
 }
 
 // Entry of the macroblock's top left block in the per-4x4-block maps.
-std::ptrdiff_t CEncoder::first_block() const {
-    return static_cast<std::ptrdiff_t>(4 * g_mb_y) * g_blk_width + 4 * g_mb_x;
+std::ptrdiff_t MacroblockCoder::first_block() const {
+    return static_cast<std::ptrdiff_t>(4 * g_mb_y) * picture.g_blk_width + 4 * g_mb_x;
 }
 
-void CEncoder::code_intra() {
-    fill_blocks(g_blk_ref + first_block(), g_blk_width, std::int8_t{-1});
+void MacroblockCoder::code_intra() {
+    fill_blocks(picture.g_blk_ref + first_block(), picture.g_blk_width, std::int8_t{-1});
     g_cur_mb_mode = learn16_4() == 16 ? MB_INTRA16x16 : MB_INTRA4x4;
-    g_mb_mode[g_mapMBNumber] = g_cur_mb_mode;
+    picture.g_mb_mode[g_mapMBNumber] = g_cur_mb_mode;
     if (g_cur_mb_mode == MB_INTRA16x16) {
         // The chroma mode does not depend on luma, nor luma on chroma.
         g_ipMBPred[0] = static_cast<std::uint8_t>(learn16_mode());
@@ -113,10 +126,10 @@ void CEncoder::code_intra() {
 }
 
 // Intra 4x4 luma, block by block: each is predicted from the reconstruction of those before it.
-void CEncoder::code_intra4x4() {
+void MacroblockCoder::code_intra4x4() {
     set_block_availability();
-    const std::ptrdiff_t stride = g_blk_width + 2;
-    std::int8_t* modes = g_i4mode + (4 * g_mb_y + 1) * stride + 4 * g_mb_x + 1;
+    const std::ptrdiff_t stride = picture.g_blk_width + 2;
+    std::int8_t* modes = picture.g_i4mode + (4 * g_mb_y + 1) * stride + 4 * g_mb_x + 1;
     if (!g_mb_left) {
         for (int y = 0; y < 4; ++y) {
             modes[y * stride - 1] = -1;
@@ -143,7 +156,7 @@ void CEncoder::code_intra4x4() {
 }
 
 // Neighbour availability of the 4x4 blocks, clause 6.4.11.4 for one slice per picture.
-void CEncoder::set_block_availability() {
+void MacroblockCoder::set_block_availability() {
     constexpr unsigned kTopRow = 1u << 0 | 1u << 1 | 1u << 4 | 1u << 5;
     constexpr unsigned kLeftColumn = 1u << 0 | 1u << 2 | 1u << 8 | 1u << 10;
     constexpr unsigned kNoUpRight = 1u << 3 | 1u << 7 | 1u << 11 | 1u << 13 | 1u << 15;
@@ -153,35 +166,36 @@ void CEncoder::set_block_availability() {
         g_blk_up_left[k] = g_blk_up[k] && g_blk_left[k];
         g_blk_up_right[k] = (kNoUpRight >> k & 1) ? 0 : g_blk_up[k];
     }
-    g_blk_up_right[5] = g_mb_up && g_mb_x < g_mb_width - 1;
+    g_blk_up_right[5] = g_mb_up && g_mb_x < picture.g_mb_width - 1;
 }
 
 // Search, vector maps and luma prediction of a P macroblock.
-void CEncoder::generatePredError16x16() {
+void MacroblockCoder::generatePredError16x16() {
     generateMBPred();
-    const _mv& mv = g_mv_array[g_mapMBNumber];
+    const _mv& mv = picture.g_mv_array[g_mapMBNumber];
     const std::int16_t x = static_cast<std::int16_t>(4 * mv.x + mv.dx);
     const std::int16_t y = static_cast<std::int16_t>(4 * mv.y + mv.dy);
     const std::ptrdiff_t block = first_block();
-    fill_blocks(g_blk_mvx + block, g_blk_width, x);
-    fill_blocks(g_blk_mvy + block, g_blk_width, y);
-    fill_blocks(g_blk_ref + block, g_blk_width, std::int8_t{0});
+    fill_blocks(picture.g_blk_mvx + block, picture.g_blk_width, x);
+    fill_blocks(picture.g_blk_mvy + block, picture.g_blk_width, y);
+    fill_blocks(picture.g_blk_ref + block, picture.g_blk_width, std::int8_t{0});
     qpmc_16x16_L0(g_mb_pred, x, y, 16 * g_mb_x, 16 * g_mb_y);
 }
 
-void CEncoder::predict_inter_chroma() {
+void MacroblockCoder::predict_inter_chroma() {
     const std::ptrdiff_t block = first_block();
-    qpmc_c_core(g_mb_pred + 256, g_blk_mvx[block], g_blk_mvy[block], 8 * g_mb_x, 8 * g_mb_y);
+    qpmc_c_core(g_mb_pred + 256, picture.g_blk_mvx[block], picture.g_blk_mvy[block], 8 * g_mb_x,
+                8 * g_mb_y);
 }
 
 // mb_type and coded_block_pattern (Tables 7-11, 7-13; clause 7.4.5) of the coded blocks.
-void CEncoder::setMBType_CBP() {
+void MacroblockCoder::setMBType_CBP() {
     const int chroma = g_chroma_ac_mask ? 2 : g_chroma_dc_mask ? 1 : 0;
     int luma = 0;
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
         luma |= (g_luma_mask >> (4 * block8x8) & 0xf) ? 1 << block8x8 : 0;
     }
-    const int intra_base = g_slp->sliceType == P_SLICE ? 5 : 0;  // P: after the inter types
+    const int intra_base = picture.g_slp->sliceType == P_SLICE ? 5 : 0;  // P: after the inter types
     switch (g_cur_mb_mode) {
         case MB_P16x16:
             g_mb_type = 0;
@@ -200,31 +214,33 @@ void CEncoder::setMBType_CBP() {
 }
 
 // The vector prediction that the search used; the macroblock's neighbours have not changed since.
-void CEncoder::set_pred_MVD() {
+void MacroblockCoder::set_pred_MVD() {
     const std::ptrdiff_t block = first_block();
-    g_mvd_x = static_cast<std::int16_t>(g_blk_mvx[block] - g_pmv_x);
-    g_mvd_y = static_cast<std::int16_t>(g_blk_mvy[block] - g_pmv_y);
+    g_mvd_x = static_cast<std::int16_t>(picture.g_blk_mvx[block] - g_pmv_x);
+    g_mvd_y = static_cast<std::int16_t>(picture.g_blk_mvy[block] - g_pmv_y);
 }
 
 // Syntax values of an inter macroblock, and whether it is sent as P_Skip: when it has no levels and
 // its vector is the one a decoder infers (clause 8.4.1.1).
-void CEncoder::setMBValues_P() {
+void MacroblockCoder::setMBValues_P() {
     setMBType_CBP();
     set_pred_MVD();
-    const bool last = g_mapMBNumber == g_num_mbs - 1;
+    const bool last = g_mapMBNumber == picture.g_num_mbs - 1;
     if (last || g_coded_block_pattern != 0) {
         return;
     }
     const std::ptrdiff_t block = first_block();
     const auto is_zero = [this](std::ptrdiff_t b) {
-        return g_blk_mvx[b] == 0 && g_blk_mvy[b] == 0;
+        return picture.g_blk_mvx[b] == 0 && picture.g_blk_mvy[b] == 0;
     };
-    const auto holds_still = [&](std::ptrdiff_t b) { return g_blk_ref[b] == 0 && is_zero(b); };
-    const bool zero_skip_vector =
-        !g_mb_left || !g_mb_up || holds_still(block - 1) || holds_still(block - g_blk_width);
+    const auto holds_still = [&](std::ptrdiff_t b) {
+        return picture.g_blk_ref[b] == 0 && is_zero(b);
+    };
+    const bool zero_skip_vector = !g_mb_left || !g_mb_up || holds_still(block - 1) ||
+                                  holds_still(block - picture.g_blk_width);
     if (zero_skip_vector ? is_zero(block) : g_mvd_x == 0 && g_mvd_y == 0) {
         // Without levels the reconstruction already is the prediction that the decoder forms.
         g_skip_flag = 1;
-        g_mb_mode[g_mapMBNumber] = MB_SKIP;
+        picture.g_mb_mode[g_mapMBNumber] = MB_SKIP;
     }
 }

@@ -3,6 +3,7 @@
 #include <cstdlib>
 
 #include "encoder/CEncoder.h"
+#include "encoder/errors.h"
 
 namespace {
 
@@ -10,7 +11,7 @@ namespace {
 template <typename T>
 void allocate(zolt::AlignedBuffer<T>& buffer, std::size_t count, const char* name) {
     if (!buffer.allocate(count)) {
-        CEncoder::memError(name);
+        memError(name);
     }
 }
 
@@ -18,7 +19,7 @@ constexpr std::size_t size(int count) {
     return static_cast<std::size_t>(count);
 }
 
-// Room behind the NAL buffer and the planes for accesses wider than the last element.
+// Room behind the planes for accesses wider than the last element.
 constexpr std::size_t kSlack = 64;
 
 // The largest picture that any level allows, and its longest side: sqrt(8 * MaxFS) macroblocks
@@ -29,11 +30,10 @@ constexpr int kMaxSide = 16880;
 // Ends the process unless a picture of this size can be coded; returns the width.
 int checked_width(int width, int height) {
     if (width < 16 || height < 16) {
-        CEncoder::exitOnError("Picture size must be at least 16x16", -1);
+        exitOnError("Picture size must be at least 16x16", -1);
     }
     if (width > kMaxSide || height > kMaxSide || (width / 16) * (height / 16) > kMaxMacroblocks) {
-        CEncoder::exitOnError(
-            "Picture size must be at most 139264 macroblocks and 16880 samples a side", -1);
+        exitOnError("Picture size must be at most 139264 macroblocks and 16880 samples a side", -1);
     }
     return width;
 }
@@ -44,8 +44,47 @@ constexpr std::int64_t kMaxNalBytes = 1 << 27;
 }  // namespace
 
 CEncoder::CEncoder(int width, int height, const zolt::Kernels* kernels)
-    : g_kernels(kernels ? kernels : &zolt::best_kernels()),
-      g_width(checked_width(width, height)),
+    : picture(checked_width(width, height), height, kernels ? *kernels : zolt::best_kernels()),
+      rows(picture),
+      rate_control(width, height) {
+    allocate_memory();
+}
+
+CEncoder::~CEncoder() {
+    free_memory();
+}
+
+// The picture and the first worker have theirs already.
+void CEncoder::allocate_memory() {
+    allocBitBuff();
+    allocate(g_sps, 1, "allocate_memory: g_sps");
+    allocate(g_pps, 1, "allocate_memory: g_pps");
+}
+
+void CEncoder::free_memory() {
+    g_sps.release();
+    g_pps.release();
+    freeBitBuff();
+}
+
+void CEncoder::allocBitBuff() {
+    const std::int64_t samples = std::int64_t{picture.g_width} * picture.g_height;
+    g_nal_buf_size =
+        static_cast<int>(std::clamp<std::int64_t>(samples * 3 / 2, 20000, kMaxNalBytes));
+    g_nal_emul_size = static_cast<int>(std::min<std::int64_t>(samples / 100 + 100, kMaxNalBytes));
+    nal.allocate(size(g_nal_buf_size) + Wavefront::row_bytes(picture.g_mb_width),
+                 "allocBitBuff: g_nal_buf");
+    allocate(g_nal_emul_pos, size(g_nal_emul_size), "allocBitBuff: g_nal_emul_pos");
+}
+
+void CEncoder::freeBitBuff() {
+    nal.release();
+    g_nal_emul_pos.release();
+}
+
+Picture::Picture(int width, int height, const zolt::Kernels& kernels)
+    : g_kernels(&kernels),
+      g_width(width),
       g_height(height),
       g_mb_width(width / 16),
       g_mb_height(height / 16),
@@ -57,57 +96,28 @@ CEncoder::CEncoder(int width, int height, const zolt::Kernels* kernels)
       g_blk_width(g_width16 / 4),
       g_blk_height(g_height16 / 4) {
     initDiamond(16, 1, 1);
-    allocate_memory();
-}
-
-CEncoder::~CEncoder() {
-    free_memory();
-}
-
-void CEncoder::allocate_memory() {
-    allocBitBuff();
     allocGlobal();
     allocGlobal2();
     allocImageBuffers();
     allocFramePred();
-    allocate(g_sps, 1, "allocate_memory: g_sps");
-    allocate(g_pps, 1, "allocate_memory: g_pps");
 }
 
-void CEncoder::free_memory() {
-    g_sps.release();
-    g_pps.release();
+Picture::~Picture() {
     freeFramePred();
     freeImageBuffers();
     freeGlobal2();
     freeGlobal();
-    freeBitBuff();
 }
 
-void CEncoder::allocBitBuff() {
-    const std::int64_t samples = std::int64_t{g_width} * g_height;
-    g_nal_buf_size =
-        static_cast<int>(std::clamp<std::int64_t>(samples * 3 / 2, 20000, kMaxNalBytes));
-    g_nal_emul_size = static_cast<int>(std::min<std::int64_t>(samples / 100 + 100, kMaxNalBytes));
-    allocate(g_nal_buf, size(g_nal_buf_size) + kSlack, "allocBitBuff: g_nal_buf");
-    allocate(g_nal_emul_pos, size(g_nal_emul_size), "allocBitBuff: g_nal_emul_pos");
-    g_nal_bitpos = 0;
-}
-
-void CEncoder::freeBitBuff() {
-    g_nal_buf.release();
-    g_nal_emul_pos.release();
-}
-
-void CEncoder::allocGlobal() {
+void Picture::allocGlobal() {
     allocate(g_slp, 1, "allocFirst(): g_slp");
 }
 
-void CEncoder::freeGlobal() {
+void Picture::freeGlobal() {
     g_slp.release();
 }
 
-void CEncoder::allocGlobal2() {
+void Picture::allocGlobal2() {
     const std::size_t mbs = size(g_num_mbs);
     const std::size_t blocks = size(g_blk_width) * size(g_blk_height);
     allocate(g_i4mode, size(g_blk_width + 2) * size(g_blk_height + 1), "allocGlobal2: g_i4mode");
@@ -123,7 +133,7 @@ void CEncoder::allocGlobal2() {
     allocate(g_cnum_v, blocks / 4, "allocGlobal2:g_cnum_v");
 }
 
-void CEncoder::freeGlobal2() {
+void Picture::freeGlobal2() {
     g_i4mode.release();
     g_mb_mode.release();
     g_mb_qp.release();
@@ -137,7 +147,7 @@ void CEncoder::freeGlobal2() {
     g_cnum_v.release();
 }
 
-void CEncoder::allocImageBuffers() {
+void Picture::allocImageBuffers() {
     const std::size_t picture = size(g_size_Y) + 2 * size(g_size_U);
     allocate(g_alloc_images, 2 * picture + kSlack, "allocImageBuffers: g_alloc_images");
     g_cur_y = g_alloc_images + g_origin_luma;
@@ -149,36 +159,38 @@ void CEncoder::allocImageBuffers() {
     allocate(g_mv_array, size(g_num_mbs), "allocImageBuffers: g_mv_array");
 }
 
-void CEncoder::freeImageBuffers() {
+void Picture::freeImageBuffers() {
     g_alloc_images.release();
     g_mv_array.release();
     g_cur_y = g_cur_u = g_cur_v = nullptr;
     g_ref_y = g_ref_u = g_ref_v = nullptr;
 }
 
-void CEncoder::allocFramePred() {
+void Picture::allocFramePred() {
     allocate(g_half_planes, 3 * size(g_size_Y) + kSlack, "allocFramePred: g_half_planes");
     g_half_v_L0 = g_half_planes + g_origin_luma;
     g_half_h_L0 = g_half_v_L0 + g_size_Y;
     g_half_hv_L0 = g_half_h_L0 + g_size_Y;
     allocate(g_me_mb_L0, size(g_num_mbs), "allocFramePred: g_me_mb_L0");
-    allocate(g_visit_L0, size(g_visit_dim) * size(g_visit_dim), "allocFramePred: g_visit_L0");
-    g_visit_stamp = 0;
 }
 
-void CEncoder::freeFramePred() {
+void Picture::freeFramePred() {
     g_half_planes.release();
     g_me_mb_L0.release();
-    g_visit_L0.release();
     g_half_v_L0 = g_half_h_L0 = g_half_hv_L0 = nullptr;
 }
 
-void CEncoder::exitOnError(const char* msg, int status) {
+MacroblockCoder::MacroblockCoder(Picture& shared) : picture(shared), g_kernels(shared.g_kernels) {
+    allocate(g_visit_L0, size(shared.g_visit_dim) * size(shared.g_visit_dim),
+             "allocFramePred: g_visit_L0");
+}
+
+void exitOnError(const char* msg, int status) {
     std::fprintf(stderr, "%s\n", msg);
     std::exit(status);
 }
 
-void CEncoder::memError(const char* what) {
+void memError(const char* what) {
     std::fprintf(stderr, "Memory allocation failed for: %s\n", what);
     std::exit(106);
 }

@@ -1,6 +1,6 @@
 #include <algorithm>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 
 namespace {
 
@@ -29,29 +29,29 @@ constexpr int kFarOverhang = 3;  // beyond the right and lower edges
 
 }  // namespace
 
-void CEncoder::form_mv_prediction(std::int16_t* pmv_x, std::int16_t* pmv_y, std::int8_t ref, int bx,
-                                  int by, int w, int h) const {
+void MacroblockCoder::form_mv_prediction(std::int16_t* pmv_x, std::int16_t* pmv_y, std::int8_t ref,
+                                         int bx, int by, int w, int h) const {
     const std::ptrdiff_t origin =
-        static_cast<std::ptrdiff_t>(4 * g_mb_y + by) * g_blk_width + 4 * g_mb_x + bx;
+        static_cast<std::ptrdiff_t>(4 * g_mb_y + by) * picture.g_blk_width + 4 * g_mb_x + bx;
     const auto neighbour = [&](bool available, std::ptrdiff_t offset) {
         Neighbour n;
         if (available) {
             n.available = true;
-            n.ref = g_blk_ref[origin + offset];
-            n.x = g_blk_mvx[origin + offset];
-            n.y = g_blk_mvy[origin + offset];
+            n.ref = picture.g_blk_ref[origin + offset];
+            n.x = picture.g_blk_mvx[origin + offset];
+            n.y = picture.g_blk_mvy[origin + offset];
         }
         return n;
     };
     const int k = bx + 4 * by + w / 4;
-    const bool up_right_exists = g_mb_y > 0 && g_mb_x < g_mb_width - 1;
+    const bool up_right_exists = g_mb_y > 0 && g_mb_x < picture.g_mb_width - 1;
     const Neighbour a = neighbour(bx > 0 || g_mb_left, -1);
-    const Neighbour b = neighbour(by > 0 || g_mb_up, -g_blk_width);
+    const Neighbour b = neighbour(by > 0 || g_mb_up, -picture.g_blk_width);
     Neighbour c = neighbour(
         (test_up[k] && g_mb_up) || (test_up_right[k] && up_right_exists) || test_interior[k],
-        w / 4 - g_blk_width);
+        w / 4 - picture.g_blk_width);
     if (!c.available) {  // D stands in for C
-        c = neighbour((bx > 0 || g_mb_left) && (by > 0 || g_mb_up), -1 - g_blk_width);
+        c = neighbour((bx > 0 || g_mb_left) && (by > 0 || g_mb_up), -1 - picture.g_blk_width);
     }
 
     const bool match_a = a.ref == ref;
@@ -72,16 +72,17 @@ void CEncoder::form_mv_prediction(std::int16_t* pmv_x, std::int16_t* pmv_y, std:
     *pmv_y = chosen ? chosen->y : static_cast<std::int16_t>(median(a.y, b.y, c.y));
 }
 
-void CEncoder::qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int py) const {
-    const int x = std::clamp((mvx + 4 * px) >> 2, -kLumaOverhang, g_width16 + kFarOverhang);
-    const int y = std::clamp((mvy + 4 * py) >> 2, -kLumaOverhang, g_height16 + kFarOverhang);
+void MacroblockCoder::qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int py) const {
+    const int x = std::clamp((mvx + 4 * px) >> 2, -kLumaOverhang, picture.g_width16 + kFarOverhang);
+    const int y =
+        std::clamp((mvy + 4 * py) >> 2, -kLumaOverhang, picture.g_height16 + kFarOverhang);
     const int fx = mvx & 3;
     const int fy = mvy & 3;
-    const std::ptrdiff_t stride = g_stride_luma;
+    const std::ptrdiff_t stride = picture.g_stride_luma;
     const std::ptrdiff_t position = y * stride + x;
-    const std::uint8_t* full = g_ref_y + position;
-    const std::uint8_t* horizontal = g_half_h_L0 + position;  // b
-    const std::uint8_t* vertical = g_half_v_L0 + position;    // h
+    const std::uint8_t* full = picture.g_ref_y + position;
+    const std::uint8_t* horizontal = picture.g_half_h_L0 + position;  // b
+    const std::uint8_t* vertical = picture.g_half_v_L0 + position;    // h
 
     // The two samples that clause 8.4.2.2.1 averages: in an even row or column of the
     // quarter-sample grid one of them lies on it, elsewhere they are the nearest b and h.
@@ -114,10 +115,12 @@ void CEncoder::qpmc_16x16_L0(std::uint8_t* pred, int mvx, int mvy, int px, int p
     }
 }
 
-void CEncoder::qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy) const {
-    const int x = std::clamp((mvx + 8 * cx) >> 3, -kChromaOverhang, g_cwidth + kFarOverhang);
-    const int y = std::clamp((mvy + 8 * cy) >> 3, -kChromaOverhang, g_cheight + kFarOverhang);
-    const std::ptrdiff_t position = static_cast<std::ptrdiff_t>(y) * g_stride_chroma + x;
-    g_kernels->chroma_8x8(pred, g_ref_u + position, g_ref_v + position, g_stride_chroma, mvx & 7,
-                          mvy & 7);
+void MacroblockCoder::qpmc_c_core(std::uint8_t* pred, int mvx, int mvy, int cx, int cy) const {
+    const int x =
+        std::clamp((mvx + 8 * cx) >> 3, -kChromaOverhang, picture.g_cwidth + kFarOverhang);
+    const int y =
+        std::clamp((mvy + 8 * cy) >> 3, -kChromaOverhang, picture.g_cheight + kFarOverhang);
+    const std::ptrdiff_t position = static_cast<std::ptrdiff_t>(y) * picture.g_stride_chroma + x;
+    g_kernels->chroma_8x8(pred, picture.g_ref_u + position, picture.g_ref_v + position,
+                          picture.g_stride_chroma, mvx & 7, mvy & 7);
 }

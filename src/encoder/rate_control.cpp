@@ -2,7 +2,8 @@
 #include <cmath>
 #include <limits>
 
-#include "encoder/CEncoder.h"
+#include "encoder/RateControl.h"
+#include "encoder/errors.h"
 
 namespace {
 
@@ -65,9 +66,16 @@ std::int16_t qp_range(unsigned intra_period) {
         std::clamp(intra_period / 10 + 2, 3u, unsigned{std::numeric_limits<std::int16_t>::max()}));
 }
 
+// Pictures of the intra period that are not coded yet, the coming one included.
+unsigned pictures_left(const rc_stream_t& stream, const rc_picture_t& picture) {
+    return stream.intra_period - static_cast<unsigned>(picture.gop_pos);
+}
+
 }  // namespace
 
-void CEncoder::InitRateControl() {
+RateControl::RateControl(int width, int height) : g_width(width), g_height(height) {}
+
+void RateControl::InitRateControl(const rc_stream_t& stream) {
     g_rc_initialized = true;
     g_rc_first_p = true;
     std::fill(g_rc_mad_hist, g_rc_mad_hist + kHistory, 0.0);
@@ -75,7 +83,7 @@ void CEncoder::InitRateControl() {
     std::fill(g_rc_qstep_hist, g_rc_qstep_hist + kHistory, 0.0);
     g_rc_hist_idx = 0;
     g_rc_hist_count = 0;
-    g_rc_frame_rate = g_frame_rate;
+    g_rc_frame_rate = stream.frame_rate;
     if (g_width <= 176) {
         g_rc_bpp_l1 = 0.1;
         g_rc_bpp_l2 = 0.3;
@@ -86,14 +94,14 @@ void CEncoder::InitRateControl() {
         g_rc_bpp_l1 = 0.6;
         g_rc_bpp_l2 = 1.4;
     }
-    g_rc_target_rate = static_cast<unsigned>(g_bit_rate);
-    g_rc_bpp = g_rc_target_rate / g_frame_rate / g_width / g_height;
+    g_rc_target_rate = static_cast<unsigned>(stream.bit_rate);
+    g_rc_bpp = g_rc_target_rate / stream.frame_rate / g_width / g_height;
 
-    const LevelLimit limit = level_limit(g_sps->level_idc);
+    const LevelLimit limit = level_limit(stream.level_idc);
     g_rc_max_br = limit.max_br;
     g_rc_max_cpb = limit.max_cpb;
 
-    g_rc_gop_len = saturate(g_intra_period);
+    g_rc_gop_len = saturate(stream.intra_period);
     g_rc_np = g_rc_gop_len;  // one anchor per frame: the inter period is 1
     g_rc_nb = 0;
     g_rc_coded_p = g_rc_coded_b = 0;
@@ -107,7 +115,7 @@ void CEncoder::InitRateControl() {
     g_rc_upper = g_rc_max_cpb;
     g_rc_lower = 0;
     g_rc_target_level = g_rc_max_cpb / 2;
-    g_rc_qp_range = qp_range(g_intra_period);
+    g_rc_qp_range = qp_range(stream.intra_period);
     g_rc_buffer = 0;
     g_rc_remaining_bits = 0;
     g_rc_prev_bits = 0;
@@ -116,7 +124,7 @@ void CEncoder::InitRateControl() {
     g_rc_i_qp = 0;
 }
 
-void CEncoder::check_level_limit() const {
+void RateControl::check_level_limit() const {
     if (g_rc_target_rate > static_cast<unsigned>(g_rc_max_br) * 1000) {
         exitOnError(
             "bit rate exceeds the maximum allowed bit rate for the given level, check the standard",
@@ -124,62 +132,51 @@ void CEncoder::check_level_limit() const {
     }
 }
 
-void CEncoder::UpdateRateControlFrameRate(double fps) {
+void RateControl::UpdateRateControlFrameRate(double fps) {
     g_rc_frame_rate = fps;
 }
 
-// Chooses g_mbQp of the picture about to be coded.
-void CEncoder::FrameLevelRateControl() {
-    const bool inter = g_pic_type == P_SLICE;
+int RateControl::FrameLevelRateControl(const rc_stream_t& stream, const rc_picture_t& picture) {
     if (g_rc_period == 0) {
-        start_rate_control();
-    } else if (g_rc_period != g_intra_period) {
-        g_rc_qp_range = qp_range(g_intra_period);
-        if (inter) {
+        start_rate_control(stream, picture);
+    } else if (g_rc_period != stream.intra_period) {
+        g_rc_qp_range = qp_range(stream.intra_period);
+        if (picture.inter) {
             g_rc_i_qp = static_cast<std::int16_t>(g_rc_prev_qp);
         }
     }
-    if (inter) {
-        choose_qp_P();
-    } else {
-        choose_qp_I();
-    }
+    return picture.inter ? choose_qp_P(stream, picture) : choose_qp_I(stream, picture);
 }
 
 // Puts the controller into its first state where the picture before was not coded under it.
-void CEncoder::start_rate_control() {
-    if (g_coded_frames == 0) {
+void RateControl::start_rate_control(const rc_stream_t& stream, const rc_picture_t& picture) {
+    if (picture.coded_frames == 0) {
         if (!g_rc_initialized) {
-            InitRateControl();
+            InitRateControl(stream);
         }
         return;
     }
-    InitRateControl();
+    InitRateControl(stream);
     g_rc_buffer = g_rc_target_level;
-    g_rc_prev_qp = g_mbQp;
-    g_rc_i_qp = static_cast<std::int16_t>(g_mbQp);
-}
-
-// Pictures of the intra period that are not coded yet, the coming one included.
-unsigned CEncoder::pictures_left() const {
-    return g_intra_period - static_cast<unsigned>(g_gop_pos);
+    g_rc_prev_qp = picture.qp;
+    g_rc_i_qp = static_cast<std::int16_t>(picture.qp);
 }
 
 // The bits of so many pictures, less what the buffer holds above its target.
-int CEncoder::bit_budget(unsigned pictures) const {
+int RateControl::bit_budget(unsigned pictures) const {
     return truncate(g_rc_target_rate / g_rc_frame_rate * pictures -
                     (g_rc_buffer - g_rc_target_level));
 }
 
-void CEncoder::choose_qp_I() {
+int RateControl::choose_qp_I(const rc_stream_t& stream, const rc_picture_t& picture) {
     // The first intra period is as long as it was when the controller was initialised.
-    unsigned pictures = pictures_left();
+    unsigned pictures = pictures_left(stream, picture);
     int qp;
-    if (g_coded_frames == 0) {
+    if (picture.coded_frames == 0) {
         g_rc_buffer = g_rc_target_level;
         pictures = static_cast<unsigned>(g_rc_gop_len);
-        if (g_qp >= 1) {
-            qp = g_qp;
+        if (stream.qp >= 1) {
+            qp = stream.qp;
         } else {
             qp = g_rc_bpp <= g_rc_bpp_l1 ? 35 : g_rc_bpp <= g_rc_bpp_l2 ? 25 : 20;
         }
@@ -199,27 +196,27 @@ void CEncoder::choose_qp_I() {
     g_rc_nb = g_rc_gop_len - g_rc_np;
     g_rc_np = 1;
     g_rc_gop_len = 1;
-    g_mbQp = qp;
+    return qp;
 }
 
-void CEncoder::choose_qp_P() {
+int RateControl::choose_qp_P(const rc_stream_t& stream, const rc_picture_t& picture) {
     // A start and a change of the intra period make a new budget; at a start the buffer is at its
     // target.
-    g_rc_remaining_bits = g_rc_period == g_intra_period
+    const unsigned left = pictures_left(stream, picture);
+    g_rc_remaining_bits = g_rc_period == stream.intra_period
                               ? saturate(std::int64_t{g_rc_remaining_bits} - g_rc_prev_bits)
-                              : bit_budget(pictures_left());
+                              : bit_budget(left);
     increment(g_rc_coded_p);
     increment(g_rc_np);
     increment(g_rc_gop_len);
     if (g_rc_first_p) {
-        return;  // the I picture's QP
+        return picture.qp;  // the I picture's
     }
 
     const int from_buffer = truncate((g_rc_target_level - g_rc_buffer) * g_rc_gamma +
                                      g_rc_target_rate / g_rc_frame_rate + 0.5);
-    const int from_budget =
-        truncate(g_rc_remaining_bits * g_rc_xp /
-                 ((g_rc_nb - g_rc_coded_b) * g_rc_xb + g_rc_xp * pictures_left() + 1.0));
+    const int from_budget = truncate(g_rc_remaining_bits * g_rc_xp /
+                                     ((g_rc_nb - g_rc_coded_b) * g_rc_xb + g_rc_xp * left + 1.0));
     int target = truncate(g_rc_beta * from_budget + (1 - g_rc_beta) * from_buffer);
     target = std::max(std::min(target, g_rc_upper), g_rc_lower);
     g_rc_target_bits = target;
@@ -248,19 +245,18 @@ void CEncoder::choose_qp_P() {
     } else if (qp - g_rc_i_qp < -2 * g_rc_qp_range) {
         qp = g_rc_i_qp - 2 * g_rc_qp_range;
     }
-    g_mbQp = std::clamp(qp, kMinQp, kMaxQp);
+    return std::clamp(qp, kMinQp, kMaxQp);
 }
 
-// Learns from the picture just coded.
-void CEncoder::UpdateFrameLevelRateControl() {
-    const int bits = static_cast<int>(g_slice_bits);
-    const int qp = g_mbQp;
-    g_rc_period = g_intra_period;
+void RateControl::UpdateFrameLevelRateControl(const rc_stream_t& stream,
+                                              const rc_picture_t& picture, int qp, int bits,
+                                              std::int64_t sad, int num_mbs) {
+    g_rc_period = stream.intra_period;
     g_rc_prev_bits = bits;
     g_rc_buffer = truncate(std::int64_t{g_rc_buffer} + bits - g_rc_target_rate / g_rc_frame_rate);
     g_rc_buffer = std::min(std::max(g_rc_buffer, 0), g_rc_max_cpb);
     g_rc_prev_qp = qp;
-    if (g_pic_type == I_SLICE) {
+    if (!picture.inter) {
         g_rc_i_qp = static_cast<std::int16_t>(qp);
         g_rc_target_level = g_rc_buffer;
         return;
@@ -268,12 +264,8 @@ void CEncoder::UpdateFrameLevelRateControl() {
 
     g_rc_xp = 7 * g_rc_xp * 0.125 + std::int64_t{bits} * qp * 0.125;
 
-    std::int64_t sum = 0;
-    for (int mb = 0; mb < g_num_mbs; ++mb) {
-        sum += g_mv_array[mb].sad;
-    }
-    sum = std::max<std::int64_t>(sum, 1);
-    const double mad = static_cast<double>(sum) / (std::int64_t{g_num_mbs} * 256);
+    const double mad =
+        static_cast<double>(std::max<std::int64_t>(sad, 1)) / (std::int64_t{num_mbs} * 256);
     g_rc_mad_hist[g_rc_hist_idx] = mad;
     g_rc_cur_mad = mad;
     SetMADParameter();
@@ -287,7 +279,7 @@ void CEncoder::UpdateFrameLevelRateControl() {
 }
 
 // Fits the line of each MAD on the one after it; the newest MAD is stored, the index not advanced.
-void CEncoder::SetMADParameter() {
+void RateControl::SetMADParameter() {
     if (g_rc_first_p) {
         g_rc_mad_c1 = 1;
         g_rc_mad_c2 = 0;
@@ -316,7 +308,7 @@ void CEncoder::SetMADParameter() {
 }
 
 // Fits R = x1 / Q + x2 / Q^2 to the history, once, and again without the outliers.
-void CEncoder::SetRDQParameter() {
+void RateControl::SetRDQParameter() {
     const bool full = g_rc_hist_count == kHistory;
     const int first = full ? g_rc_hist_idx + 1 : 0;
     const int window = full ? kHistory - 1 : g_rc_hist_count;
@@ -346,7 +338,7 @@ void CEncoder::SetRDQParameter() {
 }
 
 // One fit over the pictures not rejected; n divides the mean.
-void CEncoder::fit_rate_model(int first, int window, const bool* rejected, int n) {
+void RateControl::fit_rate_model(int first, int window, const bool* rejected, int n) {
     double mean = 0;
     double a = 0, b = 0, c = 0, d = 0;
     int m = 0;
@@ -382,7 +374,7 @@ void CEncoder::fit_rate_model(int first, int window, const bool* rejected, int n
     }
 }
 
-double CEncoder::QP2Qstep(int qp) {
+double RateControl::QP2Qstep(int qp) {
     double qstep = QP2QSTEP[qp % 6];
     for (int i = 0; i < qp / 6; ++i) {
         qstep *= 2;
@@ -390,7 +382,7 @@ double CEncoder::QP2Qstep(int qp) {
     return qstep;
 }
 
-int CEncoder::Qstep2QP(double q) {
+int RateControl::Qstep2QP(double q) {
     if (q < QP2QSTEP[0]) {
         return 0;
     }

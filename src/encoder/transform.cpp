@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <cstdlib>
 
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/bitops.h"
 #include "encoder/tables.h"
 #include "kernels/zigzag.h"
@@ -112,30 +112,31 @@ const zolt::Quantizer& zolt::inter_quantizer(int qp) {
 }
 
 // Intra 4x4 block k: transform, levels, reconstruction in the current picture. pred: 4x4 samples.
-void CEncoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
-    const Quantizer& q =
-        g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(g_mbQp) : zolt::inter_quantizer(g_mbQp);
+void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
+    const Quantizer& q = picture.g_slp->sliceType == I_SLICE
+                             ? zolt::intra_quantizer(picture.g_mbQp)
+                             : zolt::inter_quantizer(picture.g_mbQp);
     std::uint8_t* block =
-        g_mb_src_y + 4 * zolt::luma_scan_j[k] * g_stride_luma + 4 * zolt::luma_scan_i[k];
+        g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
-    const unsigned coded = g_kernels->code_residual_4x4(block, g_stride_luma, pred, q, coefs,
-                                                        g_scan_levels + 16 * k, g_nonzero + k);
+    const unsigned coded = g_kernels->code_residual_4x4(
+        block, picture.g_stride_luma, pred, q, coefs, g_scan_levels + 16 * k, g_nonzero + k);
     g_luma_mask |= coded << k;
     if (coded) {
-        g_kernels->reconstruct_4x4(coefs, pred, block, g_stride_luma);
+        g_kernels->reconstruct_4x4(coefs, pred, block, picture.g_stride_luma);
     } else {
         for (int y = 0; y < 4; ++y) {
-            std::copy(pred + 4 * y, pred + 4 * y + 4, block + y * g_stride_luma);
+            std::copy(pred + 4 * y, pred + 4 * y + 4, block + y * picture.g_stride_luma);
         }
     }
 }
 
 // Intra 16x16 luma (clause 8.5.2): the DC coefficients have a transform of their own.
-void CEncoder::quantTransform_luma_16x16() {
-    const Quantizer& q = zolt::intra_quantizer(g_mbQp);
+void MacroblockCoder::quantTransform_luma_16x16() {
+    const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
     std::int16_t constant[16];
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, g_stride_luma, g_mb_pred, q, constant,
-                                                 g_mb_coefs, g_scan_levels, g_nonzero);
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred, q,
+                                                 constant, g_mb_coefs, g_scan_levels, g_nonzero);
     int dc[16];
     for (int r = 0; r < 16; ++r) {
         dc[r] = constant[kDecodingOrder[r]];
@@ -154,14 +155,15 @@ void CEncoder::quantTransform_luma_16x16() {
         g_mb_coefs[16 * k] = static_cast<std::int16_t>(value);
         reconstructed |= (value != 0 ? 1u : 0u) << k;
     }
-    g_kernels->reconstruct_16x16(g_mb_coefs, reconstructed, g_mb_pred, g_mb_src_y, g_stride_luma);
+    g_kernels->reconstruct_16x16(g_mb_coefs, reconstructed, g_mb_pred, g_mb_src_y,
+                                 picture.g_stride_luma);
 }
 
 // Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
-void CEncoder::quantTransform_luma_16x16P() {
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, g_stride_luma, g_mb_pred,
-                                                 zolt::inter_quantizer(g_mbQp), nullptr, g_mb_coefs,
-                                                 g_scan_levels, g_nonzero);
+void MacroblockCoder::quantTransform_luma_16x16P() {
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred,
+                                                 zolt::inter_quantizer(picture.g_mbQp), nullptr,
+                                                 g_mb_coefs, g_scan_levels, g_nonzero);
     int macroblock_cost = 0;
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
         const unsigned blocks = 0xfu << (4 * block8x8);
@@ -179,14 +181,15 @@ void CEncoder::quantTransform_luma_16x16P() {
     if (macroblock_cost < kMinMacroblockCost) {
         g_luma_mask = 0;
     }
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y, g_stride_luma);
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y,
+                                 picture.g_stride_luma);
 }
 
 // Chroma of any macroblock (clause 8.5.4).
-void CEncoder::quantTransform_chroma() {
-    const int qp = zolt::QP_SCALE_CR[g_mbQp];
+void MacroblockCoder::quantTransform_chroma() {
+    const int qp = zolt::QP_SCALE_CR[picture.g_mbQp];
     const Quantizer& q =
-        g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+        picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
     g_chroma_ac_mask = 0;
     g_chroma_dc_mask = 0;
     for (int component = 0; component < 2; ++component) {
@@ -195,18 +198,19 @@ void CEncoder::quantTransform_chroma() {
         std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
         std::int16_t dc[4];
         const std::uint32_t ac_mask = g_kernels->code_residual_8x8(
-            samples, g_stride_chroma, pred, q, dc, coefs, g_scan_levels + 256 + 64 * component,
-            g_nonzero + 16 + 4 * component);
+            samples, picture.g_stride_chroma, pred, q, dc, coefs,
+            g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
         const std::uint32_t dc_mask = quantize_chroma_dc(component, dc, q, coefs);
-        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples, g_stride_chroma);
+        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples,
+                                   picture.g_stride_chroma);
         g_chroma_ac_mask |= ac_mask << (4 * component);
     }
 }
 
 // The DC coefficients c of a component's four blocks have a 2x2 transform of their own. Writes
 // their levels, and their scaled values to coefs; returns the mask of the blocks that have one.
-std::uint32_t CEncoder::quantize_chroma_dc(int component, const std::int16_t* c,
-                                           const Quantizer& quantizer, std::int16_t* coefs) {
+std::uint32_t MacroblockCoder::quantize_chroma_dc(int component, const std::int16_t* c,
+                                                  const Quantizer& quantizer, std::int16_t* coefs) {
     const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
                       c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
     const int largest = std::max({std::abs(f[0]), std::abs(f[1]), std::abs(f[2]), std::abs(f[3])});

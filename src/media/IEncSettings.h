@@ -1,5 +1,7 @@
 #pragma once
 
+class IParallelRunner;
+
 // Settings of an encoder. Setters with a result return the value in force after the call.
 class IEncSettings {
 public:
@@ -23,6 +25,10 @@ public:
     // B pictures between two anchor pictures.
     virtual int GetNumBframes() = 0;
     virtual int SetNumBframes(int count) = 0;
+    // Lends the encoder threads to code each picture on, from the next picture on; null, the
+    // default, takes them back. The stream does not depend on them. Borrowed: a runner lives until
+    // a PutSample that began after it was replaced has returned, or the encoder is deleted.
+    virtual void SetParallelRunner(IParallelRunner* runner) = 0;
 
 protected:
     ~IVideoEncSettings() = default;

@@ -124,6 +124,9 @@ void VideoH264ZoltEnc::PutSample(ISample* sample) {
         }
     } const reset{*this};
     engine().set_intra_period(keyFrameInt);
+    IParallelRunner* const runner = parallelRunner;
+    lentThreads.set_runner(runner);
+    engine().set_worker_pool(runner == nullptr ? nullptr : &lentThreads);
     engine().encode_frame(converts ? frameBuffer.load() : data);
     FillOutSample(time);
     if (ISampleConsumer* const connected = consumer) {

@@ -14,6 +14,7 @@
 #include "media/MediaType.h"
 #include "media/abi.h"
 #include "media/fourcc.h"
+#include "plugin/LentThreads.h"
 #include "support/SimpleMutex.h"
 
 class CEncH;
@@ -31,8 +32,9 @@ class ColorConverter;
 //
 // Calls may come from several threads. One mutex guards the session; it is held while the consumer
 // is called, so a consumer must not call back into the session from there. Notify, Disconnect, the
-// key-frame interval and all getters take no lock. Parameter sets that getters return are valid
-// until the session is built anew. A consumer that throws leaves the session as after a return.
+// key-frame interval, the parallel runner and all getters take no lock. Parameter sets that getters
+// return are valid until the session is built anew. A consumer that throws leaves the session as
+// after a return.
 class VideoH264ZoltEnc : public IMediaEncoder,
                          public IConfigVideoAvc,
                          public IVideoEncCapabilities,
@@ -104,6 +106,9 @@ public:
     bool SupportsProducingExtraIntraFrame() override { return false; }
     void ProduceExtraIntraFrame() override {}
 
+    // Stored without a lock and read when the next picture begins.
+    void SetParallelRunner(IParallelRunner* runner) override { parallelRunner = runner; }
+
 private:
     static constexpr int kNumBframes = 0;  // B pictures between anchors
 
@@ -127,13 +132,16 @@ private:
     std::atomic<int> picParSetSize{0};
     std::atomic<unsigned char*> picParSetData{nullptr};  // owned array
     std::atomic<unsigned char*> frameBuffer{nullptr};    // converter's output; null: nothing built
+    std::atomic<IParallelRunner*> parallelRunner{
+        nullptr};  // borrowed; null: the caller's thread alone
 
     // Under the mutex.
     int inputWidth = 0, inputHeight = 0;
     int inputColorFormat = zolt::fourcc("####");
     std::unique_ptr<ColorConverter> converter;
     std::unique_ptr<CEncH> encoder;
-    MediaSample outSample;  // reused for every frame; borrows the engine's NAL buffer
+    LentThreads lentThreads;  // the engine's view of parallelRunner
+    MediaSample outSample;    // reused for every frame; borrows the engine's NAL buffer
     MediaStreamConfig streamConfig;
     bool firstSample = true;           // nothing encoded since construction
     long long lastSampleTime = 0;      // of the previous input sample, microseconds

@@ -31,7 +31,7 @@ std::vector<std::uint8_t> Encoding::encode(const std::uint8_t* picture) {
 }
 
 std::vector<std::uint8_t> Encoding::reconstruction() const {
-    std::vector<std::uint8_t> picture(static_cast<std::size_t>(engine_.g_num_mbs) * 384);
+    std::vector<std::uint8_t> picture(static_cast<std::size_t>(engine_.picture.g_num_mbs) * 384);
     engine_.copy_reconstruction(picture.data());
     return picture;
 }

@@ -8,7 +8,7 @@ namespace zolt_test {
 std::string check_stream(const Sequence& sequence, const Settings& settings, const Hooks& hooks) {
     Encoding encoding(sequence.width, sequence.height, settings);
     CEncoder& engine = encoding.engine();
-    Decoder decoder(engine.g_width16, engine.g_height16);
+    Decoder decoder(engine.picture.g_width16, engine.picture.g_height16);
     for (const auto* set :
          {&encoding.sequence_parameter_set(), &encoding.picture_parameter_set()}) {
         decoder.send_parameter_set(set->data(), static_cast<int>(set->size()));

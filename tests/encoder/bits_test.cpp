@@ -34,14 +34,14 @@ TEST(Bits, FieldsAndExpGolombCodesReadBack) {
         const unsigned value = random.next() >> random.between(length > 0 ? 32 - length : 2, 31);
         elements.push_back({length, value});
         if (length > 0) {
-            engine.write_bits(value, length);
+            engine.nal.write_bits(value, length);
         } else if (length == 0) {
-            engine.write_uvlc_unsigned(value);
+            engine.nal.write_uvlc_unsigned(value);
         } else {
-            engine.write_uvlc_signed(static_cast<int>(value) - 1000);
+            engine.nal.write_uvlc_signed(static_cast<int>(value) - 1000);
         }
     }
-    BitReader reader(engine.g_nal_buf, static_cast<std::size_t>(engine.get_nal_size()));
+    BitReader reader(engine.nal.g_nal_buf, static_cast<std::size_t>(engine.get_nal_size()));
     for (const Element& e : elements) {
         if (e.length > 0) {
             ASSERT_EQ(reader.u(e.length), e.value);
@@ -57,22 +57,23 @@ TEST(Bits, FieldsAndExpGolombCodesReadBack) {
     engine.ResetNALUnit();
     engine.GetNALUnit(&bits);
     EXPECT_EQ(bits, 0);
-    EXPECT_EQ(std::count(engine.g_nal_buf.data(), engine.g_nal_buf + engine.g_nal_buf_size, 0),
-              engine.g_nal_buf_size);
+    EXPECT_EQ(
+        std::count(engine.nal.g_nal_buf.data(), engine.nal.g_nal_buf + engine.g_nal_buf_size, 0),
+        engine.g_nal_buf_size);
 }
 
 // Nothing but what was written counts, whatever stood in the buffer.
 TEST(Bits, WritesOverOldContent) {
     CEncoder engine(16, 16);
     for (int position = 0; position < 8; ++position) {
-        for (int length = 1; length <= CEncoder::kMaxWrite; ++length) {
-            std::fill(engine.g_nal_buf.data(), engine.g_nal_buf + 32, std::uint8_t{0xff});
-            engine.g_nal_buf[0] = 0;
-            engine.g_nal_bitpos = static_cast<unsigned>(position);
-            engine.write_bits(0, length);
-            engine.write_bits(0, 9);
-            engine.write_bits(1, 1);
-            BitReader reader(engine.g_nal_buf, 32);
+        for (int length = 1; length <= BitWriter::kMaxWrite; ++length) {
+            std::fill(engine.nal.g_nal_buf.data(), engine.nal.g_nal_buf + 32, std::uint8_t{0xff});
+            engine.nal.g_nal_buf[0] = 0;
+            engine.nal.g_nal_bitpos = static_cast<unsigned>(position);
+            engine.nal.write_bits(0, length);
+            engine.nal.write_bits(0, 9);
+            engine.nal.write_bits(1, 1);
+            BitReader reader(engine.nal.g_nal_buf, 32);
             ASSERT_EQ(reader.u(position), 0u);
             for (int i = 0; i < length + 9; ++i) {
                 ASSERT_EQ(reader.u(1), 0u) << "bit " << i << " of " << length << " at " << position;
@@ -86,8 +87,8 @@ TEST(Bits, LengthsOfExpGolombCodes) {
     CEncoder engine(16, 16);
     const auto length = [&](unsigned v) {
         engine.ResetNALUnit();
-        engine.write_uvlc_unsigned(v);
-        return engine.g_nal_bitpos;
+        engine.nal.write_uvlc_unsigned(v);
+        return engine.nal.g_nal_bitpos;
     };
     for (const auto& [v, bits] : std::vector<std::pair<unsigned, unsigned>>{
              {0, 1}, {1, 3}, {255, 17}, {256, 17}, {8190, 25}, {8191, 27}, {0xfffffffe, 63}}) {
@@ -97,7 +98,7 @@ TEST(Bits, LengthsOfExpGolombCodes) {
 
 TEST(Bits, SizesOfTheNalUnit) {
     CEncoder engine(16, 16);
-    engine.write_bits(0x1abcd, 17);
+    engine.nal.write_bits(0x1abcd, 17);
     EXPECT_EQ(engine.get_nal_size(), 3);
     Bytes copy(3, 0xee);
     EXPECT_EQ(engine.copy_nal_unit(copy.data(), 2), 2);
@@ -131,8 +132,8 @@ TEST(ParameterSets, BytesForPictureSizes) {
 // Ends an RBSP whose bits stand in bytes, `spare` bits short of their end.
 bool end_nal_unit(CEncoder& engine, const Bytes& bytes, unsigned spare) {
     engine.ResetNALUnit();
-    std::copy(bytes.begin(), bytes.end(), engine.g_nal_buf.data());
-    engine.g_nal_bitpos = static_cast<unsigned>(8 * bytes.size()) - spare;
+    std::copy(bytes.begin(), bytes.end(), engine.nal.g_nal_buf.data());
+    engine.nal.g_nal_bitpos = static_cast<unsigned>(8 * bytes.size()) - spare;
     return engine.writeNALUnit();
 }
 

@@ -12,7 +12,7 @@
 
 #include "common/BitReader.h"
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 
 namespace {
 
@@ -222,6 +222,8 @@ private:
 
 class ResidualBlock : public testing::Test {
 protected:
+    ResidualBlock() { writer_.allocate(4096, "writer_"); }
+
     // Writes a block and expects the decoder to read it again to its last bit.
     void check(const std::vector<int>& levels, Table table) {
         std::vector<std::int16_t> scan(levels.begin(), levels.end());
@@ -230,14 +232,16 @@ protected:
             nonzero |= (levels[n] != 0 ? 1u : 0u) << n;
         }
         const int count = static_cast<int>(levels.size());
-        engine_.ResetNALUnit();
-        engine_.encodeCAVLCBlock4x4(scan.data(), nonzero, count, table);
-        BitReader reader(engine_.g_nal_buf, static_cast<std::size_t>(engine_.get_nal_size()));
+        writer_.reset();
+        coder_.encodeCAVLCBlock4x4(scan.data(), nonzero, count, table);
+        BitReader reader(writer_.g_nal_buf, (writer_.g_nal_bitpos + 7) / 8);
         ASSERT_EQ(decoder_.decode(reader, table, count), levels) << "table " << table;
-        ASSERT_EQ(reader.position(), engine_.g_nal_bitpos);
+        ASSERT_EQ(reader.position(), writer_.g_nal_bitpos);
     }
 
-    CEncoder engine_{16, 16};
+    Picture picture_{16, 16, zolt::best_kernels()};
+    MacroblockCoder coder_{picture_};
+    BitWriter& writer_ = coder_.row_bits;
     BlockDecoder decoder_;
 };
 

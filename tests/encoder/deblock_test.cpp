@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 
 namespace {
 
@@ -38,10 +38,10 @@ struct Plane {
 
 class DeblockReference {
 public:
-    explicit DeblockReference(const CEncoder& engine) : e_(engine) {
-        planes_[0] = read(e_.g_cur_y, e_.g_stride_luma, e_.g_width16, e_.g_height16);
-        planes_[1] = read(e_.g_cur_u, e_.g_stride_chroma, e_.g_cwidth, e_.g_cheight);
-        planes_[2] = read(e_.g_cur_v, e_.g_stride_chroma, e_.g_cwidth, e_.g_cheight);
+    explicit DeblockReference(const Picture& picture) : p_(picture) {
+        planes_[0] = read(p_.g_cur_y, p_.g_stride_luma, p_.g_width16, p_.g_height16);
+        planes_[1] = read(p_.g_cur_u, p_.g_stride_chroma, p_.g_cwidth, p_.g_cheight);
+        planes_[2] = read(p_.g_cur_v, p_.g_stride_chroma, p_.g_cwidth, p_.g_cheight);
     }
 
     static Plane read(const std::uint8_t* p, std::ptrdiff_t stride, int width, int height) {
@@ -53,9 +53,9 @@ public:
     }
 
     void filter_picture() {
-        for (int mb_y = 0; mb_y < e_.g_mb_height; ++mb_y) {
-            for (int mb_x = 0; mb_x < e_.g_mb_width; ++mb_x) {
-                if (e_.g_lf_data[mb_y * e_.g_mb_width + mb_x].disable_flag == 0) {
+        for (int mb_y = 0; mb_y < p_.g_mb_height; ++mb_y) {
+            for (int mb_x = 0; mb_x < p_.g_mb_width; ++mb_x) {
+                if (p_.g_lf_data[mb_y * p_.g_mb_width + mb_x].disable_flag == 0) {
                     for (const bool vertical : {true, false}) {
                         filter_edges(mb_x, mb_y, vertical);
                     }
@@ -87,15 +87,15 @@ private:
         const int scale = plane == 0 ? 1 : 2;
         const int luma_x = scale * x, luma_y = scale * y;
         const int bs = strength(luma_x, luma_y, vertical);
-        const int mb_q = luma_y / 16 * e_.g_mb_width + luma_x / 16;
-        const int mb_p = (luma_y - !vertical) / 16 * e_.g_mb_width + (luma_x - vertical) / 16;
+        const int mb_q = luma_y / 16 * p_.g_mb_width + luma_x / 16;
+        const int mb_p = (luma_y - !vertical) / 16 * p_.g_mb_width + (luma_x - vertical) / 16;
         const auto qp = [&](int mb) {
-            const int luma = e_.g_mb_qp[mb];
+            const int luma = p_.g_mb_qp[mb];
             return plane == 0 || luma < 30 ? luma : kChromaQp[luma - 30];
         };
         const int average = (qp(mb_p) + qp(mb_q) + 1) >> 1;
-        const int index_a = std::clamp(average + e_.g_lf_data[mb_q].alpha_offset, 0, 51) - 16;
-        const int index_b = std::clamp(average + e_.g_lf_data[mb_q].beta_offset, 0, 51) - 16;
+        const int index_a = std::clamp(average + p_.g_lf_data[mb_q].alpha_offset, 0, 51) - 16;
+        const int index_b = std::clamp(average + p_.g_lf_data[mb_q].beta_offset, 0, 51) - 16;
         const int alpha = index_a < 0 ? 0 : kAlpha[index_a];
         const int beta = index_b < 0 ? 0 : kBeta[index_b];
         const auto sample = [&](int i) -> int& {
@@ -146,25 +146,25 @@ private:
     // bS of clause 8.7.2.1 between the luma sample at (x, y) and the one left of or above it.
     int strength(int x, int y, bool vertical) const {
         const int px = x - vertical, py = y - !vertical;
-        const auto mb_at = [&](int sx, int sy) { return sy / 16 * e_.g_mb_width + sx / 16; };
+        const auto mb_at = [&](int sx, int sy) { return sy / 16 * p_.g_mb_width + sx / 16; };
         const int q = mb_at(x, y), p = mb_at(px, py);
-        const auto intra = [&](int mb) { return e_.g_mb_mode[mb] >= MB_INTRA4x4; };
+        const auto intra = [&](int mb) { return p_.g_mb_mode[mb] >= MB_INTRA4x4; };
         if (intra(p) || intra(q)) {
             return p != q ? 4 : 3;
         }
         const auto coded = [&](int sx, int sy) {
             const int block = sy % 16 / 4 * 4 + sx % 16 / 4;
-            return (e_.g_coded_blocks[mb_at(sx, sy)] >> block & 1) != 0;
+            return (p_.g_coded_blocks[mb_at(sx, sy)] >> block & 1) != 0;
         };
         if (coded(x, y) || coded(px, py)) {
             return 2;
         }
-        const _mv &a = e_.g_mv_array[p], &b = e_.g_mv_array[q];
+        const _mv &a = p_.g_mv_array[p], &b = p_.g_mv_array[q];
         return std::abs(4 * a.x + a.dx - 4 * b.x - b.dx) >= 4 ||
                std::abs(4 * a.y + a.dy - 4 * b.y - b.dy) >= 4;
     }
 
-    const CEncoder& e_;
+    const Picture& p_;
     std::array<Plane, 3> planes_;
 };
 
@@ -186,36 +186,37 @@ void draw(std::uint8_t* p, std::ptrdiff_t stride, int width, int height, Random&
 TEST(Deblocking, EqualsTheStandardOnRandomPictures) {
     constexpr std::uint8_t kModes[] = {MB_SKIP, MB_P16x16, MB_INTRA4x4, MB_INTRA16x16};
     Random random(1);
-    CEncoder engine(64, 48);
+    Picture picture(64, 48, zolt::best_kernels());
+    MacroblockCoder coder(picture);
     for (int iteration = 0; iteration < 400; ++iteration) {
-        draw(engine.g_cur_y, engine.g_stride_luma, 64, 48, random);
-        draw(engine.g_cur_u, engine.g_stride_chroma, 32, 24, random);
-        draw(engine.g_cur_v, engine.g_stride_chroma, 32, 24, random);
+        draw(picture.g_cur_y, picture.g_stride_luma, 64, 48, random);
+        draw(picture.g_cur_u, picture.g_stride_chroma, 32, 24, random);
+        draw(picture.g_cur_v, picture.g_stride_chroma, 32, 24, random);
         const int qp = random.between(0, 51);
         const int most_intra = random.between(1, 3);
-        for (int mb = 0; mb < engine.g_num_mbs; ++mb) {
-            engine.g_mb_mode[mb] = kModes[random.between(0, most_intra)];
-            engine.g_mb_qp[mb] =
+        for (int mb = 0; mb < picture.g_num_mbs; ++mb) {
+            picture.g_mb_mode[mb] = kModes[random.between(0, most_intra)];
+            picture.g_mb_qp[mb] =
                 static_cast<std::uint8_t>(std::clamp(qp + random.between(-3, 3), 0, 51));
-            engine.g_lf_data[mb] = {random.between(0, 9) == 0,
-                                    static_cast<std::int8_t>(random.between(-12, 12)),
-                                    static_cast<std::int8_t>(random.between(-12, 12))};
+            picture.g_lf_data[mb] = {random.between(0, 9) == 0,
+                                     static_cast<std::int8_t>(random.between(-12, 12)),
+                                     static_cast<std::int8_t>(random.between(-12, 12))};
             // What intra macroblocks have here is left over and means nothing.
             const unsigned coded = random.next() & random.next() & 0xffff;
-            engine.g_coded_blocks[mb] =
-                static_cast<std::uint16_t>(engine.g_mb_mode[mb] == MB_SKIP ? 0 : coded);
-            _mv& mv = engine.g_mv_array[mb];
+            picture.g_coded_blocks[mb] =
+                static_cast<std::uint16_t>(picture.g_mb_mode[mb] == MB_SKIP ? 0 : coded);
+            _mv& mv = picture.g_mv_array[mb];
             mv.x = static_cast<std::int16_t>(random.between(-1, 1));
             mv.y = static_cast<std::int16_t>(random.between(-1, 0));
             mv.dx = static_cast<std::int8_t>(random.between(-3, 3));
             mv.dy = static_cast<std::int8_t>(random.between(0, 1));
         }
-        DeblockReference reference(engine);
+        DeblockReference reference(picture);
         reference.filter_picture();
-        for (int mb = 0; mb < engine.g_num_mbs; ++mb) {
-            engine.filter_mb(mb % engine.g_mb_width, mb / engine.g_mb_width);
+        for (int mb = 0; mb < picture.g_num_mbs; ++mb) {
+            coder.filter_mb(mb % picture.g_mb_width, mb / picture.g_mb_width);
         }
-        const DeblockReference filtered(engine);
+        const DeblockReference filtered(picture);
         for (int plane = 0; plane < 3; ++plane) {
             ASSERT_EQ(filtered.plane(plane).samples, reference.plane(plane).samples)
                 << "plane " << plane << ", iteration " << iteration;

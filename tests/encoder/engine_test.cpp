@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "common/Encoding.h"
+#include "encoder/errors.h"
 
 namespace {
 
@@ -15,13 +16,13 @@ using Bytes = std::vector<std::uint8_t>;
 
 TEST(Engine, SettersKeepTheirRanges) {
     CEncoder engine(40, 50);
-    EXPECT_EQ(engine.g_num_mbs, 6);
+    EXPECT_EQ(engine.picture.g_num_mbs, 6);
     EXPECT_EQ(engine.set_bit_rate(123), 200000);
     EXPECT_TRUE(engine.g_rc_enable);
     EXPECT_EQ(engine.set_bit_rate(-5), 123);
     EXPECT_FALSE(engine.g_rc_enable);
     EXPECT_EQ(engine.set_frame_rate(12.5), 25.0);
-    EXPECT_EQ(engine.g_rc_frame_rate, 12.5);
+    EXPECT_EQ(engine.rate_control.g_rc_frame_rate, 12.5);
     EXPECT_EQ(engine.set_intra_period(-3), 25u);
     EXPECT_EQ(engine.set_intra_period(60), 1u);
     EXPECT_EQ(engine.set_inter_period(0), 1u);
@@ -33,7 +34,7 @@ TEST(Engine, SettersKeepTheirRanges) {
     for (const auto& [set, qp] : {std::pair{-1, 0}, {52, 51}, {33, 33}}) {
         engine.set_qp(set);
         EXPECT_EQ(engine.g_qp, qp);
-        EXPECT_EQ(engine.g_mbQp, qp);
+        EXPECT_EQ(engine.picture.g_mbQp, qp);
     }
 }
 
@@ -77,8 +78,7 @@ TEST(EngineDeath, StatesThatEndTheProcess) {
     EXPECT_EXIT(CEncoder(16, 53687040), exits(-1), too_large);
     EXPECT_EXIT(CEncoder(16881, 16), exits(-1), too_large);
     EXPECT_EXIT(CEncoder(5984, 5968), exits(-1), too_large);  // 374 x 373 macroblocks
-    EXPECT_EXIT(CEncoder::memError("a plane"), exits(106),
-                "^Memory allocation failed for: a plane\n$");
+    EXPECT_EXIT(memError("a plane"), exits(106), "^Memory allocation failed for: a plane\n$");
 
     CEncoder engine(16, 16);
     engine.set_bit_rate(4000000);
@@ -87,10 +87,11 @@ TEST(EngineDeath, StatesThatEndTheProcess) {
     EXPECT_EXIT(engine.initialize_encoder(), exits(109),
                 "^bit rate exceeds the maximum allowed bit rate for the given level, check the "
                 "standard\n$");
-    engine.g_cur_mb_mode = 3;
-    EXPECT_EXIT(engine.setMBType_CBP(), exits(-1), "^setMBType_CBP. Unsupported mode\n");
-    engine.g_num_ref_active = 2;
-    EXPECT_EXIT(engine.encode_MB_Pred_P(), exits(107),
+    engine.rows.coders[0]->g_cur_mb_mode = 3;
+    EXPECT_EXIT(engine.rows.coders[0]->setMBType_CBP(), exits(-1),
+                "^setMBType_CBP. Unsupported mode\n");
+    engine.picture.g_num_ref_active = 2;
+    EXPECT_EXIT(engine.rows.coders[0]->encode_MB_Pred_P(), exits(107),
                 "^Unsupported Macroblock type in encode_MB_Pred_P\n");
 }
 

@@ -153,9 +153,9 @@ TEST(IntraPrediction, Luma4x4) {
         a.up_left = a.up && a.left;
         const int mode = random.between(0, 8);
         std::uint8_t neighbours[13], pred[16];
-        CEncoder::gather_neighbours4(neighbours, picture.block(), kStride, a.up, a.left, a.up_right,
-                                     a.up_left);
-        CEncoder::ipred4(pred, neighbours, a.up, a.left, mode);
+        MacroblockCoder::gather_neighbours4(neighbours, picture.block(), kStride, a.up, a.left,
+                                            a.up_right, a.up_left);
+        MacroblockCoder::ipred4(pred, neighbours, a.up, a.left, mode);
         for (int i = 0; i < 16; ++i) {
             ASSERT_EQ(pred[i], reference4(picture, a, mode, i % 4, i / 4))
                 << "mode " << mode << " at (" << i % 4 << ", " << i / 4 << ")";
@@ -171,14 +171,14 @@ TEST(IntraPrediction, Luma16x16AndChroma) {
         const int mode = random.between(0, 3);
         std::uint8_t pred[256];
         if (mode == 2 || (up && left)) {
-            CEncoder::ipred16(pred, picture.block(), kStride, up, left, mode);
+            MacroblockCoder::ipred16(pred, picture.block(), kStride, up, left, mode);
             for (int i = 0; i < 256; ++i) {
                 ASSERT_EQ(pred[i], reference16(picture, up, left, mode, i % 16, i / 16))
                     << "mode " << mode << " at (" << i % 16 << ", " << i / 16 << ")";
             }
         }
         if (mode == 0 || (up && left)) {
-            CEncoder::ipred_c(pred, picture.block(), kStride, up, left, mode);
+            MacroblockCoder::ipred_c(pred, picture.block(), kStride, up, left, mode);
             for (int i = 0; i < 64; ++i) {
                 ASSERT_EQ(pred[i], reference_c(picture, up, left, mode, i % 8, i / 8))
                     << "chroma mode " << mode << " at (" << i % 8 << ", " << i / 8 << ")";
@@ -194,14 +194,14 @@ TEST(IntraPredictionDeath, ModesThatAreNotPossible) {
     const std::uint8_t neighbours[13] = {};
     std::uint8_t pred[256];
     const auto exits = testing::ExitedWithCode(104);
-    EXPECT_EXIT(CEncoder::ipred4(pred, neighbours, 1, 1, 9), exits,
+    EXPECT_EXIT(MacroblockCoder::ipred4(pred, neighbours, 1, 1, 9), exits,
                 "^Illegal intra prediction mode\n$");
     for (const auto& [up, left, mode] :
          {std::array{1, 1, 4}, std::array{0, 1, 0}, std::array{1, 0, 1}, std::array{1, 0, 3}}) {
-        EXPECT_EXIT(CEncoder::ipred16(pred, picture.block(), kStride, up, left, mode), exits,
+        EXPECT_EXIT(MacroblockCoder::ipred16(pred, picture.block(), kStride, up, left, mode), exits,
                     "^Unsupported prediction in Luma 16x16 Intra Prediction Routine\n$");
     }
-    EXPECT_EXIT(CEncoder::ipred_c(pred, picture.block(), kStride, 1, 1, 4), exits,
+    EXPECT_EXIT(MacroblockCoder::ipred_c(pred, picture.block(), kStride, 1, 1, 4), exits,
                 "^Unsupported Intra Prediction Mode\n$");
 }
 

@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -25,8 +25,6 @@ void stand_in_energy(const std::int32_t*, std::int32_t* energy) {
 
 class LearnedTree : public testing::Test {
 protected:
-    LearnedTree() { engine_.initialize_encoder(); }
-
     static zolt::Kernels with_stand_in() {
         zolt::Kernels kernels = zolt::scalar_kernels();
         kernels.hadamard_energy = stand_in_energy;
@@ -44,7 +42,8 @@ protected:
     }
 
     zolt::Kernels kernels_ = with_stand_in();
-    CEncoder engine_{16, 16, &kernels_};
+    Picture picture_{16, 16, kernels_};
+    MacroblockCoder coder_{picture_};
 };
 
 TEST_F(LearnedTree, Intra16x16Or4x4) {
@@ -64,10 +63,10 @@ TEST_F(LearnedTree, Intra16x16Or4x4) {
         {48, {309, 241, 396, 1558, 674, 526, 855}},
         {51, {359, 291, 450, 2262, 834, 725, 1156}},
     };
-    engine_.g_slp->sliceType = I_SLICE;
-    engine_.setMBOffsets();
+    picture_.g_slp->sliceType = I_SLICE;
+    coder_.setMBOffsets();
     for (const auto& [qp, t] : cases) {
-        engine_.g_mbQp = qp;
+        picture_.g_mbQp = qp;
         const std::vector<int> values = around(t, 7);
         for (const int d : values) {
             for (const int h : values) {
@@ -78,7 +77,7 @@ TEST_F(LearnedTree, Intra16x16Or4x4) {
                     const std::int32_t energies[4] = {9, h, v, d};
                     std::copy(energies, energies + 4, stand_in_energies[0]);
                     stand_in_calls = 0;
-                    ASSERT_EQ(engine_.learn16_4(), large ? 16 : 4)
+                    ASSERT_EQ(coder_.learn16_4(), large ? 16 : 4)
                         << "QP " << qp << ", textures " << h << ", " << v << ", " << d;
                 }
             }
@@ -100,9 +99,9 @@ TEST_F(LearnedTree, InterOrIntra) {
         {45, {1042, 421, 581, 240, 243, 96, 848, 0, 1569, 533}},
         {51, {3553, 1959, 1310, 766, 821, 126, 4231, 0, 4947, 1985}},
     };
-    engine_.setMBOffsets();
+    coder_.setMBOffsets();
     for (const auto& [qp, t] : cases) {
-        engine_.g_mbQp = qp;
+        picture_.g_mbQp = qp;
         const std::vector<int> values = around(t, 10);
         for (const int x : values) {
             for (const int y : values) {
@@ -119,7 +118,7 @@ TEST_F(LearnedTree, InterOrIntra) {
                 const std::int32_t energies[2][4] = {{5, 6, 7, x}, {y / 2, 0, 0, y - y / 2}};
                 std::copy(energies[0], energies[0] + 8, stand_in_energies[0]);
                 stand_in_calls = 0;
-                ASSERT_EQ(engine_.setLearnPIMode() != 0, qp < 35 ? !low_qp_intra : high_qp_inter)
+                ASSERT_EQ(coder_.setLearnPIMode() != 0, qp < 35 ? !low_qp_intra : high_qp_inter)
                     << "QP " << qp << ", x " << x << ", y " << y;
             }
         }
@@ -134,24 +133,27 @@ protected:
         for (int y = 0; y < 48; ++y) {
             for (int x = 0; x < 48; ++x) {
                 const auto value = static_cast<std::uint8_t>(draw(x, y));
-                engine_.g_cur_y[y * engine_.g_stride_luma + x] = value;
-                engine_.g_cur_u[y / 2 * engine_.g_stride_chroma + x / 2] = value;
-                engine_.g_cur_v[y / 2 * engine_.g_stride_chroma + x / 2] = value;
+                picture_.g_cur_y[y * picture_.g_stride_luma + x] = value;
+                picture_.g_cur_u[y / 2 * picture_.g_stride_chroma + x / 2] = value;
+                picture_.g_cur_v[y / 2 * picture_.g_stride_chroma + x / 2] = value;
             }
         }
-        engine_.g_mbQp = qp;  // 12: rate weight 1
-        engine_.g_mapMBNumber = mb;
-        engine_.setMBOffsets();
-        engine_.set_block_availability();
+        picture_.g_mbQp = qp;  // 12: rate weight 1
+        coder_.g_mapMBNumber = mb;
+        coder_.g_mb_x = mb % picture_.g_mb_width;
+        coder_.g_mb_y = mb / picture_.g_mb_width;
+        coder_.setMBOffsets();
+        coder_.set_block_availability();
     }
 
-    CEncoder engine_{48, 48};
+    Picture picture_{48, 48, zolt::best_kernels()};
+    MacroblockCoder coder_{picture_};
 };
 
 TEST_F(ModeSearch, FindsTheModeOfPlainBlocks) {
     const auto modes = [&](int mb, auto draw) {
         start(mb, draw);
-        return std::make_pair(engine_.learn16_mode(), engine_.learn_chroma_mode());
+        return std::make_pair(coder_.learn16_mode(), coder_.learn_chroma_mode());
     };
     // 16x16 modes: vertical, horizontal, DC, plane; chroma modes: DC, horizontal, vertical, plane.
     EXPECT_EQ(modes(4, [](int x, int) { return x / 2 * 37 % 256; }), std::make_pair(0, 2));
@@ -171,29 +173,29 @@ TEST_F(ModeSearch, KeepsThePredicted4x4Mode) {
     for (const int d : {4, 5}) {
         // Block 0 of the middle macroblock continues the row above; DC, as predicted, is d off.
         start(4, [d](int x, int y) { return x < 16 && y >= 16 ? 100 + 2 * d : 100; });
-        EXPECT_EQ(engine_.learn4_mode(0, 2, pred), d == 4 ? 2 : 0);
+        EXPECT_EQ(coder_.learn4_mode(0, 2, pred), d == 4 ? 2 : 0);
         EXPECT_EQ(pred[0], d == 4 ? 104 : 100);
     }
     start(0, [](int x, int y) { return 13 * x * y % 256; });
-    EXPECT_EQ(engine_.learn4_mode(0, 2, pred), 2) << "no other candidate";
+    EXPECT_EQ(coder_.learn4_mode(0, 2, pred), 2) << "no other candidate";
 }
 
 // The elimination mode by mode: a candidate that is dropped takes no further part.
-int plain_4x4_mode(const CEncoder& e, int k, int predicted) {
-    const std::uint8_t* src =
-        e.g_mb_src_y + 4 * zolt::luma_scan_j[k] * e.g_stride_luma + 4 * zolt::luma_scan_i[k];
+int plain_4x4_mode(const MacroblockCoder& e, int k, int predicted) {
+    const std::uint8_t* src = e.g_mb_src_y + 4 * zolt::luma_scan_j[k] * e.picture.g_stride_luma +
+                              4 * zolt::luma_scan_i[k];
     const bool up = e.g_blk_up[k], left = e.g_blk_left[k];
     std::uint8_t neighbours[16];
-    CEncoder::gather_neighbours4(neighbours, src, e.g_stride_luma, up, left, e.g_blk_up_right[k],
-                                 e.g_blk_up_left[k]);
+    MacroblockCoder::gather_neighbours4(neighbours, src, e.picture.g_stride_luma, up, left,
+                                        e.g_blk_up_right[k], e.g_blk_up_left[k]);
     int distortion[9][4];
     for (int mode = 0; mode < 9; ++mode) {
         std::uint8_t pred[16];
-        CEncoder::ipred4(pred, neighbours, up, left, mode);
+        MacroblockCoder::ipred4(pred, neighbours, up, left, mode);
         for (int step = 0; step < 4; ++step) {
             const auto d = [&](int x, int y) {
                 x += step % 2, y += step / 2;
-                return src[y * e.g_stride_luma + x] - pred[4 * y + x];
+                return src[y * e.picture.g_stride_luma + x] - pred[4 * y + x];
             };
             const int a = d(0, 0), b = d(2, 0), c = d(0, 2), f = d(2, 2);
             distortion[mode][step] = std::abs(a + b + c + f) + std::abs(a - b + c - f) +
@@ -243,12 +245,12 @@ TEST_F(ModeSearch, Equals4x4EliminationModeByMode) {
             },
             kQps[random.between(0, 4)]);
         for (int k = 0; k < 16; ++k) {
-            const bool up = engine_.g_blk_up[k], left = engine_.g_blk_left[k];
+            const bool up = coder_.g_blk_up[k], left = coder_.g_blk_left[k];
             const int predicted = up && left ? random.between(0, 8) : 2;
             alignas(16) std::uint8_t pred[16];
-            const int mode = engine_.learn4_mode(k, predicted, pred);
-            ASSERT_EQ(mode, plain_4x4_mode(engine_, k, predicted))
-                << "block " << k << ", predicted " << predicted << ", QP " << engine_.g_mbQp;
+            const int mode = coder_.learn4_mode(k, predicted, pred);
+            ASSERT_EQ(mode, plain_4x4_mode(coder_, k, predicted))
+                << "block " << k << ", predicted " << predicted << ", QP " << picture_.g_mbQp;
             changed += mode != predicted;
         }
     }

@@ -6,7 +6,7 @@
 #include <array>
 
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -32,26 +32,28 @@ int decoding_order(int x, int y) {
 
 // The block at (x, y), in blocks, seen from the partition at (bx, by) of the engine's current
 // macroblock: available when it has been decoded before (clauses 6.4.8, 6.4.11.7).
-Motion neighbour(const CEncoder& e, int bx, int by, int x, int y) {
+Motion neighbour(const MacroblockCoder& e, int bx, int by, int x, int y) {
     const int column = 4 * e.g_mb_x + x, row = 4 * e.g_mb_y + y;
-    if (column < 0 || row < 0 || column >= e.g_blk_width || row >= e.g_blk_height) {
+    if (column < 0 || row < 0 || column >= e.picture.g_blk_width || row >= e.picture.g_blk_height) {
         return {};
     }
-    const int mb = row / 4 * e.g_mb_width + column / 4;
-    const int current = e.g_mb_y * e.g_mb_width + e.g_mb_x;
+    const int mb = row / 4 * e.picture.g_mb_width + column / 4;
+    const int current = e.g_mb_y * e.picture.g_mb_width + e.g_mb_x;
     if (mb > current ||
         (mb == current && decoding_order(column % 4, row % 4) >= decoding_order(bx, by))) {
         return {};
     }
-    const int block = row * e.g_blk_width + column;
-    return {true, e.g_blk_ref[block], e.g_blk_mvx[block], e.g_blk_mvy[block]};
+    const int block = row * e.picture.g_blk_width + column;
+    return {true, e.picture.g_blk_ref[block], e.picture.g_blk_mvx[block],
+            e.picture.g_blk_mvy[block]};
 }
 
 int median(int a, int b, int c) {
     return a + b + c - std::min({a, b, c}) - std::max({a, b, c});
 }
 
-std::array<int, 2> reference_prediction(const CEncoder& e, int ref, int bx, int by, int w, int h) {
+std::array<int, 2> reference_prediction(const MacroblockCoder& e, int ref, int bx, int by, int w,
+                                        int h) {
     const Motion a = neighbour(e, bx, by, bx - 1, by);
     Motion b = neighbour(e, bx, by, bx, by - 1);
     Motion c = neighbour(e, bx, by, bx + w / 4, by - 1);
@@ -84,29 +86,30 @@ std::array<int, 2> reference_prediction(const CEncoder& e, int ref, int bx, int 
 TEST(VectorPrediction, EveryShapeOnRandomNeighbourhoods) {
     constexpr int kShapes[][2] = {{16, 16}, {16, 8}, {8, 16}, {8, 8}, {8, 4}, {4, 8}, {4, 4}};
     Random random(1);
-    CEncoder engine(64, 48);
+    Picture picture(64, 48, zolt::best_kernels());
+    MacroblockCoder coder(picture);
     for (int iteration = 0; iteration < 3000; ++iteration) {
-        for (int block = 0; block < engine.g_blk_width * engine.g_blk_height; ++block) {
+        for (int block = 0; block < picture.g_blk_width * picture.g_blk_height; ++block) {
             const int ref = random.between(-1, 1);
-            engine.g_blk_ref[block] = static_cast<std::int8_t>(ref);
+            picture.g_blk_ref[block] = static_cast<std::int8_t>(ref);
             const auto component = [&] { return ref < 0 ? 0 : random.between(-90, 90); };
-            engine.g_blk_mvx[block] = static_cast<std::int16_t>(component());
-            engine.g_blk_mvy[block] = static_cast<std::int16_t>(component());
+            picture.g_blk_mvx[block] = static_cast<std::int16_t>(component());
+            picture.g_blk_mvy[block] = static_cast<std::int16_t>(component());
         }
-        engine.g_mb_x = random.between(0, 3);
-        engine.g_mb_y = random.between(0, 2);
-        engine.g_mb_left = engine.g_mb_x > 0;
-        engine.g_mb_up = engine.g_mb_y > 0;
+        coder.g_mb_x = random.between(0, 3);
+        coder.g_mb_y = random.between(0, 2);
+        coder.g_mb_left = coder.g_mb_x > 0;
+        coder.g_mb_up = coder.g_mb_y > 0;
         const auto& [w, h] = kShapes[iteration % 7];
         const int ref = random.between(0, 1);
         for (int by = 0; by < 4; by += h / 4) {
             for (int bx = 0; bx < 4; bx += w / 4) {
                 std::int16_t x, y;
-                engine.form_mv_prediction(&x, &y, static_cast<std::int8_t>(ref), bx, by, w, h);
+                coder.form_mv_prediction(&x, &y, static_cast<std::int8_t>(ref), bx, by, w, h);
                 ASSERT_EQ((std::array<int, 2>{x, y}),
-                          reference_prediction(engine, ref, bx, by, w, h))
+                          reference_prediction(coder, ref, bx, by, w, h))
                     << w << "x" << h << " at block (" << bx << ", " << by << ") of macroblock ("
-                    << engine.g_mb_x << ", " << engine.g_mb_y << ")";
+                    << coder.g_mb_x << ", " << coder.g_mb_y << ")";
             }
         }
     }
@@ -170,15 +173,16 @@ protected:
                     static_cast<std::uint8_t>(value);
             }
         }
-        engine_.framePredInitP();
-        engine_.make_half_pixel_sds(32 + engine_.g_pad_luma - 3);
+        picture_.framePredInitP();
+        picture_.make_half_pixel_sds(32 + picture_.g_pad_luma - 3);
     }
 
     Random random_{2};
-    CEncoder engine_{48, 32};
-    ClampedPlane y_{engine_.g_ref_y, engine_.g_stride_luma, 48, 32};
-    ClampedPlane u_{engine_.g_ref_u, engine_.g_stride_chroma, 24, 16};
-    ClampedPlane v_{engine_.g_ref_v, engine_.g_stride_chroma, 24, 16};
+    Picture picture_{48, 32, zolt::best_kernels()};
+    MacroblockCoder coder_{picture_};
+    ClampedPlane y_{picture_.g_ref_y, picture_.g_stride_luma, 48, 32};
+    ClampedPlane u_{picture_.g_ref_u, picture_.g_stride_chroma, 24, 16};
+    ClampedPlane v_{picture_.g_ref_v, picture_.g_stride_chroma, 24, 16};
 };
 
 TEST_F(InterPrediction, EveryPositionInAndAroundThePicture) {
@@ -187,13 +191,13 @@ TEST_F(InterPrediction, EveryPositionInAndAroundThePicture) {
         const int mvx = random_.between(-limit, limit), mvy = random_.between(-limit, limit);
         const int mb_x = random_.between(0, 2), mb_y = random_.between(0, 1);
         alignas(32) std::uint8_t pred[256];
-        engine_.qpmc_16x16_L0(pred, mvx, mvy, 16 * mb_x, 16 * mb_y);
+        coder_.qpmc_16x16_L0(pred, mvx, mvy, 16 * mb_x, 16 * mb_y);
         for (int i = 0; i < 256; ++i) {
             const int x = 16 * mb_x + i % 16 + (mvx >> 2), y = 16 * mb_y + i / 16 + (mvy >> 2);
             ASSERT_EQ(pred[i], luma_sample(y_, x, y, mvx & 3, mvy & 3))
                 << "luma at " << i << " for vector (" << mvx << ", " << mvy << ")";
         }
-        engine_.qpmc_c_core(pred, mvx, mvy, 8 * mb_x, 8 * mb_y);
+        coder_.qpmc_c_core(pred, mvx, mvy, 8 * mb_x, 8 * mb_y);
         for (int i = 0; i < 128; ++i) {
             const int x = 8 * mb_x + i % 8 + (mvx >> 3), y = 8 * mb_y + i / 8 % 8 + (mvy >> 3);
             ASSERT_EQ(pred[i], chroma_sample(i < 64 ? u_ : v_, x, y, mvx & 7, mvy & 7))

@@ -19,18 +19,18 @@ using zolt_test::Sequence;
 
 TEST(RateControl, QuantiserSteps) {
     for (int qp = 0; qp <= 51; ++qp) {
-        EXPECT_EQ(CEncoder::Qstep2QP(CEncoder::QP2Qstep(qp)), qp);
+        EXPECT_EQ(RateControl::Qstep2QP(RateControl::QP2Qstep(qp)), qp);
         // 2^(1/6) a QP, as the standard's steps nearly are.
-        EXPECT_NEAR(CEncoder::QP2Qstep(qp) / (0.625 * std::exp2(qp / 6.0)), 1, 0.04);
+        EXPECT_NEAR(RateControl::QP2Qstep(qp) / (0.625 * std::exp2(qp / 6.0)), 1, 0.04);
     }
     const double infinity = std::numeric_limits<double>::infinity();
-    EXPECT_EQ(CEncoder::Qstep2QP(0.5), 0);
-    EXPECT_EQ(CEncoder::Qstep2QP(-infinity), 0);
-    EXPECT_EQ(CEncoder::Qstep2QP(300), 51);
-    EXPECT_EQ(CEncoder::Qstep2QP(infinity), 51);
-    EXPECT_EQ(CEncoder::Qstep2QP(0.65625), 0);
-    EXPECT_EQ(CEncoder::Qstep2QP(std::nextafter(0.65625, 1)), 1);
-    EXPECT_EQ(CEncoder::Qstep2QP(NAN), 5) << "falls through every comparison";
+    EXPECT_EQ(RateControl::Qstep2QP(0.5), 0);
+    EXPECT_EQ(RateControl::Qstep2QP(-infinity), 0);
+    EXPECT_EQ(RateControl::Qstep2QP(300), 51);
+    EXPECT_EQ(RateControl::Qstep2QP(infinity), 51);
+    EXPECT_EQ(RateControl::Qstep2QP(0.65625), 0);
+    EXPECT_EQ(RateControl::Qstep2QP(std::nextafter(0.65625, 1)), 1);
+    EXPECT_EQ(RateControl::Qstep2QP(NAN), 5) << "falls through every comparison";
 }
 
 TEST(RateControl, QpOfTheFirstPictures) {
@@ -55,7 +55,7 @@ TEST(RateControl, QpOfTheFirstPictures) {
         for (int n = 0; n < 2; ++n) {
             engine.encode_frame(picture.data());
             engine.reset_nal_buffer();
-            EXPECT_EQ(engine.g_mb_qp[0], c.qp) << "picture " << n << " at " << c.bit_rate;
+            EXPECT_EQ(engine.picture.g_mb_qp[0], c.qp) << "picture " << n << " at " << c.bit_rate;
         }
     }
 }
@@ -254,6 +254,12 @@ struct Costs {
     }
 };
 
+// What the engine does before it codes a picture.
+void choose_qp(CEncoder& engine) {
+    engine.picture.g_mbQp = engine.rate_control.FrameLevelRateControl(
+        engine.rate_control_stream(), engine.rate_control_picture());
+}
+
 // An engine, its settings changing, and the controller that follows it.
 class Stream {
 public:
@@ -299,12 +305,13 @@ public:
             }
             sequence_.draw(n % sequence_.pictures, picture_.data());
             sum += 8 * static_cast<std::int64_t>(encoding_.encode(picture_.data()).size());
-            EXPECT_EQ(engine().g_mb_qp[0], expected_.qp) << "picture " << n;
+            EXPECT_EQ(engine().picture.g_mb_qp[0], expected_.qp) << "picture " << n;
             std::int64_t sad = 0;
-            for (int mb = 0; mb < engine().g_num_mbs; ++mb) {
-                sad += engine().g_mv_array[mb].sad;
+            for (int mb = 0; mb < engine().picture.g_num_mbs; ++mb) {
+                sad += engine().picture.g_mv_array[mb].sad;
             }
-            expected_.coded(static_cast<int>(engine().g_slice_bits), sad, engine().g_num_mbs);
+            expected_.coded(static_cast<int>(engine().g_slice_bits), sad,
+                            engine().picture.g_num_mbs);
             check(n);
         }
         return sum;
@@ -319,28 +326,30 @@ public:
             int bits = random.between(0, costs.max_bits), raise = 0;
             const bool still = random.between(0, 30) == 0;
             std::int64_t sad = 0;
-            for (int mb = 0; mb < engine().g_num_mbs; ++mb) {
-                engine().g_mv_array[mb].sad = still ? 0 : costs.sad();
-                sad += engine().g_mv_array[mb].sad;
+            for (int mb = 0; mb < engine().picture.g_num_mbs; ++mb) {
+                engine().picture.g_mv_array[mb].sad = still ? 0 : costs.sad();
+                sad += engine().picture.g_mv_array[mb].sad;
             }
             if (expected_.rate > 0) {
                 expected_.choose();
-                engine().FrameLevelRateControl();
+                choose_qp(engine());
                 if (random.between(0, 3) == 0) {  // to, or just past, a limit of the I pictures
                     const int limit = 800000 * random.between(3, 4) + random.between(-1, 1);
                     const double budget = std::ceil(expected_.rate / expected_.frame_rate);
                     bits = static_cast<int>(std::clamp(limit - expected_.buffer + budget, 0., 1e9));
                 }
                 raise = random.between(0, 15) == 0 ? 4 : 0;
-                engine().g_mbQp = std::min(engine().g_mbQp + raise, 51);
+                engine().picture.g_mbQp = std::min(engine().picture.g_mbQp + raise, 51);
                 engine().g_slice_bits = static_cast<unsigned>(bits);
-                engine().UpdateFrameLevelRateControl();
+                engine().rate_control.UpdateFrameLevelRateControl(
+                    engine().rate_control_stream(), engine().rate_control_picture(),
+                    engine().picture.g_mbQp, bits, sad, engine().picture.g_num_mbs);
             } else {
-                engine().g_rc_period = 0;
+                engine().rate_control.g_rc_period = 0;
             }
             ++engine().g_coded_frames;
             ++engine().g_frame_counter;
-            expected_.coded(bits, sad, engine().g_num_mbs, raise);
+            expected_.coded(bits, sad, engine().picture.g_num_mbs, raise);
             check(n);
         }
     }
@@ -349,7 +358,7 @@ private:
     void check(int n) {
         const CEncoder& e = engine();
         const Controller& c = expected_;
-        EXPECT_EQ(e.g_mbQp, c.qp) << "picture " << n;
+        EXPECT_EQ(e.picture.g_mbQp, c.qp) << "picture " << n;
         if (c.rate == 0) {
             return;
         }
@@ -357,33 +366,33 @@ private:
             EXPECT_TRUE(is == expected || (std::isnan(is) && std::isnan(expected)))
                 << name << " of picture " << n << ": " << is << ", not " << expected;
         };
-        expect("last QP", e.g_rc_prev_qp, c.qp);
-        expect("I picture's QP", e.g_rc_i_qp, c.i_qp);
-        expect("QP range", e.g_rc_qp_range, c.range);
-        expect("buffer", e.g_rc_buffer, c.buffer);
-        expect("target level", e.g_rc_target_level, c.level);
-        expect("bits", e.g_rc_prev_bits, c.bits);
-        expect("budget", e.g_rc_remaining_bits, c.remaining);
-        expect("target", e.g_rc_target_bits, c.target);
-        expect("complexity", e.g_rc_xp, c.xp);
-        expect("MAD", e.g_rc_cur_mad, c.mad);
-        expect("predicted MAD", e.g_rc_pred_mad, c.predicted_mad);
-        expect("c1", e.g_rc_mad_c1, c.c1);
-        expect("c2", e.g_rc_mad_c2, c.c2);
-        expect("x1", e.g_rc_x1, c.x1);
-        expect("x2", e.g_rc_x2, c.x2);
-        expect("first P", e.g_rc_first_p, c.history.empty());
+        expect("last QP", e.rate_control.g_rc_prev_qp, c.qp);
+        expect("I picture's QP", e.rate_control.g_rc_i_qp, c.i_qp);
+        expect("QP range", e.rate_control.g_rc_qp_range, c.range);
+        expect("buffer", e.rate_control.g_rc_buffer, c.buffer);
+        expect("target level", e.rate_control.g_rc_target_level, c.level);
+        expect("bits", e.rate_control.g_rc_prev_bits, c.bits);
+        expect("budget", e.rate_control.g_rc_remaining_bits, c.remaining);
+        expect("target", e.rate_control.g_rc_target_bits, c.target);
+        expect("complexity", e.rate_control.g_rc_xp, c.xp);
+        expect("MAD", e.rate_control.g_rc_cur_mad, c.mad);
+        expect("predicted MAD", e.rate_control.g_rc_pred_mad, c.predicted_mad);
+        expect("c1", e.rate_control.g_rc_mad_c1, c.c1);
+        expect("c2", e.rate_control.g_rc_mad_c2, c.c2);
+        expect("x1", e.rate_control.g_rc_x1, c.x1);
+        expect("x2", e.rate_control.g_rc_x2, c.x2);
+        expect("first P", e.rate_control.g_rc_first_p, c.history.empty());
         const std::size_t end = c.history.size();
-        expect("index", e.g_rc_hist_idx, end % 16);
-        expect("count", e.g_rc_hist_count, c.newest(16));
+        expect("index", e.rate_control.g_rc_hist_idx, end % 16);
+        expect("count", e.rate_control.g_rc_hist_count, c.newest(16));
         Controller::Picture slots[16] = {};
         for (std::size_t i = end - static_cast<std::size_t>(c.newest(16)); i < end; ++i) {
             slots[i % 16] = c.history[i];
         }
         for (int i = 0; i < 16; ++i) {
-            EXPECT_TRUE(e.g_rc_mad_hist[i] == slots[i].mad &&
-                        e.g_rc_rate_hist[i] == slots[i].rate &&
-                        e.g_rc_qstep_hist[i] == slots[i].qstep)
+            EXPECT_TRUE(e.rate_control.g_rc_mad_hist[i] == slots[i].mad &&
+                        e.rate_control.g_rc_rate_hist[i] == slots[i].rate &&
+                        e.rate_control.g_rc_qstep_hist[i] == slots[i].qstep)
                 << "slot " << i << " after picture " << n;
         }
     }
@@ -490,7 +499,7 @@ TEST(ChangingSettings, LongestIntraPeriods) {
     for (const int period : {327659, 327660, 1000000, kLongest}) {
         Stream stream(100000, period);
         stream.code(60);
-        EXPECT_EQ(stream.engine().g_rc_qp_range, std::min(period / 10 + 2, 32767));
+        EXPECT_EQ(stream.engine().rate_control.g_rc_qp_range, std::min(period / 10 + 2, 32767));
     }
     // Counters and budget stay at their ends.
     Stream stream(100000, kLongest);
@@ -498,14 +507,15 @@ TEST(ChangingSettings, LongestIntraPeriods) {
     CEncoder& engine = stream.engine();
     engine.g_pic_type = P_SLICE;
     engine.g_gop_pos = kLongest - 1;
-    engine.g_rc_coded_p = engine.g_rc_np = engine.g_rc_gop_len = kLongest;
-    engine.g_rc_remaining_bits = std::numeric_limits<int>::min() + 1;
-    engine.g_rc_prev_bits = 2;
-    engine.FrameLevelRateControl();
-    EXPECT_EQ(engine.g_rc_coded_p, kLongest);
-    EXPECT_EQ(engine.g_rc_np, kLongest);
-    EXPECT_EQ(engine.g_rc_gop_len, kLongest);
-    EXPECT_EQ(engine.g_rc_remaining_bits, std::numeric_limits<int>::min());
+    engine.rate_control.g_rc_coded_p = engine.rate_control.g_rc_np =
+        engine.rate_control.g_rc_gop_len = kLongest;
+    engine.rate_control.g_rc_remaining_bits = std::numeric_limits<int>::min() + 1;
+    engine.rate_control.g_rc_prev_bits = 2;
+    choose_qp(engine);
+    EXPECT_EQ(engine.rate_control.g_rc_coded_p, kLongest);
+    EXPECT_EQ(engine.rate_control.g_rc_np, kLongest);
+    EXPECT_EQ(engine.rate_control.g_rc_gop_len, kLongest);
+    EXPECT_EQ(engine.rate_control.g_rc_remaining_bits, std::numeric_limits<int>::min());
 }
 
 // A model that is not a number anywhere gives the Qstep that falls through every comparison, QP 5,
@@ -516,21 +526,23 @@ TEST(ChangingSettings, NotANumberStaysInsideTheLimits) {
     CEncoder& engine = stream.engine();
     engine.g_pic_type = P_SLICE;
     engine.g_gop_pos = 5;
-    for (double* number : {&engine.g_rc_x1, &engine.g_rc_cur_mad, &engine.g_rc_x2}) {
-        engine.g_rc_prev_qp = 30;
-        engine.g_rc_i_qp = 30;
-        engine.g_rc_buffer = engine.g_rc_target_level;  // a target of some bits
+    for (double* number : {&engine.rate_control.g_rc_x1, &engine.rate_control.g_rc_cur_mad,
+                           &engine.rate_control.g_rc_x2}) {
+        engine.rate_control.g_rc_prev_qp = 30;
+        engine.rate_control.g_rc_i_qp = 30;
+        engine.rate_control.g_rc_buffer =
+            engine.rate_control.g_rc_target_level;  // a target of some bits
         const double kept = *number;
         *number = NAN;
-        engine.FrameLevelRateControl();
-        EXPECT_EQ(engine.g_mbQp, 28);
+        choose_qp(engine);
+        EXPECT_EQ(engine.picture.g_mbQp, 28);
         *number = kept;
     }
     // A number of bits that is none is 0.
-    engine.g_rc_frame_rate = NAN;
+    engine.rate_control.g_rc_frame_rate = NAN;
     engine.g_pic_type = I_SLICE;
-    engine.FrameLevelRateControl();
-    EXPECT_EQ(engine.g_rc_remaining_bits, 0);
+    choose_qp(engine);
+    EXPECT_EQ(engine.rate_control.g_rc_remaining_bits, 0);
 }
 
 }  // namespace

@@ -366,13 +366,14 @@ Vector predicted_vector(const CEncoder& e, int mb_x, int mb_y) {
         int ref, x, y;
     };
     const auto motion = [&](bool available, int x, int y) {
-        const int block = available ? (4 * mb_y + y) * e.g_blk_width + 4 * mb_x + x : 0;
-        return available ? Motion{true, e.g_blk_ref[block], e.g_blk_mvx[block], e.g_blk_mvy[block]}
+        const int block = available ? (4 * mb_y + y) * e.picture.g_blk_width + 4 * mb_x + x : 0;
+        return available ? Motion{true, e.picture.g_blk_ref[block], e.picture.g_blk_mvx[block],
+                                  e.picture.g_blk_mvy[block]}
                          : Motion{false, -1, 0, 0};
     };
     const Motion a = motion(mb_x > 0, -1, 0);
     const Motion b = motion(mb_y > 0, 0, -1);
-    Motion c = motion(mb_y > 0 && mb_x < e.g_mb_width - 1, 4, -1);
+    Motion c = motion(mb_y > 0 && mb_x < e.picture.g_mb_width - 1, 4, -1);
     if (!c.available) {
         c = motion(mb_x > 0 && mb_y > 0, -1, -1);
     }
@@ -394,7 +395,7 @@ Record record(const _mv& m) {
 
 // What the engine found for a macroblock. The record of the integer stage has no fractions.
 Found engine_found(const CEncoder& e, int mb) {
-    Found found{record(e.g_me_mb_L0[mb]), record(e.g_mv_array[mb])};
+    Found found{record(e.picture.g_me_mb_L0[mb]), record(e.picture.g_mv_array[mb])};
     found.integer.dx = found.integer.dy = 0;
     return found;
 }
@@ -411,20 +412,20 @@ std::string compare(const Sequence& sequence, const Settings& settings, int& sea
         if (n % settings.intra_period == 0) {
             continue;
         }
-        SearchModel model(e.g_width16, e.g_height16, source.data(), sequence.width,
+        SearchModel model(e.picture.g_width16, e.picture.g_height16, source.data(), sequence.width,
                           reference.data());
-        for (int mb = 0; mb < e.g_num_mbs; ++mb, ++searches) {
-            const int mb_x = mb % e.g_mb_width, mb_y = mb / e.g_mb_width;
+        for (int mb = 0; mb < e.picture.g_num_mbs; ++mb, ++searches) {
+            const int mb_x = mb % e.picture.g_mb_width, mb_y = mb / e.picture.g_mb_width;
             const Vector predicted = predicted_vector(e, mb_x, mb_y);
-            const Found model_found =
-                model.search(mb_x, mb_y, predicted, kLambda[std::max(e.g_mb_qp[mb] - 12, 0)]);
+            const Found model_found = model.search(
+                mb_x, mb_y, predicted, kLambda[std::max(e.picture.g_mb_qp[mb] - 12, 0)]);
             const Found found = engine_found(e, mb);
             // A macroblock coded in inter mode is coded with the vector that was found.
-            const int block = 4 * mb_y * e.g_blk_width + 4 * mb_x;
-            const Vector coded = {e.g_blk_mvx[block], e.g_blk_mvy[block]};
+            const int block = 4 * mb_y * e.picture.g_blk_width + 4 * mb_x;
+            const Vector coded = {e.picture.g_blk_mvx[block], e.picture.g_blk_mvy[block]};
             const Record& r = model_found.refined;
-            const bool as_found =
-                e.g_blk_ref[block] < 0 || (coded.x == 4 * r.x + r.dx && coded.y == 4 * r.y + r.dy);
+            const bool as_found = e.picture.g_blk_ref[block] < 0 ||
+                                  (coded.x == 4 * r.x + r.dx && coded.y == 4 * r.y + r.dy);
             if (!(found == model_found) || !as_found) {
                 std::ostringstream message;
                 message << sequence.name << " " << settings.name() << " picture " << n
@@ -580,14 +581,14 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
         CEncoder e(width, height, &kernels);
         for (int y = 0; y < height; ++y) {
             std::copy_n(&source[static_cast<std::size_t>(y * width)], width,
-                        e.g_cur_y + y * e.g_stride_luma);
+                        e.picture.g_cur_y + y * e.picture.g_stride_luma);
             std::copy_n(&reference[static_cast<std::size_t>(y * width)], width,
-                        e.g_ref_y + y * e.g_stride_luma);
+                        e.picture.g_ref_y + y * e.picture.g_stride_luma);
         }
-        e.framePredInitP();
+        e.picture.framePredInitP();
         SearchModel model(width, height, source.data(), width, reference.data());
-        for (int n = 0; n < 32 * e.g_num_mbs; ++n) {
-            const int mb = n % e.g_num_mbs;
+        for (int n = 0; n < 32 * e.picture.g_num_mbs; ++n) {
+            const int mb = n % e.picture.g_num_mbs;
             const int reach = std::array{1, 4, 20, 38}[random.next() % 4];
             // Anywhere, or where the block is about to leave the picture's surroundings.
             const auto component = [&](int position, int size) {
@@ -595,12 +596,12 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
                 return random.between(0, 1) ? random.between(-reach, reach)
                                             : edge + random.between(-3, 3);
             };
-            const Vector about = {component(16 * (mb % e.g_mb_width), width),
-                                  component(16 * (mb / e.g_mb_width), height)};
+            const Vector about = {component(16 * (mb % e.picture.g_mb_width), width),
+                                  component(16 * (mb / e.picture.g_mb_width), height)};
             const int near = random.between(0, 3);
             const int grid = random.between(0, 1) ? 4 : 1;  // 4: on the spiral's points
             const unsigned most = random.between(0, 1) ? 1100u : 20000u;
-            for (int other = 0; other < e.g_num_mbs; ++other) {
+            for (int other = 0; other < e.picture.g_num_mbs; ++other) {
                 Record r;
                 const auto around = [&](int v) {
                     return std::clamp((v / grid + random.between(-near, near)) * grid, -38, 38);
@@ -609,7 +610,7 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
                 r.y = around(about.y);
                 r.sad = random.next() % most;
                 model.keep(other, r);
-                _mv& kept = e.g_me_mb_L0[other];
+                _mv& kept = e.picture.g_me_mb_L0[other];
                 kept.x = static_cast<std::int16_t>(r.x);
                 kept.y = static_cast<std::int16_t>(r.y);
                 kept.sad = r.sad;
@@ -617,24 +618,29 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
                 const int mvx = ref < 0 ? 0 : 4 * r.x + random.between(-12, 12);
                 const int mvy = ref < 0 ? 0 : 4 * r.y + random.between(-12, 12);
                 for (int block = 0; block < 16; ++block) {
-                    const int at = (4 * (other / e.g_mb_width) + block / 4) * e.g_blk_width +
-                                   4 * (other % e.g_mb_width) + block % 4;
-                    e.g_blk_ref[at] = static_cast<std::int8_t>(ref);
-                    e.g_blk_mvx[at] = static_cast<std::int16_t>(mvx);
-                    e.g_blk_mvy[at] = static_cast<std::int16_t>(mvy);
+                    const int at =
+                        (4 * (other / e.picture.g_mb_width) + block / 4) * e.picture.g_blk_width +
+                        4 * (other % e.picture.g_mb_width) + block % 4;
+                    e.picture.g_blk_ref[at] = static_cast<std::int8_t>(ref);
+                    e.picture.g_blk_mvx[at] = static_cast<std::int16_t>(mvx);
+                    e.picture.g_blk_mvy[at] = static_cast<std::int16_t>(mvy);
                 }
             }
-            e.g_mapMBNumber = mb;
-            e.g_mbQp = random.between(0, 3) ? random.between(0, 24) : 51;
-            e.setMBOffsets();
-            e.generateMBPred();
-            const Vector predicted = predicted_vector(e, e.g_mb_x, e.g_mb_y);
+            e.rows.coders[0]->g_mapMBNumber = mb;
+            e.rows.coders[0]->g_mb_x = mb % e.picture.g_mb_width;
+            e.rows.coders[0]->g_mb_y = mb / e.picture.g_mb_width;
+            e.picture.g_mbQp = random.between(0, 3) ? random.between(0, 24) : 51;
+            e.rows.coders[0]->setMBOffsets();
+            e.rows.coders[0]->generateMBPred();
+            const Vector predicted =
+                predicted_vector(e, e.rows.coders[0]->g_mb_x, e.rows.coders[0]->g_mb_y);
             const Found model_found =
-                model.search(e.g_mb_x, e.g_mb_y, predicted, kLambda[std::max(e.g_mbQp - 12, 0)]);
+                model.search(e.rows.coders[0]->g_mb_x, e.rows.coders[0]->g_mb_y, predicted,
+                             kLambda[std::max(e.picture.g_mbQp - 12, 0)]);
             ASSERT_EQ(engine_found(e, mb), model_found)
                 << sequence.name << " " << kernels.name << " search " << n << " macroblock "
-                << Vector{e.g_mb_x, e.g_mb_y} << ", predicted " << predicted << "/4, QP "
-                << e.g_mbQp;
+                << Vector{e.rows.coders[0]->g_mb_x, e.rows.coders[0]->g_mb_y} << ", predicted "
+                << predicted << "/4, QP " << e.picture.g_mbQp;
         }
     }
 }

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "common/Random.h"
-#include "encoder/CEncoder.h"
+#include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -138,17 +138,17 @@ TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
     };
     Kernels kernels = zolt::scalar_kernels();
     kernels.code_residual_16x16 = stand_in_residual;
-    CEncoder engine(16, 16, &kernels);
-    engine.initialize_encoder();
-    engine.g_slp->sliceType = P_SLICE;
-    engine.setMBOffsets();
+    Picture picture(16, 16, kernels);
+    MacroblockCoder coder(picture);
+    picture.g_slp->sliceType = P_SLICE;
+    coder.setMBOffsets();
     for (const auto& c : cases) {
         std::fill(stand_in_levels[0], stand_in_levels[0] + 256, std::int16_t{0});
         for (const Level& l : c.levels) {
             stand_in_levels[l.block][l.position] = static_cast<std::int16_t>(l.level);
         }
-        engine.quantTransform_luma_16x16P();
-        EXPECT_EQ(engine.g_luma_mask, c.kept) << c.why;
+        coder.quantTransform_luma_16x16P();
+        EXPECT_EQ(coder.g_luma_mask, c.kept) << c.why;
     }
 }
 

@@ -10,6 +10,7 @@
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
 #include "media/IMediaFileSample.h"
+#include "media/IParallelRunner.h"
 #include "media/ISample.h"
 #include "media/ISampleStreamConfig.h"
 
@@ -58,7 +59,10 @@ TEST(InterfaceSlots, StandInTheOrderThatHostsRelyOn) {
     expect_slots(0, &IVideoEncSettings::GetBitRateKbs, &IVideoEncSettings::SetBitRateKbs,
                  &IVideoEncSettings::GetKeyFrameIntMsecs, &IVideoEncSettings::SetKeyFrameIntMsecs,
                  &IVideoEncSettings::GetKeyFrameInt, &IVideoEncSettings::SetKeyFrameInt,
-                 &IVideoEncSettings::GetNumBframes, &IVideoEncSettings::SetNumBframes);
+                 &IVideoEncSettings::GetNumBframes, &IVideoEncSettings::SetNumBframes,
+                 &IVideoEncSettings::SetParallelRunner);
+    expect_slots(0, &IParallelTask::Run);
+    expect_slots(0, &IParallelRunner::GetThreads, &IParallelRunner::Run);
     expect_slots(0, &IVideoEncRunTimeControl::SupportsChangingBitRate,
                  &IVideoEncRunTimeControl::ChangeBitRateKbs,
                  &IVideoEncRunTimeControl::ForceIntraFrame,

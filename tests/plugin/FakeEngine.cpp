@@ -33,10 +33,17 @@ void note(const char* call, double value) {
 
 }  // namespace
 
-CEncoder::CEncoder(int width, int height, const zolt::Kernels*) : g_width(width), g_height(height) {
+// The rooms of the engine hold no more than the size.
+Picture::Picture(int width, int height, const zolt::Kernels&) : g_width(width), g_height(height) {}
+Picture::~Picture() = default;
+Wavefront::Wavefront(Picture& shared) : picture(shared) {}
+RateControl::RateControl(int, int) {}
+
+CEncoder::CEncoder(int width, int height, const zolt::Kernels*)
+    : picture(width, height, zolt::scalar_kernels()), rows(picture), rate_control(width, height) {
     note("width", width);
     note("height", height);
-    g_nal_buf.allocate(16);
+    nal.g_nal_buf.allocate(16);
     ++FakeEngine::alive;
 }
 
@@ -76,35 +83,35 @@ void CEncoder::initialize_encoder() {
 void CEncoder::encode_sps() {
     note("sps");
     const std::uint8_t unit[] = {0x47, 1, 2};
-    std::copy(unit, unit + 3, g_nal_buf.data());
-    g_nal_bitpos = 24;
+    std::copy(unit, unit + 3, nal.g_nal_buf.data());
+    nal.g_nal_bitpos = 24;
 }
 
 void CEncoder::encode_pps() {
     note("pps");
     const std::uint8_t unit[] = {0x48, 3};
-    std::copy(unit, unit + 2, g_nal_buf.data());
-    g_nal_bitpos = 16;
+    std::copy(unit, unit + 2, nal.g_nal_buf.data());
+    nal.g_nal_bitpos = 16;
 }
 
 void CEncoder::encode_frame(const void* frame) {
     note("encode");
     FakeEngine::address = frame;
     const auto* bytes = static_cast<const unsigned char*>(frame);
-    FakeEngine::frame.assign(bytes, bytes + g_width * g_height * 3 / 2);
-    g_nal_buf[0] = g_frame_counter % g_intra_period == 0 ? 0x65 : 0x41;
-    g_nal_buf[1] = static_cast<std::uint8_t>(g_frame_counter);
-    g_nal_bitpos = 16;
+    FakeEngine::frame.assign(bytes, bytes + picture.g_width * picture.g_height * 3 / 2);
+    nal.g_nal_buf[0] = g_frame_counter % g_intra_period == 0 ? 0x65 : 0x41;
+    nal.g_nal_buf[1] = static_cast<std::uint8_t>(g_frame_counter);
+    nal.g_nal_bitpos = 16;
     ++g_frame_counter;
 }
 
 int CEncoder::copy_nal_unit(void* dst, int max) const {
     const int size = std::min(get_nal_size(), max);
-    std::copy_n(g_nal_buf.data(), size, static_cast<std::uint8_t*>(dst));
+    std::copy_n(nal.g_nal_buf.data(), size, static_cast<std::uint8_t*>(dst));
     return size;
 }
 
 void CEncoder::ResetNALUnit() {
     note("reset");
-    g_nal_bitpos = 0;
+    nal.g_nal_bitpos = 0;
 }

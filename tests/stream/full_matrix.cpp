@@ -68,19 +68,21 @@ struct Figures {
 
     void add(const CEncoder& e, const Bytes& source, const Bytes& nal, const Bytes& coded) {
         bits += 8.0 * static_cast<double>(nal.size());
-        for (int y = 0; y < e.g_height16; ++y) {
-            for (int x = 0; x < e.g_width16; ++x) {
-                const int difference = source[static_cast<std::size_t>(y * e.g_width + x)] -
-                                       coded[static_cast<std::size_t>(y * e.g_width16 + x)];
+        for (int y = 0; y < e.picture.g_height16; ++y) {
+            for (int x = 0; x < e.picture.g_width16; ++x) {
+                const int difference = source[static_cast<std::size_t>(y * e.picture.g_width + x)] -
+                                       coded[static_cast<std::size_t>(y * e.picture.g_width16 + x)];
                 squared_error += difference * difference;
             }
         }
-        samples += e.g_width16 * e.g_height16;
-        for (int mb = 0; mb < e.g_num_mbs; ++mb) {
-            ++(e.g_mb_mode[mb] == MB_SKIP ? skipped : e.g_mb_mode[mb] == MB_P16x16 ? inter : intra);
+        samples += e.picture.g_width16 * e.picture.g_height16;
+        for (int mb = 0; mb < e.picture.g_num_mbs; ++mb) {
+            ++(e.picture.g_mb_mode[mb] == MB_SKIP     ? skipped
+               : e.picture.g_mb_mode[mb] == MB_P16x16 ? inter
+                                                      : intra);
         }
-        lowest_qp = std::min<int>(lowest_qp, e.g_mb_qp[0]);
-        highest_qp = std::max<int>(highest_qp, e.g_mb_qp[0]);
+        lowest_qp = std::min<int>(lowest_qp, e.picture.g_mb_qp[0]);
+        highest_qp = std::max<int>(highest_qp, e.picture.g_mb_qp[0]);
     }
 
     std::string text(double seconds) const {

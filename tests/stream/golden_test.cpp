@@ -10,6 +10,7 @@
 #include <sstream>
 
 #include "common/Encoding.h"
+#include "common/Workers.h"
 
 namespace {
 
@@ -64,9 +65,10 @@ std::string digest(const std::vector<std::uint8_t>& bytes) {
     return digits.str();
 }
 
-Digests digests(const Case& c, const zolt::Kernels* kernels) {
+Digests digests(const Case& c, const zolt::Kernels* kernels, WorkerPool* pool = nullptr) {
     const Sequence sequence = c.sequence();
     Encoding encoding(sequence.width, sequence.height, c.settings, kernels);
+    encoding.engine().set_worker_pool(pool);
     std::vector<std::uint8_t> picture(sequence.picture_size());
     Digests result;
     for (int n = 0; n < sequence.pictures; ++n) {
@@ -108,21 +110,43 @@ protected:
         if (std::getenv("ZOLT_WRITE_GOLDEN")) {
             write_golden();
         }
+        golden = read_golden();
     }
-};
 
-TEST_P(Golden, EveryTableGivesTheStream) {
-    const std::map<std::string, Digests> golden = read_golden();
-    const Case& c = GetParam();
-    ASSERT_EQ(golden.count(c.name()), 1u) << kFile << " does not have it";
-    const Digests& expected = golden.at(c.name());
-    for (const zolt::Kernels& kernels : zolt::kernel_tables()) {
-        const Digests actual = digests(c, &kernels);
-        ASSERT_EQ(actual.size(), expected.size());
+    static void expect_golden(const Digests& actual, const std::string& how) {
+        const Digests& expected = golden[GetParam().name()];
+        ASSERT_EQ(actual.size(), expected.size()) << kFile << " does not have it, or not so long";
         for (std::size_t n = 0; n < actual.size(); ++n) {
             ASSERT_EQ(actual[n], expected[n])
-                << "picture " << n << " is the first that differs, table " << kernels.name;
+                << "picture " << n << " is the first that differs, " << how;
         }
+    }
+
+    static std::map<std::string, Digests> golden;
+};
+
+std::map<std::string, Digests> Golden::golden;
+
+TEST_P(Golden, EveryTableGivesTheStream) {
+    for (const zolt::Kernels& kernels : zolt::kernel_tables()) {
+        expect_golden(digests(GetParam(), &kernels), kernels.name);
+        for (const int count : {2, 3, 8}) {
+            zolt_test::Workers workers(count);
+            expect_golden(digests(GetParam(), &kernels, &workers),
+                          kernels.name + std::string(", workers: ") + std::to_string(count));
+        }
+    }
+}
+
+TEST_P(Golden, EveryRunnerGivesTheStream) {
+    using zolt_test::Order;
+    const std::pair<int, Order> runners[] = {
+        {2, Order::kAtOnce},   {3, Order::kAtOnce},  {5, Order::kAtOnce},    {4, Order::kSerial},
+        {4, Order::kReversed}, {3, Order::kDelayed}, {1000, Order::kSerial}, {-1, Order::kSerial}};
+    for (const auto& [count, order] : runners) {
+        zolt_test::Workers workers(count, order);
+        expect_golden(digests(GetParam(), nullptr, &workers),
+                      order_name(order) + ", workers: " + std::to_string(count));
     }
 }
 

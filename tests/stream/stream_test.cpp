@@ -188,7 +188,7 @@ TEST(SliceHeaders, CountersGoRound) {
 std::size_t bits_in_a_large_buffer(const Sequence& sequence, const Bytes& picture, int qp) {
     Encoding encoding(sequence.width, sequence.height, {qp, 0, 3});
     const std::size_t bytes = 4 * sequence.picture_size();
-    EXPECT_TRUE(encoding.engine().g_nal_buf.allocate(bytes));
+    EXPECT_TRUE(encoding.engine().nal.g_nal_buf.allocate(bytes));
     encoding.engine().g_nal_buf_size = static_cast<int>(bytes) - 64;
     return 8 * encoding.encode(picture.data()).size();
 }
@@ -220,15 +220,17 @@ TEST(Recoding, ReachesAQpThatFits) {
         const auto check = [&](CEncoder& engine, int n, const Bytes&, const Bytes& nal,
                                const Bytes&) {
             const int qp = slice_header(nal).qp;
-            EXPECT_EQ(qp, engine.g_mb_qp[0]);
+            EXPECT_EQ(qp, engine.picture.g_mb_qp[0]);
             if (bit_rate == 0) {
                 EXPECT_GT(qp, 0);
-                EXPECT_EQ(engine.g_mbQp, 0) << "the next picture starts from the QP that was set";
+                EXPECT_EQ(engine.picture.g_mbQp, 0)
+                    << "the next picture starts from the QP that was set";
             } else if (n == 0) {
                 EXPECT_GT(qp, 1);
-                EXPECT_EQ(engine.g_rc_prev_qp, qp);
-                EXPECT_EQ(engine.g_rc_i_qp, qp);
-                EXPECT_EQ(engine.g_rc_prev_bits, static_cast<int>(engine.g_slice_bits));
+                EXPECT_EQ(engine.rate_control.g_rc_prev_qp, qp);
+                EXPECT_EQ(engine.rate_control.g_rc_i_qp, qp);
+                EXPECT_EQ(engine.rate_control.g_rc_prev_bits,
+                          static_cast<int>(engine.g_slice_bits));
             }
         };
         EXPECT_EQ(check_stream(sequence, settings, {nullptr, check}), "");
@@ -261,14 +263,15 @@ TEST(VisitStamps, GoRound) {
     for (int n = 0; n < sequence.pictures; ++n) {
         CEncoder& engine = around.engine();
         if (n == 2) {
-            engine.g_visit_stamp = 0xffffffff;
-            const std::size_t dimension = static_cast<std::size_t>(engine.g_visit_dim);
-            std::fill_n(engine.g_visit_L0.data(), dimension * dimension, 1u);
+            engine.rows.coders[0]->g_visit_stamp = 0xffffffff;
+            const std::size_t dimension = static_cast<std::size_t>(engine.picture.g_visit_dim);
+            std::fill_n(engine.rows.coders[0]->g_visit_L0.data(), dimension * dimension, 1u);
         }
         sequence.draw(n, picture.data());
         EXPECT_EQ(around.encode(picture.data()), plain.encode(picture.data())) << "picture " << n;
         if (n == 2) {
-            EXPECT_EQ(engine.g_visit_stamp, 16u) << "the first of 16 searches takes stamp 1";
+            EXPECT_EQ(engine.rows.coders[0]->g_visit_stamp, 16u)
+                << "the first of 16 searches takes stamp 1";
         }
     }
 }
@@ -290,7 +293,7 @@ TEST(ChangingSettings, StreamStaysDecodable) {
     for (const char* kind : {"pan", "cut", "noise"}) {
         int qp = 0;
         const auto before = [&](CEncoder& engine, int n) {
-            qp = engine.g_mbQp;
+            qp = engine.picture.g_mbQp;
             if (changes.count(n)) {
                 changes.at(n)(engine);
             }

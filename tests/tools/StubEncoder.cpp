@@ -109,6 +109,7 @@ public:
     void SetKeyFrameInt(int frames) override { key_frame_interval_ = frames; }
     int GetNumBframes() override { return 0; }
     int SetNumBframes(int) override { return 0; }
+    void SetParallelRunner(IParallelRunner*) override {}
 
 private:
     static unsigned char* Bytes(std::string& text) {

@@ -18,7 +18,8 @@ HERE = pathlib.Path(__file__).resolve().parent
 
 # A virtual destructor is one slot of the host's table, and an operation of this name here.
 DESTRUCTOR = "DeletingDestructor"
-CLASSES = ("Session", "Uncompressed", "StreamConfig", "FileSample", "MediaSample", "ErrMgr", "Logger")
+CLASSES = ("Session", "Uncompressed", "StreamConfig", "FileSample", "MediaSample", "ErrMgr", "Logger",
+           "ParallelTask", "ParallelRunner")
 INTERFACES = ("ISampleConsumer", "ISampleProcessor", "IMediaEncoder", "IConfigVideo", "IConfigVideoAvc",
               "IConfigVideoUncompressed", "IVideoEncCapabilities", "IVideoEncSettings",
               "IVideoEncRunTimeControl", "MediaSample", "StreamConfig", "ErrMgr", "Logger")

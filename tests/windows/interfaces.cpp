@@ -8,6 +8,7 @@
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
 #include "media/IMediaFileSample.h"
+#include "media/IParallelRunner.h"
 #include "media/ISampleStreamConfig.h"
 #include "media/MediaSample.h"
 #include "media/abi.h"
@@ -54,6 +55,7 @@ public:
     void ForceIntraFrame() override {}
     bool SupportsProducingExtraIntraFrame() override { return false; }
     void ProduceExtraIntraFrame() override {}
+    void SetParallelRunner(IParallelRunner*) override {}
 };
 
 class Uncompressed : public IConfigVideoUncompressed {
@@ -73,6 +75,17 @@ public:
     int GetCryptoSessionKey(unsigned char**) override { return 0; }
     void* GetBwAdaptConfig() override { return nullptr; }
     ZOLT_DESTRUCTOR(StreamConfig) = default;
+};
+
+class ParallelTask : public IParallelTask {
+public:
+    void Run(int) noexcept override {}
+};
+
+class ParallelRunner : public IParallelRunner {
+public:
+    int GetThreads() noexcept override { return 0; }
+    void Run(IParallelTask*, int) noexcept override {}
 };
 
 class FileSample : public IMediaFileSample {
@@ -144,6 +157,8 @@ void use_all() {
     const MediaSample sample;
     const ErrMgr err_mgr;
     const Logger logger;
+    const ParallelTask task;
+    const ParallelRunner runner;
     use(&session);
     use(&uncompressed);
     use(&stream_config);
@@ -151,4 +166,6 @@ void use_all() {
     use(&sample);
     use(&err_mgr);
     use(&logger);
+    use(&task);
+    use(&runner);
 }

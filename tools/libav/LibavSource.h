@@ -5,9 +5,9 @@
 
 #include "io/ByteReader.h"
 #include "io/FrameSource.h"
+#include "io/PictureClock.h"
 #include "libav/FrameConverter.h"
 #include "libav/LibavInput.h"
-#include "io/PictureClock.h"
 
 namespace zolt {
 
