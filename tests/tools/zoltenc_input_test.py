@@ -282,6 +282,12 @@ class BadVideo(InputTest):
         self.refused("lavfi:nothing", "--list-formats")
         self.refused("no-such-scheme://x", "Protocol not found", "--list-formats")
 
+    def test_a_pipe_that_must_be_read_from_its_end(self):
+        self.make("in.mp4", "-c:v", "libx264", "-crf", "5", source="testsrc2=size=640x480:duration=2")
+        result = self.zoltenc("-", "-o", "out.264", stdin=self.read("in.mp4"))
+        self.assert_fails(result, 1, "standard input", "name it instead of piping it")
+        self.assert_succeeds(self.zoltenc("in.mp4", "-o", "out.264"))
+
     def test_random_bytes(self):
         noise = random.Random(1).randbytes(50000)
         self.make("in.mp4", "-c:v", "libx264", "-movflags", "faststart")

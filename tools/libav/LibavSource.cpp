@@ -202,10 +202,13 @@ void LibavSource::begin() {
             input_.name() + ": " +
             (undecodable_ > 0 ? "none of its pictures can be decoded; is it damaged?"
                               : "holds no picture");
-        if (!input_.cut().empty()) {
-            throw TruncatedInput(what + " (" + input_.cut() + ")");
+        if (input_.cut().empty()) {
+            throw ToolError(what);
         }
-        throw ToolError(what);
+        // The index of a file may stand at its end.
+        throw TruncatedInput(
+            what + " (" + input_.cut() + ")" +
+            (input_.is_live() ? "; if it is a file, name it instead of piping it" : ""));
     }
     has_frame_ = true;
     look_at_first_frame();
