@@ -60,6 +60,8 @@ class Workers : public WorkerPool {
 public:
     explicit Workers(int count, Order order = Order::kAtOnce) : m_count(count), m_order(order) {}
 
+    void set_count(int count) { m_count = count; }
+
     int threads() noexcept override { return m_count; }
     void run(Wavefront& work, int workers) noexcept override {
         run_all(m_order, workers, m_random, [&work](int n) { work.run_worker(n); });

@@ -37,6 +37,9 @@ void note(const char* call, double value) {
 Picture::Picture(int width, int height, const zolt::Kernels&) : g_width(width), g_height(height) {}
 Picture::~Picture() = default;
 Wavefront::Wavefront(Picture& shared) : picture(shared) {}
+void Wavefront::run_worker(int worker) {
+    note("worker", worker);
+}
 RateControl::RateControl(int, int) {}
 
 CEncoder::CEncoder(int width, int height, const zolt::Kernels*)
@@ -103,6 +106,10 @@ void CEncoder::encode_frame(const void* frame) {
     nal.g_nal_buf[1] = static_cast<std::uint8_t>(g_frame_counter);
     nal.g_nal_bitpos = 16;
     ++g_frame_counter;
+    if (g_worker_pool != nullptr) {
+        note("threads", g_worker_pool->threads());
+        g_worker_pool->run(rows, 2);
+    }
 }
 
 int CEncoder::copy_nal_unit(void* dst, int max) const {

@@ -3,6 +3,7 @@
 #include <atomic>
 #include <memory>
 #include <random>
+#include <vector>
 
 #include "HostErrors.h"
 #include "SessionFakes.h"
@@ -10,6 +11,7 @@
 #include "common/Thread.h"
 #include "media/IEncSettings.h"
 #include "media/IMediaEncoder.h"
+#include "media/IParallelRunner.h"
 #include "media/abi.h"
 #include "support/dl.h"
 #include "support/os.h"
@@ -157,6 +159,65 @@ TEST_F(PluginLibrary, ReportsToTheHostsErrorManager) {
               "ColorConverter.GetNewColorConverter: Source dimensions (15,15) too small to be the "
               "requested/required multiple of (16,16)\n"
               "VideoH264ZoltEnc.InitEncAndPutConfig: Error constructing a new color converter\n");
+}
+
+// Threads that several sessions may ask for at once.
+class SharedRunner : public IParallelRunner {
+public:
+    int GetThreads() noexcept override { return 3; }
+    void Run(IParallelTask* task, int workers) noexcept override {
+        std::vector<Thread> threads;
+        for (int worker = 1; worker < workers; ++worker) {
+            threads.emplace_back([task, worker] { task->Run(worker); });
+        }
+        task->Run(0);
+        for (Thread& thread : threads) {
+            thread.join();
+        }
+        ++runs;
+    }
+    std::atomic<int> runs{0};
+};
+
+// Two sessions on threads of their own, one runner between them, which is lent, taken back and lent
+// again while they are rebuilt for another size and told another bit rate.
+TEST_F(PluginLibrary, SharesARunnerBetweenSessions) {
+    SharedRunner runner;
+    const auto encode = [&](int session, bool lend, Consumer& consumer) {
+        const auto encoder = make_encoder();
+        InputConfig inputs[] = {{64 + 16 * session, 96}, {48, 80}};
+        encoder->Connect(&consumer);
+        for (int n = 0; n < 24; ++n) {
+            InputConfig& input = inputs[n / 12];
+            if (n % 12 == 0) {
+                encoder->PutStreamConfig(input.stream());
+            }
+            if (n == 5) {
+                settings(*encoder).SetBitRateKbs(900);
+            }
+            settings(*encoder).SetParallelRunner(lend && n % 8 != 7 ? &runner : nullptr);
+            Frame frame(n * 40000LL, noise(input.width * input.height * 3 / 2,
+                                           static_cast<unsigned>(n + session)));
+            encoder->PutSample(&frame);
+        }
+    };
+    Consumer alone[2], threaded[2];
+    std::vector<Thread> threads;
+    for (int session = 0; session < 2; ++session) {
+        encode(session, false, alone[session]);
+        threads.emplace_back([&, session] { encode(session, true, threaded[session]); });
+    }
+    for (Thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(runner.runs, 2 * (24 - 3));
+    for (int session = 0; session < 2; ++session) {
+        ASSERT_EQ(threaded[session].units.size(), 24u);
+        for (std::size_t n = 0; n < 24; ++n) {
+            EXPECT_EQ(threaded[session].units[n].bytes, alone[session].units[n].bytes)
+                << "session " << session << ", picture " << n;
+        }
+    }
 }
 
 // One thread encodes while others read, set, notify and build the session anew; the thread

@@ -12,6 +12,7 @@
 #include "HostErrors.h"
 #include "SessionFakes.h"
 #include "common/Thread.h"
+#include "media/IParallelRunner.h"
 #include "plugin/VideoH264ZoltEnc.h"
 
 namespace {
@@ -409,6 +410,44 @@ TEST_F(SessionTest, OffersNoBFramesAndNoForcedIntraFrames) {
     put_frame(40000);
     ASSERT_EQ(consumer.units.size(), 2u);
     EXPECT_FALSE(consumer.units[1].sync);
+}
+
+TEST_F(SessionTest, LendsTheRunnersThreadsToTheNextPicture) {
+    class Runner : public IParallelRunner {
+    public:
+        explicit Runner(int threads) : m_threads(threads) {}
+        int GetThreads() noexcept override { return m_threads; }
+        void Run(IParallelTask* task, int workers) noexcept override {
+            for (int worker = workers - 1; worker >= 0; --worker) {
+                task->Run(worker);
+            }
+        }
+
+    private:
+        int m_threads;
+    };
+    build();
+    const auto calls_of_a_picture = [this] {
+        put_frame(0);
+        std::string calls = FakeEngine::take_calls();
+        return calls.substr(calls.find("encode "));
+    };
+    const std::string alone = "encode reset ";
+    const auto with_threads = [](int count) {
+        return "encode threads=" + std::to_string(count) + " worker=1 worker=0 reset ";
+    };
+    Runner three(3), five(5);
+    IVideoEncSettings& settings = session;
+    EXPECT_EQ(calls_of_a_picture(), alone);
+    settings.SetParallelRunner(&three);
+    EXPECT_EQ(FakeEngine::take_calls(), "") << "before the next picture";
+    EXPECT_EQ(calls_of_a_picture(), with_threads(3));
+    session.PutStreamConfig(input.stream());
+    EXPECT_EQ(calls_of_a_picture(), with_threads(3)) << "of the new engine, too";
+    settings.SetParallelRunner(&five);
+    EXPECT_EQ(calls_of_a_picture(), with_threads(5));
+    settings.SetParallelRunner(nullptr);
+    EXPECT_EQ(calls_of_a_picture(), alone);
 }
 
 // The host finds each interface at its place in the object.

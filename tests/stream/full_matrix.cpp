@@ -15,6 +15,8 @@
 #include <vector>
 
 #include "common/Encoding.h"
+#include "common/Random.h"
+#include "common/Workers.h"
 
 namespace {
 
@@ -23,14 +25,18 @@ using zolt_test::Settings;
 using Bytes = std::vector<std::uint8_t>;
 
 const char kUsage[] =
-    "usage: full_matrix [--jobs N] [--clips FOLDER] [--only NAME] | --long-run [PICTURES]\n"
+    "usage: full_matrix [--jobs N] [--threads N] [--clips FOLDER] [--only NAME] |\n"
+    "                   --long-run [PICTURES]\n"
     "  --jobs N         streams at a time (1)\n"
+    "  --threads N      each picture is coded by a random number of workers, 1..N, and the stream\n"
+    "                   compared with that of one (1)\n"
     "  --clips FOLDER   the lossless clips (environment variable ZOLT_TEST_CLIPS)\n"
     "  --only NAME      sequences whose name begins with NAME\n"
     "  --long-run       one session of 64x64 pictures (100000) at key-frame interval 70000\n";
 
 struct Options {
     int jobs = 1;
+    int threads = 1;
     std::string clips;
     std::string only;
     int long_run = 0;
@@ -45,6 +51,8 @@ bool parse(int argc, char** argv, Options& options) {
         const bool has_value = i + 1 < argc;
         if (option == "--jobs" && has_value) {
             options.jobs = std::atoi(argv[++i]);
+        } else if (option == "--threads" && has_value) {
+            options.threads = std::atoi(argv[++i]);
         } else if (option == "--clips" && has_value) {
             options.clips = argv[++i];
         } else if (option == "--only" && has_value) {
@@ -55,7 +63,7 @@ bool parse(int argc, char** argv, Options& options) {
             return false;
         }
     }
-    return options.jobs > 0 && options.long_run >= 0;
+    return options.jobs > 0 && options.threads > 0 && options.long_run >= 0;
 }
 
 // What a stream is like.
@@ -99,17 +107,35 @@ struct Figures {
     }
 };
 
-// Checks one stream and says how it went; returns whether it is well.
-bool run(const Sequence& sequence, const Settings& settings, std::mutex& output) {
+// Checks one stream and says how it went; returns whether it is well. threads: the most workers.
+bool run(const Sequence& sequence, const Settings& settings, int threads, std::mutex& output) {
     Figures figures;
     zolt_test::Hooks hooks;
-    hooks.after = [&](CEncoder& engine, int, const Bytes& source, const Bytes& nal,
-                      const Bytes& coded) { figures.add(engine, source, nal, coded); };
+    zolt_test::Workers workers(1, zolt_test::Order::kDelayed);
+    zolt_test::Random random(std::hash<std::string>()(sequence.name + settings.name()));
+    zolt_test::Encoding alone(sequence.width, sequence.height, settings);
+    int first_difference = -1;
+    if (threads > 1) {
+        hooks.before = [&](CEncoder& engine, int) {
+            workers.set_count(random.between(1, threads));
+            engine.set_worker_pool(&workers);
+        };
+    }
+    hooks.after = [&](CEncoder& engine, int n, const Bytes& source, const Bytes& nal,
+                      const Bytes& coded) {
+        figures.add(engine, source, nal, coded);
+        if (threads > 1 && alone.encode(source.data()) != nal && first_difference < 0) {
+            first_difference = n;
+        }
+    };
     std::string problem;
     try {
         problem = zolt_test::check_stream(sequence, settings, hooks);
     } catch (const std::exception& error) {
         problem = error.what();
+    }
+    if (first_difference >= 0) {
+        problem += " picture " + std::to_string(first_difference) + " differs from one worker's";
     }
     const std::string result =
         problem.empty() ? figures.text(sequence.pictures / settings.frame_rate) : problem;
@@ -184,7 +210,7 @@ int run_matrix(const Options& options) {
             jobs.emplace_back([&] {
                 for (std::size_t i = next++; i < settings.size(); i = next++) {
                     ++streams;
-                    failures += run(sequence, settings[i], output) ? 0 : 1;
+                    failures += run(sequence, settings[i], options.threads, output) ? 0 : 1;
                 }
             });
         }
@@ -207,7 +233,9 @@ int main(int argc, char** argv) {
         }
         if (options.long_run > 0) {
             std::mutex output;
-            return run(restless(options.long_run), {28, 200000, 70000}, output) ? 0 : 1;
+            return run(restless(options.long_run), {28, 200000, 70000}, options.threads, output)
+                       ? 0
+                       : 1;
         }
         return run_matrix(options) == 0 ? 0 : 1;
     } catch (const std::exception& error) {
