@@ -242,7 +242,9 @@ class Copies(OutputTest):
 
     def setUp(self):
         super().setUp()
-        self.write("in.srt", b"1\n00:00:00,500 --> 00:00:01,500\nhello\n\n")
+        # Two of one time.
+        self.write("in.srt", b"1\n00:00:00,500 --> 00:00:01,500\nhello\n\n"
+                             b"2\n00:00:00,500 --> 00:00:01,000\nthere\n\n")
         self.ffmpeg("-f", "lavfi", "-i", "testsrc2=size=64x48:rate=25:duration=2", "-f", "lavfi", "-i",
                     "sine=sample_rate=48000:duration=3", "-i", "in.srt", "-c:v", "mpeg4", "-c:a", "aac",
                     "-c:s", "srt", "-metadata:s:a", "language=fin", "in.mkv")

@@ -305,13 +305,24 @@ void ContainerSink::write_copy(Copy& copy, std::int64_t offset) {
     }
     av_packet_rescale_ts(&packet, copy.side.time_base, copy.stream->time_base);
     // Damaged input may step back in time, which no container takes.
-    if (time_of(packet) <= copy.last_time) {
+    if (!follows(copy, packet)) {
         return;
     }
     copy.last_time = time_of(packet);
     packet.stream_index = copy.stream->index;
     packet.pos = -1;
     check(av_interleaved_write_frame(context_.get(), &packet));
+}
+
+// Whether libavformat takes the packet behind the stream's last one: only subtitles may share a
+// time where the container has a strict order.
+bool ContainerSink::follows(const Copy& copy, const AVPacket& packet) const {
+    const std::int64_t time = time_of(packet);
+    const bool is_strict = (context_->oformat->flags & AVFMT_TS_NONSTRICT) == 0 &&
+                           copy.side.parameters->codec_type != AVMEDIA_TYPE_SUBTITLE;
+    const bool is_shown_before_decoding = packet.pts != AV_NOPTS_VALUE && packet.pts < time;
+    return !is_shown_before_decoding && time >= copy.last_time &&
+           !(is_strict && time == copy.last_time);
 }
 
 void ContainerSink::commit() {

@@ -60,6 +60,7 @@ private:
     void write_header();
     void copy_packets(bool is_last);
     void write_copy(Copy& copy, std::int64_t offset);
+    bool follows(const Copy& copy, const AVPacket& packet) const;
     void check(int result);
     void check_file();
 
