@@ -234,7 +234,8 @@ class Traits(InputTest):
         self.make("odd.mkv", "-c:v", "ffv1", "-pix_fmt", "yuv420p", "-color_range", "pc",
                   "-colorspace", "bt709", "-color_trc", "bt709", "-color_primaries", "bt709", source=odd)
         self.make("ten.mkv", "-c:v", "ffv1", "-pix_fmt", "yuv422p10le", "-color_range", "tv",
-                  "-colorspace", "smpte170m")
+                  "-colorspace", "smpte170m", "-color_trc", "smpte170m", "-color_primaries",
+                  "smpte170m")
         self.make("gray.mkv", "-c:v", "ffv1", "-pix_fmt", "gray", "-color_range", "pc")
         self.make("up.mp4", "-c:v", "mpeg4")
         for degrees in ("90", "180", "270"):
@@ -244,6 +245,24 @@ class Traits(InputTest):
             with self.subTest(name=name):
                 self.assert_succeeds(self.zoltenc(name, "-o", "out.mp4", stub=False))
                 self.assertEqual(self.probed("out.mp4"), self.probed(name))
+
+    def test_what_goes_with_a_matrix_is_completed(self):
+        """Players pass over a description that is not complete."""
+        for colour_range, matrix, primaries, transfer in (
+            ("tv", "bt709", "bt709", "bt709"),
+            ("tv", "smpte170m", "smpte170m", "smpte170m"),
+            ("tv", "bt470bg", "bt470bg", "smpte170m"),
+            ("pc", "bt470bg", "bt709", "iec61966-2-1"),
+        ):
+            with self.subTest(matrix=matrix, range=colour_range):
+                self.make("in.mkv", "-c:v", "ffv1", "-pix_fmt", "yuv420p", "-color_range",
+                          colour_range, "-colorspace", matrix)
+                self.assert_succeeds(self.zoltenc("in.mkv", "-o", "out.mp4", stub=False))
+                stream = self.probed("out.mp4")
+                self.assertEqual(
+                    (stream["color_range"], stream["color_space"], stream["color_primaries"],
+                     stream["color_transfer"]), (colour_range, matrix, primaries, transfer))
+                (self.folder / "in.mkv").unlink()
 
     def test_scaled_pictures_are_shown_in_their_shape(self):
         self.make("in.mkv", "-c:v", "ffv1", source="testsrc=size=100x50:duration=0.2,setsar=2/1")
