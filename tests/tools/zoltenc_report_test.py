@@ -154,7 +154,7 @@ class MatchRate(ReportTest):
     clip = "synthetic:176x144@30:40"
 
     def test_a_rate_that_was_missed_is_met(self):
-        for rate in (100, 600):
+        for rate in (80, 200):
             with self.subTest(rate=rate):
                 plain = self.summary(self.clip, "-b", str(rate), "-o", "plain.264")
                 self.assertGreater(abs(plain["kbps"] / rate - 1), 0.03)
@@ -194,11 +194,9 @@ class MatchRate(ReportTest):
         ):
             self.assert_fails(self.zoltenc(*arguments, "--match-rate"), 2, "--match-rate", *texts)
         self.assert_fails(self.zoltenc("none.y4m", "-o", "out.264", "--match-rate"), 1, "none.y4m")
-        with subprocess.Popen(["cat", "in.y4m"], cwd=self.folder,
-                              stdout=open(self.folder / "pipe", "r+b")) as feed:
+        with subprocess.Popen("cat in.y4m > pipe", shell=True, cwd=self.folder):
             self.assert_fails(self.zoltenc("pipe", "-o", "out.264", "--match-rate"), 2, "pipe",
                               "again")
-            feed.wait()
         self.assertEqual(self.files(), ["in.y4m", "pipe"])
 
 

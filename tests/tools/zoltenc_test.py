@@ -14,6 +14,7 @@ from zoltenc_runner import (
     ENCODER_LIBRARY,
     ENVIRONMENT,
     NO_ENCODER,
+    START_CODE,
     STUB_ENCODER,
     ZOLTENC,
     ZOLTENC_FILE,
@@ -55,6 +56,11 @@ class Usage(ToolTest):
             (["--stats", "out.264"], "out.264", "--stats"),
             (["--stats", "in.y4m"], "in.y4m", "input"),
             (["--stats", "-"], "--stats"),
+            (["--report", "-"], "--report", "file"),
+            (["--report", ""], "--report", "file name"),
+            (["--report", "out.264"], "out.264", "--report"),
+            (["--report", "in.y4m"], "in.y4m", "input"),
+            (["--stats", "x", "--report", "x"], "x", "--stats", "--report"),
         ]
         for options, *texts in cases:
             with self.subTest(options=options):
@@ -478,10 +484,14 @@ class Outputs(ToolTest):
     def test_the_summary_and_quiet(self):
         result = self.assert_succeeds(self.zoltenc("in.y4m", "-o", "out.264"))
         size = (self.folder / "out.264").stat().st_size
-        rate = size * 8 * 25 / 3 / 1000
+        # The rate is that of the pictures' units, without parameter sets and start codes.
+        pictures = self.read("out.264").split(START_CODE)[3:]
+        rate = sum(map(len, pictures)) * 8 * 25 / 3 / 1000
+        off = 100 * (rate / 200 - 1)
         self.assertRegex(
             result.stderr,
-            rf"^out\.264: 3 frames in [\d.]+ s \([\d.]+ frames/s\), {size} bytes, {rate:.1f} kbit/s\n$",
+            rf"^out\.264: 3 frames in [\d.]+ s \([\d.]+ frames/s, [\d.]+x\), {size} bytes, "
+            rf"{rate:.1f} kbit/s of 200 \({off:+.1f} %\)\n$",
         )
         self.assertEqual(self.zoltenc("in.y4m", "-o", "out.264", "-q").stderr, "")
 
