@@ -115,7 +115,7 @@ std::string PictureSection::map_layer(const char* layer, const std::vector<Value
     for (const auto& [value, path] : paths) {
         const std::string look = attributes(value);
         if (!look.empty()) {
-            text += "<path " + look + " d=\"" + path + "\"/>";
+            text.append("<path ").append(look).append(" d=\"").append(path).append("\"/>");
         }
     }
     return text + "</svg>";

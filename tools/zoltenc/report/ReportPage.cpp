@@ -53,7 +53,8 @@ std::optional<double> luma_psnr(const PictureRecord& record) {
 }
 
 constexpr const char kPictureNotes[] =
-    "<p class=\"soft\">Input is what the encoder was given (after conversion and cropping), output "
+    "<p class=\"soft\">Input is what the encoder was given (after conversion, padding or "
+    "cropping), output "
     "what a decoder makes of the stream; both are JPEG copies here, at most 960 samples wide. The "
     "layers are the decoder's own account. A line of motion runs from a block, its dot, to where "
     "its prediction comes from. Bits by macroblock are not shown: the decoder does not tell "
@@ -106,7 +107,7 @@ std::string ReportPage::settings() const {
     const PictureFormat& input = summary_.input_format;
     std::vector<std::pair<const char*, std::string>> rows = {
         {"Encoder", summary_.encoder},
-        {"Input", size_text(input.width, input.height) + ", " + input.fourcc_text()},
+        {"Given to the encoder", size_text(input.width, input.height) + ", " + input.fourcc_text()},
         {"Coded", size_text(summary_.width, summary_.height)},
         {"Frame rate", summary_.frame_rate.to_string() + " frames/s"},
         {"Bit rate", summary_.target_kbs == 0 ? "none asked, QP 28"

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <utility>
 
 #include "zoltenc/report/markup.h"
@@ -78,46 +79,74 @@ void SvgPlot::add_level(std::string name, double y) {
 std::string SvgPlot::html() const {
     const Axis time = time_axis();
     const Axis values = value_axis();
-    const auto across = [&](double x) { return time.share(x) * kWidth; };
-    const auto down = [&](double y) { return (1 - values.share(y)) * kHeight; };
-
-    std::string drawing;
+    std::string drawing = "<path class=\"grid\" d=\"";
     std::string labels;
-    for (double y = values.low; y < values.high + values.step / 2; y += values.step) {
-        drawing += formatted("M0 %.1fh%g", down(y), kWidth);
-        labels +=
-            formatted("<span class=\"y\" style=\"top:%.2f%%\">", 100 * (1 - values.share(y))) +
-            tick_text(y, values.step) + "</span>";
+    for (const double y : values.ticks()) {
+        const double down = 1 - values.share(y);
+        drawing += formatted("M0 %.1fh%g", down * kHeight, kWidth);
+        labels += formatted("<span class=\"y\" style=\"top:%.2f%%\">", 100 * down) +
+                  tick_text(y, values.step) + "</span>";
     }
-    drawing = "<path class=\"grid\" d=\"" + drawing + "\"/>";
-    for (double x = std::ceil(time.low / time.step) * time.step; x < time.high + time.step / 1e6;
-         x += time.step) {
+    drawing += "\"/>";
+    for (const double x : time.ticks()) {
         labels += formatted("<span class=\"x\" style=\"left:%.2f%%\">", 100 * time.share(x)) +
                   tick_text(x, time.step) + "</span>";
     }
+    std::string legend;
     for (const Series& series : series_) {
-        std::string path;
-        if (series.kind == Kind::level) {
-            path = formatted("M0 %.1fh%g", down(series.points[0].y), kWidth);
-        }
-        const bool is_line = series.kind == Kind::line;
-        for (const Point& point :
-             series.kind == Kind::level ? Points{} : thinned(series.points, time.low, time.high)) {
-            path += is_line && !path.empty() ? 'L' : 'M';
-            path += formatted("%.1f %.1f", across(point.x), down(point.y));
-            path += is_line ? "" : "h0";
-        }
-        const char* const kind = is_line ? "line" : series.kind == Kind::marks ? "marks" : "level";
-        drawing += std::string("<path class=\"") + kind + "\" d=\"" + path + "\"/>";
+        const std::string style = style_of(series.kind);
+        drawing += "<path class=\"" + style + "\" d=\"" + path(series, time, values) + "\"/>";
+        legend += "<span class=\"key\"><i class=\"" + style + "\"></i>" + escaped(series.name) +
+                  "</span>";
     }
     return "<figure class=\"plot\"><figcaption><b>" + escaped(title_) + "</b> <span>" +
-           escaped(unit_) + "</span>" + legend() +
+           escaped(unit_) + "</span>" + legend +
            formatted(
                "</figcaption><div class=\"axes\"><svg viewBox=\"0 0 %g %g\" "
                "preserveAspectRatio=\"none\" role=\"img\" aria-label=\"",
                kWidth, kHeight) +
            escaped(title_) + "\">" + drawing + "</svg>" + labels +
            "</div><div class=\"below\">time in the stream, s</div></figure>\n";
+}
+
+// Marks are lines of no length with round ends, which stay round however the drawing is stretched.
+std::string SvgPlot::path(const Series& series, const Axis& time, const Axis& values) {
+    const auto down = [&](double y) { return (1 - values.share(y)) * kHeight; };
+    if (series.kind == Kind::level) {
+        return formatted("M0 %.1fh%g", down(series.points[0].y), kWidth);
+    }
+    const bool is_line = series.kind == Kind::line;
+    std::string text;
+    for (const Point& point : thinned(series.points, time.low, time.high)) {
+        text += is_line && !text.empty() ? 'L' : 'M';
+        text += formatted("%.1f %.1f", time.share(point.x) * kWidth, down(point.y));
+        text += is_line ? "" : "h0";
+    }
+    return text;
+}
+
+const char* SvgPlot::style_of(Kind kind) {
+    switch (kind) {
+        case Kind::line:
+            return "line";
+        case Kind::marks:
+            return "marks";
+        case Kind::level:
+            break;
+    }
+    return "level";
+}
+
+// The multiples of the step on the axis.
+std::vector<double> SvgPlot::Axis::ticks() const {
+    constexpr double kRounding = 1e-6;
+    const auto first = static_cast<std::int64_t>(std::ceil(low / step - kRounding));
+    const auto last = static_cast<std::int64_t>(std::floor(high / step + kRounding));
+    std::vector<double> result;
+    for (std::int64_t i = first; i <= last; ++i) {
+        result.push_back(static_cast<double>(i) * step);
+    }
+    return result;
 }
 
 SvgPlot::Axis SvgPlot::time_axis() const {
@@ -144,18 +173,6 @@ SvgPlot::Axis SvgPlot::value_axis() const {
     constexpr double kTicks = 4;
     const double step = round_step((high - low) / kTicks);
     return {std::floor(low / step) * step, std::ceil(high / step - 1e-9) * step, step};
-}
-
-std::string SvgPlot::legend() const {
-    std::string text;
-    for (const Series& series : series_) {
-        const char* const kind = series.kind == Kind::line    ? "line"
-                                 : series.kind == Kind::marks ? "marks"
-                                                              : "level";
-        text += std::string("<span class=\"key\"><i class=\"") + kind + "\"></i>" +
-                escaped(series.name) + "</span>";
-    }
-    return text;
 }
 
 }  // namespace zolt

@@ -43,11 +43,13 @@ private:
     struct Axis {
         double low, high, step;
         double share(double value) const { return (value - low) / (high - low); }
+        std::vector<double> ticks() const;
     };
 
     Axis time_axis() const;
     Axis value_axis() const;
-    std::string legend() const;
+    static std::string path(const Series& series, const Axis& time, const Axis& values);
+    static const char* style_of(Kind kind);
 
     std::string title_;
     std::string unit_;
