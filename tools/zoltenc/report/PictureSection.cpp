@@ -64,13 +64,13 @@ std::string PictureSection::html() const {
 
 std::string PictureSection::heading() const {
     const PictureRecord& record = picture_.record;
-    std::string text = formatted("<div><h3>Picture %lld, %s</h3><p class=\"soft\">",
-                                 static_cast<long long>(record.index), picture_.reason.c_str());
-    text += formatted("%.3f s, %s, %lld bytes", record.start,
+    std::string text = "<div><h3>Picture " + std::to_string(record.index) + ", " + picture_.reason +
+                       "</h3><p class=\"soft\">";
+    text += formatted("%.3f s, %s, ", record.start,
                       record.is_key        ? "key frame"
                       : record.type == 'I' ? "intra"
-                                           : "predicted",
-                      static_cast<long long>(record.bytes));
+                                           : "predicted");
+    text += std::to_string(record.bytes) + " bytes";
     if (record.qp) {
         text += formatted(", QP %d", *record.qp);
     }
@@ -168,10 +168,10 @@ std::string PictureSection::type_counts() const {
         const auto count =
             std::count(types.begin(), types.end(), static_cast<MacroblockMap::Type>(i));
         if (count > 0) {
+            const double share = static_cast<double>(count) / static_cast<double>(types.size());
             text +=
-                formatted("<span><i class=\"%s\"></i>%s %lld (%.1f %%)</span>", kTypeNames[i].style,
-                          kTypeNames[i].text, static_cast<long long>(count),
-                          100.0 * static_cast<double>(count) / static_cast<double>(types.size()));
+                formatted("<span><i class=\"%s\"></i>%s %d (%.1f %%)</span>", kTypeNames[i].style,
+                          kTypeNames[i].text, static_cast<int>(count), 100 * share);
         }
     }
     const auto& qp = picture_.map.qp;

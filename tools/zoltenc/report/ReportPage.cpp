@@ -93,11 +93,11 @@ std::string ReportPage::tiles() const {
         text += tile(formatted("%.1f", range->mean), "QP",
                      formatted("from %d to %d", range->least, range->most));
     }
-    text += tile(formatted("%lld", static_cast<long long>(tally.frames())), "pictures",
-                 formatted("%lld key frames, %.2f s", static_cast<long long>(tally.key_frames()),
-                           tally.stream_seconds()));
+    text += tile(std::to_string(tally.frames()), "pictures",
+                 std::to_string(tally.key_frames()) +
+                     formatted(" key frames, %.2f s", tally.stream_seconds()));
     text += tile(formatted("%.1f", static_cast<double>(summary_.bytes) / 1000), "kB",
-                 formatted("%lld bytes", static_cast<long long>(summary_.bytes)));
+                 std::to_string(summary_.bytes) + " bytes");
     text += tile(formatted("%.1f", summary_.frames_per_second()), "frames/s",
                  formatted("%.1f times real time", summary_.speed()));
     return "<ul class=\"tiles\">" + text + "</ul>\n";
