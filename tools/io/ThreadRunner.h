@@ -11,7 +11,7 @@ namespace zolt {
 
 // Threads that wait for an encoder's pictures. One task at a time; the thread that calls Run works
 // on it, too.
-class ThreadRunner : public IParallelRunner {
+class ThreadRunner final : public IParallelRunner {
 public:
     // Starts threads - 1 threads; threads: from 1.
     explicit ThreadRunner(int threads);
