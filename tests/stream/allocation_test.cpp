@@ -8,6 +8,7 @@
 #include <memory>
 
 #include "common/Encoding.h"
+#include "common/Workers.h"
 
 namespace {
 
@@ -117,6 +118,34 @@ TEST(Allocation, NoneForAPicture) {
                 });
             }
             EXPECT_EQ(count, 0) << kind << " at bit rate " << bit_rate;
+        }
+    }
+}
+
+// Further workers have their memory when a picture first asks for them, which is no more than one a
+// row; then pictures take none with any number of them. They run on the caller's thread, since
+// threads take some.
+TEST(Allocation, NoneForAPictureWithWorkers) {
+    using zolt_test::Order;
+    const zolt_test::Sequence sequence = zolt_test::generated("noise", 176, 144, 12);
+    zolt_test::Encoding encoding(176, 144, {1, 0, 5});
+    CEncoder& engine = encoding.engine();
+    zolt_test::Workers serial(1, Order::kSerial), reversed(1, Order::kReversed);
+    std::vector<std::uint8_t> picture(sequence.picture_size());
+    constexpr int kWorkers[12] = {1, 3, 2, 3, 9, 1, 1000, 8, 0, 5, 9, 2};
+    for (int n = 0; n < sequence.pictures; ++n) {
+        sequence.draw(n, picture.data());
+        zolt_test::Workers& workers = n % 3 == 2 ? reversed : serial;
+        workers.set_count(kWorkers[n]);
+        engine.set_worker_pool(&workers);
+        const long count = counted([&] {
+            engine.encode_frame(picture.data());
+            engine.reset_nal_buffer();
+        });
+        if (n == 1 || n == 4) {
+            EXPECT_GT(count, 0) << "picture " << n;
+        } else {
+            EXPECT_EQ(count, 0) << "picture " << n;
         }
     }
 }
