@@ -1,7 +1,8 @@
 // Codes a Y4M file with the engine alone, once for every table of kernels that the processor has,
 // and prints a line with the table's name, the setting and a digest of the stream:
 //
-//     table_digests FILE SETTING...     SETTING: a QP as "qp28", or kbit/s as "200k"
+//     table_digests FILE SETTING...     SETTING: a QP as "qp28", kbit/s as "200k", or
+//                                       "t3" for three workers in what follows
 
 #include <cinttypes>
 #include <cstdio>
@@ -10,6 +11,7 @@
 #include <vector>
 
 #include "common/Encoding.h"
+#include "common/Workers.h"
 #include "io/ToolError.h"
 #include "io/Y4mReader.h"
 #include "io/numbers.h"
@@ -42,11 +44,13 @@ public:
 };
 
 std::uint64_t code(const std::string& file, zolt_test::Settings settings,
-                   const zolt::Kernels& kernels) {
+                   const zolt::Kernels& kernels, int workers) {
     zolt::Y4mReader reader((zolt::ByteReader(file)));
     const zolt::PictureFormat format = reader.format();
     settings.frame_rate = reader.frame_rate().value_or(zolt::FrameRate{}).per_second();
     zolt_test::Encoding encoding(format.width, format.height, settings, &kernels);
+    zolt_test::Workers pool(workers);
+    encoding.engine().set_worker_pool(&pool);
     Digest digest;
     digest.add(encoding.sequence_parameter_set());
     digest.add(encoding.picture_parameter_set());
@@ -63,10 +67,16 @@ int main(int argc, char** argv) {
     zolt::os_prepare_streams();
     const char* const* const arguments = zolt::os_command_line(&argc, argv);
     try {
+        int workers = 1;
         for (int i = 2; i < argc; ++i) {
+            const std::string argument = arguments[i];
+            if (argument.front() == 't') {
+                workers = zolt::parse_number(argument.substr(1)).value_or(1);
+                continue;
+            }
             for (const zolt::Kernels& kernels : zolt::kernel_tables()) {
                 std::printf("%s %s %016" PRIx64 "\n", kernels.name, arguments[i],
-                            code(arguments[1], parse(arguments[i]), kernels));
+                            code(arguments[1], parse(argument), kernels, workers));
             }
         }
     } catch (const std::exception& error) {
