@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "media/IConfigVideoUncompressed.h"
+#include "media/IParallelRunner.h"
 #include "media/ISampleConsumer.h"
 #include "media/MediaSample.h"
 #include "media/MediaStreamConfig.h"
@@ -22,6 +23,9 @@ public:
         session_.Connect(this);
         session_.PutStreamConfig(&input_);
     }
+
+    // Lends the session threads, from the next picture on.
+    void lend(IParallelRunner* runner) { session_.SetParallelRunner(runner); }
 
     void encode(const std::uint8_t* picture) {
         // The interface has no const; the session only reads.
