@@ -77,8 +77,8 @@ void change_settings(Random& random, Encoding& a, Encoding& b) {
 }
 
 // Random sessions: shape, content, table and first settings differ between them; settings, number
-// of workers and their order from picture to picture. Some have a QP or a buffer that their
-// pictures do not fit at once, so that workers give up in any row.
+// of workers and their order from picture to picture. A NAL buffer that has shrunk to less than a
+// picture took makes workers give up in any row.
 TEST(Threads, AnyWorkersGiveTheStreamOfOne) {
     constexpr int kSessions = 90 / kShare;
     constexpr int kPictures = 8;
@@ -97,13 +97,6 @@ TEST(Threads, AnyWorkersGiveTheStreamOfOne) {
             tables.begin()[random.between(0, static_cast<int>(tables.end() - tables.begin()) - 1)];
         Encoding alone(sequence.width, sequence.height, settings, &kernels);
         Encoding together(sequence.width, sequence.height, settings, &kernels);
-        if (random.between(0, 2) == 0) {
-            const int bytes = 4000 + sequence.width * sequence.height * random.between(8, 20) / 20;
-            for (CEncoder* engine : {&alone.engine(), &together.engine()}) {
-                engine->g_nal_buf_size = std::min(engine->g_nal_buf_size, bytes);
-            }
-        }
-
         Workers pools[] = {Workers(1, kOrders[0]), Workers(1, kOrders[1]), Workers(1, kOrders[2]),
                            Workers(1, kOrders[3])};
         Bytes picture(sequence.picture_size());
@@ -116,13 +109,21 @@ TEST(Threads, AnyWorkersGiveTheStreamOfOne) {
             const Bytes expected = alone.encode(picture.data());
             ASSERT_EQ(together.encode(picture.data()), expected) << "picture " << n;
             ASSERT_EQ(together.reconstruction(), alone.reconstruction()) << "picture " << n;
-            // Without rate control the QP goes back to where the picture started.
-            if (!together.engine().g_rc_enable) {
-                coded_again += slice_qp(expected) > together.engine().picture.g_mbQp ? 1 : 0;
+            if (together.engine().g_rc_enable) {
+                continue;
+            }
+            // The engine has gone back to the QP that the picture was to have.
+            const int qp = together.engine().picture.g_mbQp;
+            coded_again += slice_qp(expected) > qp ? 1 : 0;
+            // A picture like this one still fits at a higher QP.
+            const bool idr = (expected[0] & 31) == 5;
+            if (idr && qp <= 10 && expected.size() > 4000) {
+                const int bytes = static_cast<int>(expected.size()) * random.between(7, 10) / 10;
+                alone.engine().g_nal_buf_size = together.engine().g_nal_buf_size = bytes;
             }
         }
     }
-    EXPECT_GT(coded_again, kSessions / 5);
+    EXPECT_GT(coded_again, 5);
 }
 
 // A P picture's slice data behind `before` other bits, from an engine whose reference and QP stay
