@@ -144,7 +144,7 @@ bool Wavefront::end_row(MacroblockCoder& coder, unsigned last_start) {
         m_nal->write_uvlc_unsigned(run);
     }
     m_nal->append(coder.row_bits);
-    m_skip_run = coder.g_skip_run + (has_run || !coder.keep_first_run ? 0 : m_skip_run);
+    m_skip_run = coder.g_skip_run + (has_run ? 0 : m_skip_run);
     return true;
 }
 
