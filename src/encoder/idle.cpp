@@ -5,7 +5,7 @@ namespace {
 
 constexpr int kSpins = 200;
 constexpr int kPauses = 8;
-constexpr int kYields = 20;
+constexpr int kYields = 1000;
 
 // Tells the processor that this is a waiting loop.
 void pause() {
