@@ -32,20 +32,21 @@ VideoTraits PaddedSource::traits() const {
     return traits;
 }
 
-bool PaddedSource::read(unsigned char* sample) {
-    if (!source().read(picture_.data())) {
+bool PaddedSource::read(std::vector<unsigned char>& sample) {
+    if (!source().read(picture_)) {
         return false;
     }
     const std::vector<PictureFormat::Plane> from = original_.planes();
     const std::vector<PictureFormat::Plane> to = padded_.planes();
     const unsigned char* row = picture_.data();
+    unsigned char* padded_row = sample.data();
     for (std::size_t plane = 0; plane < from.size(); ++plane) {
-        for (std::size_t y = 0; y < to[plane].rows; ++y, sample += to[plane].row_bytes) {
+        for (std::size_t y = 0; y < to[plane].rows; ++y, padded_row += to[plane].row_bytes) {
             if (y < from[plane].rows) {
-                extend_row(row, from[plane].row_bytes, sample, to[plane].row_bytes);
+                extend_row(row, from[plane].row_bytes, padded_row, to[plane].row_bytes);
                 row += from[plane].row_bytes;
             } else {
-                std::copy_n(sample - to[plane].row_bytes, to[plane].row_bytes, sample);
+                std::copy_n(padded_row - to[plane].row_bytes, to[plane].row_bytes, padded_row);
             }
         }
     }

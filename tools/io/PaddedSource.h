@@ -15,7 +15,7 @@ public:
 
     PictureFormat format() const override { return padded_; }
     VideoTraits traits() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
 
 private:
     void extend_row(const unsigned char* from, std::size_t from_bytes, unsigned char* to,

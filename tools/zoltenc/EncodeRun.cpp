@@ -163,7 +163,7 @@ void EncodeRun::check_outputs() const {
 
 void EncodeRun::skip_frames() {
     std::vector<unsigned char> picture(source_->format().sample_bytes());
-    for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture.data()); ++frame) {}
+    for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture); ++frame) {}
 }
 
 // Two rows of macroblocks or more for each thread; what another one would do is too little.
@@ -250,7 +250,7 @@ bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
         return false;
     }
     try {
-        return source_->read(picture.data());
+        return source_->read(picture);
     } catch (const TruncatedInput& error) {
         // A stop signal cuts off the input too.
         if (StopSignal::received() == 0) {
