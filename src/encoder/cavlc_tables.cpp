@@ -186,8 +186,7 @@ constexpr zolt::LevelCode make_level_code(unsigned state, int level) {
     const bool many = state >= zolt::kManyLevels && state < zolt::kThreeOnes;
     const bool reduced = state < zolt::kThreeOnes;
     if (reduced && magnitude == 1) {
-        const bool third = state == zolt::kManyLevels - 1 || state == zolt::kThreeOnes - 1;
-        const unsigned next = third ? static_cast<unsigned>(zolt::kThreeOnes) : state + 1;
+        const unsigned next = state == zolt::kManyLevels - 1 ? zolt::kThreeOnes : state + 1;
         return {static_cast<std::uint16_t>(sign), 1, 1, static_cast<std::uint8_t>(next)};
     }
     const int suffix_length = first ? (many ? 1 : 0) : static_cast<int>(state) - zolt::kSuffix1 + 1;

@@ -59,11 +59,11 @@ constexpr int kLargeLevelCost = 9999;
 constexpr int kMin8x8Cost = 5;
 constexpr int kMinMacroblockCost = 6;
 
-// Cost of an inter block's levels; counting stops above 5, which keeps any 8x8 block.
-int coefficient_cost(const std::int16_t* scan, unsigned nonzero) {
-    int cost = 0;
+// Cost of an inter block's levels, added to that of the blocks before it. Counting stops where it
+// keeps the macroblock.
+int coefficient_cost(const std::int16_t* scan, unsigned nonzero, int cost) {
     int next = 0;  // position after the last level
-    for (; nonzero != 0 && cost <= 5; nonzero &= nonzero - 1) {
+    for (; nonzero != 0 && cost < kMinMacroblockCost; nonzero &= nonzero - 1) {
         const int position = zolt::lowest_bit(nonzero);
         cost += std::abs(scan[position]) > 1 ? kLargeLevelCost : COEFF_COST[position - next];
         next = position + 1;
@@ -168,9 +168,10 @@ void MacroblockCoder::quantTransform_luma_16x16P() {
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
         const unsigned blocks = 0xfu << (4 * block8x8);
         int cost = 0;
-        for (unsigned rest = g_luma_mask & blocks; rest != 0; rest &= rest - 1) {
+        for (unsigned rest = g_luma_mask & blocks; rest != 0 && cost < kMinMacroblockCost;
+             rest &= rest - 1) {
             const int k = zolt::lowest_bit(rest);
-            cost += coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k]);
+            cost = coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k], cost);
         }
         if (cost < kMin8x8Cost) {
             g_luma_mask &= ~blocks;
