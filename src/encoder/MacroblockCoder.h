@@ -163,8 +163,10 @@ public:
     // masks of the levels that are not 0.
     alignas(64) std::int16_t g_scan_levels[24 * 16] = {};
     std::uint16_t g_nonzero[24] = {};
-    // DC levels: intra 16x16 in zig-zag order, chroma in raster order.
+    // DC levels: intra 16x16 in zig-zag order, with the mask of those that are not 0, chroma in
+    // raster order.
     std::int16_t g_luma_dc[16] = {};
+    std::uint16_t g_luma_dc_nonzero = 0;
     std::int16_t g_chroma_dc[2][4] = {};
     // Coded-block masks: bit per block with levels (without the DC levels above).
     unsigned g_luma_mask = 0, g_chroma_ac_mask = 0;

@@ -106,9 +106,10 @@ private:
     alignas(kStride) std::uint8_t m_counts[(kSide + 1) * kStride] = {};
 };
 
-unsigned nonzero_mask(const std::int16_t* levels, int count) {
+// Of the DC levels of a chroma component.
+unsigned nonzero_mask(const std::int16_t* levels) {
     unsigned mask = 0;
-    for (int n = 0; n < count; ++n) {
+    for (int n = 0; n < 4; ++n) {
         mask |= (levels[n] != 0 ? 1u : 0u) << n;
     }
     return mask;
@@ -205,8 +206,7 @@ void MacroblockCoder::encodeBlock() {
         for (int component = 0; component < 2; ++component) {
             const std::int16_t* dc = g_chroma_dc[component];
             const bool coded = (g_chroma_dc_mask >> component & 1) != 0;
-            zolt::encodeCAVLCBlock4x4(out, dc, coded ? nonzero_mask(dc, 4) : 0u, 4,
-                                      zolt::kNcChromaDc);
+            zolt::encodeCAVLCBlock4x4(out, dc, coded ? nonzero_mask(dc) : 0u, 4, zolt::kNcChromaDc);
         }
     }
     if (chroma == 2) {
@@ -221,8 +221,7 @@ inline void MacroblockCoder::encode_luma_blocks(BitCursor& out, bool intra16x16)
     std::uint8_t* map = picture.g_cnum_l + first_block();
     BlockCounts<4> counts(map, picture.g_blk_width, g_mb_left, g_mb_up);
     if (intra16x16) {
-        zolt::encodeCAVLCBlock4x4(out, g_luma_dc, nonzero_mask(g_luma_dc, 16), 16,
-                                  counts.token_class(0));
+        zolt::encodeCAVLCBlock4x4(out, g_luma_dc, g_luma_dc_nonzero, 16, counts.token_class(0));
     }
     const int first = intra16x16 ? 1 : 0;  // the DC levels have been sent
     for (unsigned rest = g_coded_block_pattern & 15; rest != 0; rest &= rest - 1) {

@@ -186,7 +186,10 @@ constexpr zolt::LevelCode make_level_code(unsigned state, int level) {
     const bool many = state >= zolt::kManyLevels && state < zolt::kThreeOnes;
     const bool reduced = state < zolt::kThreeOnes;
     if (reduced && magnitude == 1) {
-        const unsigned next = state == zolt::kManyLevels - 1 ? zolt::kThreeOnes : state + 1;
+        unsigned next = state + 1;
+        if (state == zolt::kManyLevels - 1) {
+            next = zolt::kThreeOnes;
+        }
         return {static_cast<std::uint16_t>(sign), 1, 1, static_cast<std::uint8_t>(next)};
     }
     const int suffix_length = first ? (many ? 1 : 0) : static_cast<int>(state) - zolt::kSuffix1 + 1;

@@ -408,6 +408,11 @@ protected:
         if (intra16x16) {
             levels.luma_dc = draw(16, true);
             std::copy(levels.luma_dc.begin(), levels.luma_dc.end(), coder_.g_luma_dc);
+            coder_.g_luma_dc_nonzero = 0;
+            for (int n = 0; n < 16; ++n) {
+                coder_.g_luma_dc_nonzero = static_cast<std::uint16_t>(
+                    coder_.g_luma_dc_nonzero | (coder_.g_luma_dc[n] != 0) << n);
+            }
         }
         for (int c = 0; c < 2; ++c) {
             if (pattern >= 16) {
