@@ -168,6 +168,10 @@ constexpr Case kCases[] = {
          benchmark::DoNotOptimize(k.code_residual_4x4(a.current, kStride, a.pred, quantizer(),
                                                       a.coefs, a.scan, a.nonzero));
      }},
+    {"code_luma_dc",
+     [](const Kernels& k, Arena& a) {
+         benchmark::DoNotOptimize(k.code_luma_dc(a.coefs, quantizer(), a.coefs, a.scan));
+     }},
     {"reconstruct_16x16",
      [](const Kernels& k, Arena& a) {
          k.reconstruct_16x16(a.coefs, 0xffff, a.pred, a.current, kStride);

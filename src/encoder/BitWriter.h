@@ -4,6 +4,7 @@
 #include <cstdint>
 
 #include "encoder/AlignedBuffer.h"
+#include "encoder/bitops.h"
 
 // A bit position in a buffer, and what is written there: the NAL unit under construction, or the
 // macroblocks of one row, which another writer then appends to it.
@@ -21,9 +22,7 @@ public:
         std::uint8_t* byte = g_nal_buf + (g_nal_bitpos >> 3);
         const std::uint64_t window =
             static_cast<std::uint64_t>(*byte) << 56 | value << (64 - (g_nal_bitpos & 7) - length);
-        for (int i = 0; i < 8; ++i) {
-            byte[i] = static_cast<std::uint8_t>(window >> (56 - 8 * i));
-        }
+        zolt::store_big_endian(byte, window);
         g_nal_bitpos += static_cast<unsigned>(length);
     }
     // ue(v) and se(v), clauses 9.1 and 9.1.1.

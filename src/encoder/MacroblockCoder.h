@@ -7,6 +7,8 @@
 #include "encoder/Picture.h"
 #include "kernels/Kernels.h"
 
+class BitCursor;
+
 // One worker's scratch and the functions over it: decides, transforms, reconstructs and writes one
 // macroblock after the other, and deblocks them. A name without a prefix is this macroblock's or
 // this row's; what is reached through `picture` is shared. Nothing but what belongs to the row (its
@@ -87,15 +89,13 @@ public:
     void writeMBSyntax();
     void writeMBSyntax_P();
     bool encode_mb_skip();
-    void encode_I4Modes();
-    void encode_MB_Pred_P();
-    void encode_CBP();
-    void encode_coded_blocks();
+    void encode_header();
+    void encode_I4Modes(BitCursor& out);
+    void encode_MB_Pred_P(BitCursor& out);
+    void encode_CBP(BitCursor& out);
     void encodeBlock();
-    void encode_luma_blocks();
-    void encode_chroma_ac_blocks(int component);
-    std::uint8_t encodeCAVLCBlock4x4(const std::int16_t* levels, unsigned nonzero, int count,
-                                     int table);
+    void encode_luma_blocks(BitCursor& out, bool intra16x16);
+    void encode_chroma_ac_blocks(BitCursor& out, int component);
 
     // ---- diamond: motion search ----
     void generateMBPred();
@@ -163,8 +163,10 @@ public:
     // masks of the levels that are not 0.
     alignas(64) std::int16_t g_scan_levels[24 * 16] = {};
     std::uint16_t g_nonzero[24] = {};
-    // DC levels: intra 16x16 in zig-zag order, chroma in raster order.
+    // DC levels: intra 16x16 in zig-zag order, with the mask of those that are not 0, chroma in
+    // raster order.
     std::int16_t g_luma_dc[16] = {};
+    std::uint16_t g_luma_dc_nonzero = 0;
     std::int16_t g_chroma_dc[2][4] = {};
     // Coded-block masks: bit per block with levels (without the DC levels above).
     unsigned g_luma_mask = 0, g_chroma_ac_mask = 0;

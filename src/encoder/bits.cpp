@@ -31,14 +31,6 @@ constexpr ExpGolombLengths uvlc_unsigned_len_tab = make_exp_golomb_lengths();
 // Bytes that a write_bits may touch behind the last one that it writes to.
 constexpr std::size_t kSlack = 64;
 
-std::uint64_t load_bits(const std::uint8_t* bytes, int count) {
-    std::uint64_t value = 0;
-    for (int i = 0; i < count; ++i) {
-        value = value << 8 | bytes[i];
-    }
-    return value;
-}
-
 }  // namespace
 
 void BitWriter::allocate(std::size_t size, const char* name) {
@@ -73,18 +65,17 @@ int BitWriter::uvlc_unsigned_length(unsigned v) {
     return v < 256 ? uvlc_unsigned_len_tab.length[v] : 2 * zolt::bit_length(v + 1) - 1;
 }
 
+// Reads whole windows: a buffer's slack is there to be read as well.
 void BitWriter::append(const BitWriter& other) {
-    constexpr int kBytes = kMaxWrite / 8;
     const std::uint8_t* bytes = other.g_nal_buf;
     unsigned left = other.g_nal_bitpos;
     for (; left >= kMaxWrite; left -= kMaxWrite) {
-        write_bits(load_bits(bytes, kBytes), kMaxWrite);
-        bytes += kBytes;
+        write_bits(zolt::load_big_endian(bytes) >> (64 - kMaxWrite), kMaxWrite);
+        bytes += kMaxWrite / 8;
     }
     if (left > 0) {
         const int length = static_cast<int>(left);
-        const int count = (length + 7) / 8;
-        write_bits(load_bits(bytes, count) >> (8 * count - length), length);
+        write_bits(zolt::load_big_endian(bytes) >> (64 - length), length);
     }
 }
 

@@ -59,11 +59,11 @@ constexpr int kLargeLevelCost = 9999;
 constexpr int kMin8x8Cost = 5;
 constexpr int kMinMacroblockCost = 6;
 
-// Cost of an inter block's levels; counting stops above 5, which keeps any 8x8 block.
-int coefficient_cost(const std::int16_t* scan, unsigned nonzero) {
-    int cost = 0;
+// Cost of an inter block's levels, added to that of the blocks before it. Counting stops where it
+// keeps the macroblock.
+int coefficient_cost(const std::int16_t* scan, unsigned nonzero, int cost) {
     int next = 0;  // position after the last level
-    for (; nonzero != 0 && cost <= 5; nonzero &= nonzero - 1) {
+    for (; nonzero != 0 && cost < kMinMacroblockCost; nonzero &= nonzero - 1) {
         const int position = zolt::lowest_bit(nonzero);
         cost += std::abs(scan[position]) > 1 ? kLargeLevelCost : COEFF_COST[position - next];
         next = position + 1;
@@ -77,29 +77,6 @@ int quantize_dc(int value, const Quantizer& q) {
         (std::abs(value) * q.forward[0] + 2 * q.rounding) >> (q.shift + 1), zolt::kMaxLevel);
     return value < 0 ? -magnitude : magnitude;
 }
-
-// The 4x4 Hadamard transform of clause 8.5.10, in place.
-void hadamard_4x4(int* v) {
-    for (int pass = 0; pass < 2; ++pass) {
-        const int step = pass == 0 ? 1 : 4;
-        for (int i = 0; i < 4; ++i) {
-            int* x = v + (pass == 0 ? 4 * i : i);
-            const int a = x[0] + x[step];
-            const int b = x[0] - x[step];
-            const int c = x[2 * step] + x[3 * step];
-            const int d = x[2 * step] - x[3 * step];
-            x[0] = a + c;
-            x[step] = a - c;
-            x[2 * step] = b - d;
-            x[3 * step] = b + d;
-        }
-    }
-}
-
-// Block index in decoding order of raster block 0..15, and of its zig-zag index.
-constexpr std::uint8_t kDecodingOrder[16] = {0, 1, 4, 5, 2, 3, 6, 7, 8, 9, 12, 13, 10, 11, 14, 15};
-constexpr std::uint8_t inv_zigzag_blk_map[16] = {0, 1, 5,  6,  2, 4,  7,  12,
-                                                 3, 8, 11, 13, 9, 10, 14, 15};
 
 }  // namespace
 
@@ -134,28 +111,12 @@ void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
 // Intra 16x16 luma (clause 8.5.2): the DC coefficients have a transform of their own.
 void MacroblockCoder::quantTransform_luma_16x16() {
     const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
-    std::int16_t constant[16];
+    std::int16_t dc[16];
     g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred, q,
-                                                 constant, g_mb_coefs, g_scan_levels, g_nonzero);
-    int dc[16];
-    for (int r = 0; r < 16; ++r) {
-        dc[r] = constant[kDecodingOrder[r]];
-    }
-    hadamard_4x4(dc);
-    for (int r = 0; r < 16; ++r) {
-        const int level = quantize_dc(dc[r] >> 1, q);
-        g_luma_dc[inv_zigzag_blk_map[r]] = static_cast<std::int16_t>(level);
-        dc[r] = level * q.dequant[0];
-    }
-    hadamard_4x4(dc);
-    std::uint32_t reconstructed = g_luma_mask;
-    for (int r = 0; r < 16; ++r) {
-        const int k = kDecodingOrder[r];
-        const int value = (dc[r] + 2) >> 2;
-        g_mb_coefs[16 * k] = static_cast<std::int16_t>(value);
-        reconstructed |= (value != 0 ? 1u : 0u) << k;
-    }
-    g_kernels->reconstruct_16x16(g_mb_coefs, reconstructed, g_mb_pred, g_mb_src_y,
+                                                 dc, g_mb_coefs, g_scan_levels, g_nonzero);
+    const std::uint32_t constant = g_kernels->code_luma_dc(dc, q, g_mb_coefs, g_luma_dc);
+    g_luma_dc_nonzero = static_cast<std::uint16_t>(constant);
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, g_mb_pred, g_mb_src_y,
                                  picture.g_stride_luma);
 }
 
@@ -168,9 +129,10 @@ void MacroblockCoder::quantTransform_luma_16x16P() {
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
         const unsigned blocks = 0xfu << (4 * block8x8);
         int cost = 0;
-        for (unsigned rest = g_luma_mask & blocks; rest != 0; rest &= rest - 1) {
+        for (unsigned rest = g_luma_mask & blocks; rest != 0 && cost < kMinMacroblockCost;
+             rest &= rest - 1) {
             const int k = zolt::lowest_bit(rest);
-            cost += coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k]);
+            cost = coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k], cost);
         }
         if (cost < kMin8x8Cost) {
             g_luma_mask &= ~blocks;

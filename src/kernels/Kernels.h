@@ -148,6 +148,15 @@ struct Kernels {
                                        std::int16_t* coefs, std::int16_t* scan,
                                        std::uint16_t* nonzero);
 
+    // The constant coefficients of the 16 luma blocks of an intra 16x16 macroblock, in decoding
+    // order (magnitudes up to 4080): their own 4x4 transform, halved, and its quantiser, level =
+    // sign(c) * min((|c| * forward[0] + 2 * rounding) >> (shift + 1), kMaxLevel). Writes the levels
+    // in zig-zag order to scan and what clause 8.5.10 makes of them to the constant coefficients of
+    // the blocks in coefs. Returns the mask of the levels that are not 0 (bit n: scan position n)
+    // in the low half and that of the blocks whose constant coefficient is not 0 in the high half.
+    std::uint32_t (*code_luma_dc)(const std::int16_t* dc, const Quantizer& quantizer,
+                                  std::int16_t* coefs, std::int16_t* scan);
+
     // Inverse transform of clause 8.5.12.2 with 32-bit sums, added to the prediction, clipped and
     // stored at dst. Blocks whose bit of the mask is 0 are copies of the prediction. Needs |c| <
     // 2^15.

@@ -104,6 +104,52 @@ uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* 
     return code_residual<1, 4>(src, stride, pred, quantizer, nullptr, coefs, scan, nonzero);
 }
 
+// The 4x4 Hadamard transform of clause 8.5.10, in place.
+void hadamard_4x4(int* v) {
+    for (int pass = 0; pass < 2; ++pass) {
+        const int step = pass == 0 ? 1 : 4;
+        for (int i = 0; i < 4; ++i) {
+            int* x = v + (pass == 0 ? 4 * i : i);
+            const int a = x[0] + x[step];
+            const int b = x[0] - x[step];
+            const int c = x[2 * step] + x[3 * step];
+            const int d = x[2 * step] - x[3 * step];
+            x[0] = a + c;
+            x[step] = a - c;
+            x[2 * step] = b - d;
+            x[3 * step] = b + d;
+        }
+    }
+}
+
+uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* coefs,
+                      int16_t* scan) {
+    int v[16];  // column by column, as kZigzag has it
+    for (int k = 0; k < 16; ++k) {
+        v[block_x(k) + block_y(k) / 4] = dc[k];
+    }
+    hadamard_4x4(v);
+    uint32_t coded = 0;
+    for (int n = 0; n < 16; ++n) {
+        int& c = v[kZigzag[n]];
+        c >>= 1;
+        const int magnitude = std::min(
+            (std::abs(c) * quantizer.forward[0] + 2 * quantizer.rounding) >> (quantizer.shift + 1),
+            kMaxLevel);
+        const int level = c < 0 ? -magnitude : magnitude;
+        scan[n] = static_cast<int16_t>(level);
+        coded |= (level != 0 ? 1u : 0u) << n;
+        c = level * quantizer.dequant[0];
+    }
+    hadamard_4x4(v);
+    for (int k = 0; k < 16; ++k) {
+        const int value = (v[block_x(k) + block_y(k) / 4] + 2) >> 2;
+        coefs[16 * k] = static_cast<int16_t>(value);
+        coded |= (value != 0 ? 0x10000u : 0u) << k;
+    }
+    return coded;
+}
+
 // Inverse core transform of four values with the given input step, written contiguously.
 void inverse_butterfly(const int* w, int step, int* x) {
     const int e = w[0] + w[2 * step];
@@ -169,6 +215,7 @@ void scalar::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual<16, 16>;
     table.code_residual_8x8 = code_residual<4, 8>;
     table.code_residual_4x4 = code_residual_4x4;
+    table.code_luma_dc = code_luma_dc;
     table.reconstruct_16x16 = reconstruct_16x16;
     table.reconstruct_8x8 = reconstruct_8x8;
     table.reconstruct_4x4 = reconstruct_4x4;

@@ -76,6 +76,12 @@ void quantize_eight(__m128i c, const int16_t* forward, const int16_t* dequant, _
     *scaled = _mm_mullo_epi16(*levels, load_aligned(dequant));
 }
 
+// Mask of the 16-bit values of two vectors that are not 0.
+uint32_t nonzero_16(__m128i a, __m128i b) {
+    const __m128i zeros = _mm_cmpeq_epi8(_mm_packs_epi16(a, b), _mm_setzero_si128());
+    return ~static_cast<uint32_t>(_mm_movemask_epi8(zeros)) & 0xffff;
+}
+
 // Quantises a block that has a coefficient beyond the dead zone; returns the mask of its levels.
 uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int16_t* coefs,
                         int16_t* scan) {
@@ -93,9 +99,88 @@ uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int1
     for (int n = 0; n < 16; ++n) {
         scan[n] = levels[kZigzag[n]];
     }
-    const __m128i zeros =
-        _mm_cmpeq_epi8(_mm_packs_epi16(load(scan), load(scan + 8)), _mm_setzero_si128());
-    return static_cast<uint16_t>(~_mm_movemask_epi8(zeros));
+    return static_cast<uint16_t>(nonzero_16(load(scan), load(scan + 8)));
+}
+
+// 4x4 Hadamard transform across four vectors.
+void hadamard_butterfly(__m128i* v) {
+    const __m128i a = _mm_add_epi32(v[0], v[1]);
+    const __m128i b = _mm_sub_epi32(v[0], v[1]);
+    const __m128i c = _mm_add_epi32(v[2], v[3]);
+    const __m128i d = _mm_sub_epi32(v[2], v[3]);
+    v[0] = _mm_add_epi32(a, c);
+    v[1] = _mm_sub_epi32(a, c);
+    v[2] = _mm_sub_epi32(b, d);
+    v[3] = _mm_add_epi32(b, d);
+}
+
+// Exchanges rows and columns.
+void transpose_32(__m128i* v) {
+    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
+    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
+    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
+    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
+    v[0] = _mm_unpacklo_epi64(a, c);
+    v[1] = _mm_unpackhi_epi64(a, c);
+    v[2] = _mm_unpacklo_epi64(b, d);
+    v[3] = _mm_unpackhi_epi64(b, d);
+}
+
+uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* coefs,
+                      int16_t* scan) {
+    // Block rows of the macroblock: in decoding order blocks 0, 1, 4, 5 and 2, 3, 6, 7 stand side
+    // by side.
+    const __m128i upper = _mm_shuffle_epi32(load(dc), _MM_SHUFFLE(3, 1, 2, 0));
+    const __m128i lower = _mm_shuffle_epi32(load(dc + 8), _MM_SHUFFLE(3, 1, 2, 0));
+    const auto low_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpacklo_epi16(x, x), 16); };
+    const auto high_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpackhi_epi16(x, x), 16); };
+    __m128i v[4] = {low_32(upper), high_32(upper), low_32(lower), high_32(lower)};
+    hadamard_butterfly(v);
+    transpose_32(v);
+    hadamard_butterfly(v);  // now vector j holds column j
+
+    // 16-bit factors of values that have 16 bits, the sign included: products of pairs with 0.
+    const __m128i forward = _mm_set1_epi32(quantizer.forward[0]);
+    const __m128i dequant = _mm_set1_epi32(quantizer.dequant[0]);
+    const __m128i rounding = _mm_set1_epi32(2 * quantizer.rounding);
+    const __m128i shift = _mm_cvtsi32_si128(quantizer.shift + 1);
+    const __m128i largest = _mm_set1_epi32(kMaxLevel);
+    alignas(16) int16_t levels[16];
+    for (int j = 0; j < 4; j += 2) {
+        __m128i level[2];
+        for (int i = 0; i < 2; ++i) {
+            const __m128i c = _mm_srai_epi32(v[j + i], 1);
+            const __m128i sign = _mm_srai_epi32(c, 31);
+            const __m128i magnitude = _mm_min_epi16(
+                _mm_srl_epi32(_mm_add_epi32(_mm_madd_epi16(absolute_32(c), forward), rounding),
+                              shift),
+                largest);
+            const __m128i scaled = _mm_madd_epi16(magnitude, dequant);
+            level[i] = _mm_sub_epi32(_mm_xor_si128(magnitude, sign), sign);
+            v[j + i] = _mm_sub_epi32(_mm_xor_si128(scaled, sign), sign);
+        }
+        store(levels + 4 * j, _mm_packs_epi32(level[0], level[1]));
+    }
+    for (int n = 0; n < 16; ++n) {
+        scan[n] = levels[kZigzag[n]];
+    }
+
+    hadamard_butterfly(v);
+    transpose_32(v);
+    hadamard_butterfly(v);
+    for (__m128i& row : v) {
+        row = _mm_srai_epi32(_mm_add_epi32(row, _mm_set1_epi32(2)), 2);
+    }
+    const __m128i values[2] = {
+        _mm_shuffle_epi32(_mm_packs_epi32(v[0], v[1]), _MM_SHUFFLE(3, 1, 2, 0)),
+        _mm_shuffle_epi32(_mm_packs_epi32(v[2], v[3]), _MM_SHUFFLE(3, 1, 2, 0))};
+    alignas(16) int16_t in_order[16];
+    store(in_order, values[0]);
+    store(in_order + 8, values[1]);
+    for (int k = 0; k < 16; ++k) {
+        coefs[16 * k] = in_order[k];
+    }
+    return nonzero_16(load(scan), load(scan + 8)) | nonzero_16(values[0], values[1]) << 16;
 }
 
 // Whether a level of the block is not 0.
@@ -285,6 +370,7 @@ void sse2::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual_16x16;
     table.code_residual_8x8 = code_residual_8x8;
     table.code_residual_4x4 = code_residual_4x4;
+    table.code_luma_dc = code_luma_dc;
     table.reconstruct_16x16 = reconstruct_16x16;
     table.reconstruct_8x8 = reconstruct_8x8;
     table.reconstruct_4x4 = reconstruct_4x4;

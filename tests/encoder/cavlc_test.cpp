@@ -13,6 +13,8 @@
 #include "common/BitReader.h"
 #include "common/Random.h"
 #include "encoder/MacroblockCoder.h"
+#include "encoder/residual_block.h"
+#include "encoder/tables.h"
 
 namespace {
 
@@ -127,8 +129,10 @@ std::vector<Code> codes(const char* const* lists, int count) {
     return std::vector<Code>(lists, lists + count);
 }
 
-// The tables of encodeCAVLCBlock4x4: nC 0..1, 2..3, 4..7, 8 or more, -1.
+// The tables of coeff_token: nC 0..1, 2..3, 4..7, 8 or more, -1.
 enum Table { kNc0, kNc2, kNc4, kNc8, kChromaDc };
+constexpr unsigned kTokenClass[5] = {zolt::kNc0, zolt::kNc2, zolt::kNc4, zolt::kNc8,
+                                     zolt::kNcChromaDc};
 
 class BlockDecoder {
 public:
@@ -224,25 +228,36 @@ class ResidualBlock : public testing::Test {
 protected:
     ResidualBlock() { writer_.allocate(4096, "writer_"); }
 
-    // Writes a block and expects the decoder to read it again to its last bit.
+    // Writes a block behind some other bits and expects the decoder to read it again to its last
+    // bit.
     void check(const std::vector<int>& levels, Table table) {
         std::vector<std::int16_t> scan(levels.begin(), levels.end());
         unsigned nonzero = 0;
+        int total = 0;
         for (std::size_t n = 0; n < levels.size(); ++n) {
             nonzero |= (levels[n] != 0 ? 1u : 0u) << n;
+            total += levels[n] != 0;
         }
         const int count = static_cast<int>(levels.size());
+        const int before = ++blocks_ % 8;
         writer_.reset();
-        coder_.encodeCAVLCBlock4x4(scan.data(), nonzero, count, table);
+        if (before > 0) {
+            writer_.write_bits((1u << before) - 1, before);
+        }
+        BitCursor cursor(writer_);
+        ASSERT_EQ(
+            zolt::encodeCAVLCBlock4x4(cursor, scan.data(), nonzero, count, kTokenClass[table]),
+            total);
+        cursor.end(writer_);
         BitReader reader(writer_.g_nal_buf, (writer_.g_nal_bitpos + 7) / 8);
+        ASSERT_EQ(reader.u(before), (1u << before) - 1);
         ASSERT_EQ(decoder_.decode(reader, table, count), levels) << "table " << table;
         ASSERT_EQ(reader.position(), writer_.g_nal_bitpos);
     }
 
-    Picture picture_{16, 16, zolt::best_kernels()};
-    MacroblockCoder coder_{picture_};
-    BitWriter& writer_ = coder_.row_bits;
+    BitWriter writer_;
     BlockDecoder decoder_;
+    int blocks_ = 0;
 };
 
 TEST_F(ResidualBlock, CodesOfTheDecoderArePrefixCodes) {
@@ -296,6 +311,177 @@ TEST_F(ResidualBlock, EveryMagnitude) {
             ASSERT_NO_FATAL_FAILURE(check(levels, kNc4));
         }
     }
+}
+
+// residual() of clause 7.3.5.3 read with the nC of clause 9.2.1, TotalCoeff in maps of its own.
+class MacroblockDecoder {
+public:
+    static constexpr int kBlocks = 12;  // luma blocks in a row of the picture
+
+    // What a macroblock holds: the levels of its blocks in the order of g_scan_levels, those of the
+    // DC blocks, and which of them are coded.
+    struct Levels {
+        std::vector<int> blocks[24], luma_dc, chroma_dc[2];
+    };
+
+    Levels decode(BitReader& reader, int mb_x, int mb_y, bool intra16x16, int pattern) {
+        Levels result;
+        const int count = intra16x16 ? 15 : 16;
+        if (intra16x16) {
+            result.luma_dc = decoder_.decode(reader, table(0, 4 * mb_x, 4 * mb_y), 16);
+        }
+        for (int k = 0; k < 16; ++k) {
+            const int x = 4 * mb_x + 2 * (k >> 2 & 1) + (k & 1);
+            const int y = 4 * mb_y + 2 * (k >> 3) + (k >> 1 & 1);
+            const bool coded = (pattern >> k / 4 & 1) != 0;
+            read(reader, 0, x, y, count, coded, result.blocks[k]);
+        }
+        for (std::vector<int>& dc : result.chroma_dc) {
+            if (pattern >= 16) {
+                dc = decoder_.decode(reader, kChromaDc, 4);
+            }
+        }
+        for (int b = 0; b < 8; ++b) {
+            const int x = 2 * mb_x + b % 2;
+            const int y = 2 * mb_y + b / 2 % 2;
+            read(reader, 1 + b / 4, x, y, 15, pattern >= 32, result.blocks[16 + b]);
+        }
+        return result;
+    }
+
+private:
+    Table table(int component, int x, int y) const {
+        const int left = x > 0 ? counts_[component][y][x - 1] : 0;
+        const int up = y > 0 ? counts_[component][y - 1][x] : 0;
+        const int nC = x > 0 && y > 0 ? (left + up + 1) >> 1 : left + up;
+        return nC < 2 ? kNc0 : nC < 4 ? kNc2 : nC < 8 ? kNc4 : kNc8;
+    }
+    void read(BitReader& reader, int component, int x, int y, int count, bool coded,
+              std::vector<int>& levels) {
+        levels.assign(static_cast<std::size_t>(count), 0);
+        if (coded) {
+            levels = decoder_.decode(reader, table(component, x, y), count);
+        }
+        counts_[component][y][x] = static_cast<int>(levels.size()) -
+                                   static_cast<int>(std::count(levels.begin(), levels.end(), 0));
+    }
+
+    BlockDecoder decoder_;
+    int counts_[3][kBlocks][kBlocks] = {};
+};
+
+class MacroblockResidual : public testing::Test {
+protected:
+    MacroblockResidual() {
+        coder_.row_bits.allocate(MacroblockCoder::kMaxMacroblockBits / 8 + 1, "row_bits");
+    }
+
+    // Gives the coder's macroblock random levels: `share` of 16 positions, magnitudes to `largest`.
+    MacroblockDecoder::Levels fill(bool intra16x16, int pattern, int share, int largest) {
+        MacroblockDecoder::Levels levels;
+        const auto draw = [&](int count, bool coded) {
+            std::vector<int> values(static_cast<std::size_t>(count));
+            for (int& value : values) {
+                const int level = random_.between(1, largest);
+                if (coded && random_.between(0, 15) < share) {
+                    value = random_.between(0, 1) ? level : -level;
+                }
+            }
+            return values;
+        };
+        coder_.g_coded_block_pattern = pattern;
+        coder_.g_chroma_dc_mask = 3;
+        for (int k = 0; k < 24; ++k) {
+            const int count = k < 16 && !intra16x16 ? 16 : 15;
+            levels.blocks[k] = draw(count, k < 16 ? pattern >> k / 4 & 1 : pattern >= 32);
+            std::int16_t* scan = coder_.g_scan_levels + 16 * k;
+            coder_.g_nonzero[k] = 0;
+            for (int n = 0; n < 16; ++n) {
+                // The constant coefficient has no place among the 15.
+                const int at = n - (16 - count);
+                scan[n] = static_cast<std::int16_t>(
+                    at < 0 ? 0 : levels.blocks[k][static_cast<std::size_t>(at)]);
+                coder_.g_nonzero[k] =
+                    static_cast<std::uint16_t>(coder_.g_nonzero[k] | (scan[n] != 0) << n);
+            }
+        }
+        if (intra16x16) {
+            levels.luma_dc = draw(16, true);
+            std::copy(levels.luma_dc.begin(), levels.luma_dc.end(), coder_.g_luma_dc);
+            coder_.g_luma_dc_nonzero = 0;
+            for (int n = 0; n < 16; ++n) {
+                coder_.g_luma_dc_nonzero = static_cast<std::uint16_t>(
+                    coder_.g_luma_dc_nonzero | (coder_.g_luma_dc[n] != 0) << n);
+            }
+        }
+        for (int c = 0; c < 2; ++c) {
+            if (pattern >= 16) {
+                levels.chroma_dc[c] = draw(4, true);
+                std::copy(levels.chroma_dc[c].begin(), levels.chroma_dc[c].end(),
+                          coder_.g_chroma_dc[c]);
+            }
+        }
+        return levels;
+    }
+
+    Picture picture_{48, 48, zolt::best_kernels()};
+    MacroblockCoder coder_{picture_};
+    Random random_{5};
+};
+
+// The blocks' order, their nC at and inside the picture's edges, and which of them are sent.
+TEST_F(MacroblockResidual, MacroblocksReadBack) {
+    for (int iteration = 0; iteration < 400; ++iteration) {
+        MacroblockDecoder decoder;
+        picture_.initFrameParams();
+        for (int mb = 0; mb < 9; ++mb) {
+            const bool intra16x16 = random_.between(0, 2) == 0;
+            const int luma = random_.between(0, 15);
+            const int pattern = (intra16x16 ? luma / 8 * 15 : luma) + 16 * random_.between(0, 2);
+            coder_.g_mb_x = mb % 3;
+            coder_.g_mb_y = mb / 3;
+            coder_.g_mapMBNumber = mb;
+            coder_.setMBOffsets();
+            coder_.g_cur_mb_mode = intra16x16 ? MB_INTRA16x16 : MB_P16x16;
+            const MacroblockDecoder::Levels levels =
+                fill(intra16x16, pattern, random_.between(0, 16), 1 << random_.between(0, 6));
+            coder_.row_bits.reset();
+            coder_.encodeBlock();
+            const unsigned bits = coder_.row_bits.g_nal_bitpos;
+            BitReader reader(coder_.row_bits.g_nal_buf, (bits + 7) / 8);
+            const MacroblockDecoder::Levels read =
+                decoder.decode(reader, mb % 3, mb / 3, intra16x16, pattern);
+            for (int k = 0; k < 24; ++k) {
+                ASSERT_EQ(read.blocks[k], levels.blocks[k]) << "block " << k;
+            }
+            ASSERT_EQ(read.luma_dc, levels.luma_dc);
+            ASSERT_EQ(read.chroma_dc[0], levels.chroma_dc[0]);
+            ASSERT_EQ(read.chroma_dc[1], levels.chroma_dc[1]);
+            ASSERT_EQ(reader.position(), bits);
+        }
+    }
+}
+
+// A macroblock of 28-bit levels only, with all that a header can hold, takes at most what the check
+// of the NAL buffer allows for.
+TEST_F(MacroblockResidual, LargestMacroblock) {
+    coder_.setMBOffsets();
+    coder_.g_cur_mb_mode = MB_INTRA4x4;
+    coder_.g_mb_type = 5;
+    coder_.g_chroma_mode = 3;
+    std::fill(coder_.g_rem_intra4x4_pred_mode, coder_.g_rem_intra4x4_pred_mode + 16,
+              std::uint8_t{7});
+    fill(false, 47, 16, zolt::kMaxLevel);
+    for (std::int16_t& level : coder_.g_scan_levels) {
+        level = -zolt::kMaxLevel;
+    }
+    for (auto& component : coder_.g_chroma_dc) {
+        std::fill(component, component + 4, std::int16_t{-zolt::kMaxLevel});
+    }
+    coder_.g_skip_run = 139263;
+    coder_.writeMBSyntax_P();
+    EXPECT_LE(coder_.row_bits.g_nal_bitpos, MacroblockCoder::kMaxMacroblockBits);
+    EXPECT_GE(coder_.row_bits.g_nal_bitpos, (256 + 2 * 4 + 8 * 15) * 28u);
 }
 
 }  // namespace

@@ -91,7 +91,9 @@ TEST(EngineDeath, StatesThatEndTheProcess) {
     EXPECT_EXIT(engine.rows.coders[0]->setMBType_CBP(), exits(-1),
                 "^setMBType_CBP. Unsupported mode\n");
     engine.picture.g_num_ref_active = 2;
-    EXPECT_EXIT(engine.rows.coders[0]->encode_MB_Pred_P(), exits(107),
+    engine.rows.coders[0]->g_cur_mb_mode = MB_P16x16;
+    engine.rows.coders[0]->bits = &engine.nal;
+    EXPECT_EXIT(engine.rows.coders[0]->encode_header(), exits(107),
                 "^Unsupported Macroblock type in encode_MB_Pred_P\n");
 }
 

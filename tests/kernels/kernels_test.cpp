@@ -306,6 +306,18 @@ constexpr Case kCases[] = {
     {"code_residual_16x16", run_residual<&Kernels::code_residual_16x16, 16>},
     {"code_residual_8x8", run_residual<&Kernels::code_residual_8x8, 8>},
     {"code_residual_4x4", run_residual<&Kernels::code_residual_4x4, 4>},
+    {"code_luma_dc",
+     [](const Kernels& k, Arena& a, Random random) {
+         const int qp = random.between(0, 51);
+         // All of one magnitude, so that they meet in one sum, or of any.
+         const int largest = random.between(0, 4080);
+         const bool any = random.between(0, 1) != 0;
+         for (int n = 0; n < 16; ++n) {
+             const int magnitude = any ? random.between(0, largest) : largest;
+             a.dc[1 + n] = static_cast<std::int16_t>(random.between(0, 3) ? magnitude : -magnitude);
+         }
+         a.result = k.code_luma_dc(a.dc + 1, zolt::intra_quantizer(qp), a.coef(), a.levels());
+     }},
     {"reconstruct_16x16",
      [](const Kernels& k, Arena& a, Random random) {
          const Place dst(a.plane[0], random, 16);
