@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <memory>
 #include <random>
 #include <string>
@@ -101,6 +102,19 @@ const zolt::Quantizer& quantizer() {
     return zolt::inter_quantizer(kQp);
 }
 
+// A macroblock in the middle of a picture, its samples new each time.
+void run_code_intra_4x4(const Kernels& k, Arena& a) {
+    for (int y = 0; y < 16; ++y) {
+        std::memcpy(a.current + y * kStride, a.block + 16 * y, 16);
+    }
+    std::int8_t modes[5 * 5] = {};
+    std::uint8_t predicted[16], chosen[16];
+    const zolt::Intra4x4 macroblock = {a.current,   kStride,   true,         true,   true,
+                                       modes + 6,   5,         &quantizer(), 32,     192,
+                                       {8, 10, 12}, predicted, chosen,       a.scan, a.nonzero};
+    benchmark::DoNotOptimize(k.code_intra_4x4(macroblock));
+}
+
 constexpr Case kCases[] = {
     {"arrange_block",
      [](const Kernels& k, Arena& a) { k.arrange_block(a.current, kStride, a.block); }},
@@ -190,6 +204,7 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) {
          k.intra_4x4_modes(a.current, kStride, a.reference(), 100, a.pred, a.coefs);
      }},
+    {"code_intra_4x4", run_code_intra_4x4},
     {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical>},
     {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal>},
     {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical>},
@@ -217,6 +232,9 @@ void measure(benchmark::State& state, const Kernels& kernels, const Case& c) {
 int main(int argc, char** argv) {
     for (const Case& c : kCases) {
         for (const Kernels& kernels : zolt::kernel_tables()) {
+            if (c.run == run_code_intra_4x4 && !kernels.code_intra_4x4) {
+                continue;
+            }
             benchmark::RegisterBenchmark(
                 (std::string(c.name) + "/" + kernels.name).c_str(),
                 [&](benchmark::State& state) { measure(state, kernels, c); });

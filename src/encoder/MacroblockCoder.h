@@ -41,7 +41,9 @@ public:
     std::ptrdiff_t first_block() const;
     void code_intra();
     void code_intra4x4();
+    void code_intra4x4_by_block(std::int8_t* modes, std::ptrdiff_t stride, std::uint8_t* predicted);
     void set_block_availability();
+    std::uint8_t has_up_right() const;
     void generatePredError16x16();
     void predict_inter_chroma();
     void setMBType_CBP();
@@ -49,6 +51,7 @@ public:
     void setMBValues_P();
 
     // ---- transform ----
+    const zolt::Quantizer& luma_quantizer() const;
     void quantTransform_luma_4x4(int k, const std::uint8_t* pred);
     void quantTransform_luma_16x16();
     void quantTransform_luma_16x16P();
@@ -81,6 +84,8 @@ public:
     int learn16_mode();
     int learn_chroma_mode();
     int learn4_mode(int k, int predicted_mode, std::uint8_t* pred);
+    zolt::Intra4x4 intra4x4_rule(std::int8_t* modes, std::ptrdiff_t stride,
+                                 std::uint8_t* predicted);
     void compute_block_features();
 
     // ---- cavlc: macroblock_layer(), clauses 7.3.5 and 9.2 ----

@@ -16,6 +16,16 @@ constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
 // Factors of the predicted mode's share at which another 4x4 mode is dropped, by step.
 constexpr double thresh_4[3] = {2.0, 1.25, 1.0};
 
+// The predicted 4x4 mode is kept up to this distortion.
+constexpr int kept_distortion(int lambda) {
+    return 8 * lambda + 64;
+}
+
+// What another 4x4 mode pays at each phase.
+constexpr int other_mode_rate(int lambda) {
+    return 2 * lambda;
+}
+
 // 4x4 modes that a block lacks the neighbours for (1), by whether there are samples above and to
 // the left; what follows the nine modes is padding.
 constexpr std::int16_t kUnavailable4[2][2][16] = {
@@ -311,7 +321,7 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
     ipred4(pred, neighbours, up, left, predicted_mode);
     g_kernels->phase_satd_4x4(src, picture.g_stride_luma, pred, d);
     const int predicted_cost = d[0] + d[1] + d[2] + d[3];
-    if ((!up && !left) || predicted_cost <= 8 * g_intra_lambda + 64) {
+    if ((!up && !left) || predicted_cost <= kept_distortion(g_intra_lambda)) {
         return predicted_mode;
     }
 
@@ -320,7 +330,7 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
     g_kernels->intra_4x4_modes(src, picture.g_stride_luma, neighbours,
                                ipred4_dc(neighbours, up, left), modes[0], distortion[0]);
     const int share = predicted_cost >> 2;
-    const std::int16_t rate = static_cast<std::int16_t>(2 * g_intra_lambda);
+    const std::int16_t rate = static_cast<std::int16_t>(other_mode_rate(g_intra_lambda));
     // Sixteen lanes that the compiler can put into vectors; a cost is at most 4 * (2040 + 182).
     std::int16_t cost[16] = {};
     std::int16_t dropped[16];  // 0: still a candidate
@@ -351,4 +361,30 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
         std::copy(modes[best], modes[best] + 16, pred);
     }
     return best;
+}
+
+// The same for all blocks of the macroblock, as Kernels::code_intra_4x4 takes it. modes: the
+// macroblock's entries in the map of modes, with `stride` entries a row; the predicted modes go to
+// predicted.
+zolt::Intra4x4 MacroblockCoder::intra4x4_rule(std::int8_t* modes, std::ptrdiff_t stride,
+                                              std::uint8_t* predicted) {
+    zolt::Intra4x4 mb = {};
+    mb.samples = g_mb_src_y;
+    mb.stride = picture.g_stride_luma;
+    mb.up = g_mb_up != 0;
+    mb.left = g_mb_left != 0;
+    mb.up_right = has_up_right() != 0;
+    mb.modes = modes;
+    mb.modes_stride = stride;
+    mb.quantizer = &luma_quantizer();
+    mb.rate = other_mode_rate(g_intra_lambda);
+    mb.kept = kept_distortion(g_intra_lambda);
+    for (int step = 0; step < 3; ++step) {
+        mb.drop[step] = static_cast<std::int16_t>(4 * (step + 1) * thresh_4[step]);
+    }
+    mb.predicted = predicted;
+    mb.chosen = g_ipMBPred;
+    mb.scan = g_scan_levels;
+    mb.nonzero = g_nonzero;
+    return mb;
 }

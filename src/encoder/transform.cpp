@@ -111,11 +111,15 @@ const zolt::Quantizer& zolt::inter_quantizer(int qp) {
     return kInterQuantizers.by_qp[qp];
 }
 
+// That of intra 4x4 blocks.
+const Quantizer& MacroblockCoder::luma_quantizer() const {
+    return picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(picture.g_mbQp)
+                                               : zolt::inter_quantizer(picture.g_mbQp);
+}
+
 // Intra 4x4 block k: transform, levels, reconstruction in the current picture. pred: 4x4 samples.
 void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
-    const Quantizer& q = picture.g_slp->sliceType == I_SLICE
-                             ? zolt::intra_quantizer(picture.g_mbQp)
-                             : zolt::inter_quantizer(picture.g_mbQp);
+    const Quantizer& q = luma_quantizer();
     std::uint8_t* block =
         g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;

@@ -56,6 +56,34 @@ struct IyuvRows {
     std::uint8_t *u, *v;
 };
 
+// An intra 4x4 macroblock's luma for Kernels::code_intra_4x4.
+struct Intra4x4 {
+    // Its samples in the picture, which the reconstruction replaces. Those around it are read, as
+    // far as 4 samples to the right of it, whether or not they are there.
+    std::uint8_t* samples;
+    std::ptrdiff_t stride;
+    bool up, left, up_right;  // the macroblocks above, to the left and above to the right are there
+
+    // Its entries in a map of modes by 4x4 block, to be written; those above and to the left of
+    // them are read. A negative one: there is no block.
+    std::int8_t* modes;
+    std::ptrdiff_t modes_stride;
+
+    const Quantizer* quantizer;
+
+    // The predicted mode is kept up to a distortion of `kept`. Otherwise other
+    // modes pay `rate` for each phase, and are dropped after phase n when they cost more than
+    // drop[n] / 4 of the predicted mode's share, a fourth of its distortion.
+    int rate, kept;
+    std::int16_t drop[3];
+
+    // Results by block in decoding order: predicted and chosen modes, the levels in zig-zag order
+    // and the masks of those that are not 0.
+    std::uint8_t *predicted, *chosen;
+    std::int16_t* scan;
+    std::uint16_t* nonzero;
+};
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
@@ -186,6 +214,13 @@ struct Kernels {
     void (*intra_4x4_modes)(const std::uint8_t* src, std::ptrdiff_t stride,
                             const std::uint8_t* neighbours, int dc, std::uint8_t* preds,
                             std::int16_t* distortion);
+
+    // Intra 4x4 luma of a macroblock, all blocks at once: mode, levels and reconstruction of every
+    // block, as MacroblockCoder makes them block by block with the entries above. Returns the mask
+    // of the blocks with levels. This one chooses as well, since every block waits for the choice
+    // of the one before; the numbers that it goes by are its caller's. Null where block by block is
+    // the fastest way.
+    std::uint32_t (*code_intra_4x4)(const Intra4x4& macroblock);
 
     // ---- Deblocking (clause 8.7.2) ----
 
