@@ -105,10 +105,10 @@ public:
         const int reference = _mm_cvtsi128_si32(predicted_cost) & 0xffff;
         const bool other =
             static_cast<int>(reference > m_rule.kept) & static_cast<int>(cost < (reference & ~3));
-        const int at = other ? 2 * (slot & 3) + (slot >> 2) : 8;
+        const int at = one_of(other, 2 * (slot & 3) + (slot >> 2), 8);
         const __m128i pred =
             _mm_shuffle_epi8(load_16(preds + 16 * at), load_16(kButterflyFromPhases.at));
-        return {other ? slot_mode(in.predicted, slot) : in.predicted, pred};
+        return {one_of(other, slot_mode(in.predicted, slot), in.predicted), pred};
     }
 
 private:

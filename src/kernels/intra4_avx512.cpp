@@ -110,7 +110,7 @@ public:
             _mm_blendv_epi8(_mm_shuffle_epi8(predicted, load_16(kButterflyFromPhases.at)), chosen,
                             _mm_broadcastw_epi16(other));
         const int mode = slot_mode(in.predicted, _mm_extract_epi16(best, 1));
-        return {_mm_cvtsi128_si32(other) & 1 ? mode : in.predicted, pred};
+        return {one_of(_mm_cvtsi128_si32(other) & 1, mode, in.predicted), pred};
     }
 
 private:

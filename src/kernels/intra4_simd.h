@@ -167,6 +167,12 @@ struct SearchInput {
     const SourceBlock& source;
 };
 
+// a if condition is 1, b if it is 0, without a branch that a compiler might make of it: which of
+// two modes it is cannot be foretold.
+inline int one_of(int condition, int a, int b) {
+    return b ^ ((a ^ b) & -condition);
+}
+
 struct SearchResult {
     int mode;
     __m128i pred;  // its prediction in butterfly order
@@ -208,6 +214,11 @@ struct SearchRule {
     }
 };
 
+struct CodedBlock {
+    __m128i samples;   // reconstruction in raster order
+    unsigned nonzero;  // mask of the levels that are not 0
+};
+
 // A quantiser in vectors, for one block at a time.
 class BlockCoder {
 public:
@@ -218,9 +229,8 @@ public:
           m_shift(_mm_cvtsi32_si128(q.shift)) {}
 
     // Codes a block from its samples and their prediction, both in butterfly order: levels in
-    // zig-zag order at scan, the mask of those that are not 0 at nonzero. Returns the
-    // reconstruction in raster order.
-    __m128i code(__m128i samples, __m128i pred, std::int16_t* scan, std::uint16_t* nonzero) const {
+    // zig-zag order at scan.
+    CodedBlock code(__m128i samples, __m128i pred, std::int16_t* scan) const {
         const __m128i zero = _mm_setzero_si128();
         const __m128i pred_upper = _mm_unpacklo_epi8(pred, zero);
         const __m128i pred_lower = _mm_unpackhi_epi8(pred, zero);
@@ -237,12 +247,12 @@ public:
         store_16(scan + 8, scan_high);
         const int zeros =
             _mm_movemask_epi8(_mm_cmpeq_epi8(_mm_packs_epi16(scan_low, scan_high), zero));
-        *nonzero = static_cast<std::uint16_t>(~zeros);
+        const unsigned nonzero = static_cast<unsigned>(~zeros) & 0xffff;
 
         first = _mm_mullo_epi16(levels_01, load_16(m_q.dequant));
         last = _mm_mullo_epi16(levels_23, load_16(m_q.dequant + 8));
         if (may_exceed_16_bits(first, last)) {
-            return reconstruct_wide(first, last, pred);
+            return {reconstruct_wide(first, last, pred), nonzero};
         }
         first = _mm_add_epi16(first, _mm_cvtsi32_si128(32));  // the rounding of every sample
         inverse(&first, &last);
@@ -250,7 +260,7 @@ public:
         inverse(&first, &last);
         const __m128i upper = _mm_add_epi16(_mm_srai_epi16(first, 6), pred_upper);
         const __m128i lower = _mm_add_epi16(_mm_srai_epi16(last, 6), pred_lower);
-        return _mm_shuffle_epi8(_mm_packus_epi16(upper, lower), raster());
+        return {_mm_shuffle_epi8(_mm_packus_epi16(upper, lower), raster()), nonzero};
     }
 
 private:
@@ -361,10 +371,14 @@ template <typename Search>
     }
     const Search search(mb);
     const BlockCoder coder(*mb.quantizer);
+    // Not read again after every store.
+    const std::ptrdiff_t stride = mb.stride, modes_stride = mb.modes_stride;
+    std::uint8_t* const predicted_modes = mb.predicted;
+    std::uint8_t* const chosen = mb.chosen;
     std::uint32_t coded = 0;
     for (const BlockPlace& place : kPlaces) {
-        std::uint8_t* samples = mb.samples + 4 * place.y * mb.stride + 4 * place.x;
-        const std::uint8_t* above = samples - mb.stride;
+        std::uint8_t* samples = mb.samples + 4 * place.y * stride + 4 * place.x;
+        const std::uint8_t* above = samples - stride;
         const __m128i row_above = _mm_unpacklo_epi32(load_4(above), load_4(above + 4));
         const __m128i others = _mm_insert_epi8(load_4(left_columns + place.y), above[-1], 4);
         const bool up = place.y > 0 || mb.up;
@@ -372,27 +386,29 @@ template <typename Search>
         const bool last = place.x == 3 && place.y == 0;
         const bool up_right = place.up_right + (last ? mb.up_right : up) > 1;
 
-        std::int8_t* mode = mb.modes + place.y * mb.modes_stride + place.x;
-        const int mode_above = mode[-mb.modes_stride], mode_left = mode[-1];
+        std::int8_t* mode = mb.modes + place.y * modes_stride + place.x;
+        const int mode_above = mode[-modes_stride], mode_left = mode[-1];
         const int smaller = mode_above < mode_left ? mode_above : mode_left;
         const int predicted = smaller >= 0 ? smaller : 2;
         const SourceBlock& source = blocks[4 * place.y + place.x];
         const SearchResult result = search.run(
             {_mm_unpacklo_epi64(row_above, others), up_right, 2 * up + left, predicted, source});
         *mode = static_cast<std::int8_t>(result.mode);
-        mb.predicted[place.k] = static_cast<std::uint8_t>(predicted);
-        mb.chosen[place.k] = static_cast<std::uint8_t>(result.mode);
+        predicted_modes[place.k] = static_cast<std::uint8_t>(predicted);
+        chosen[place.k] = static_cast<std::uint8_t>(result.mode);
 
-        const __m128i rec = coder.code(load_16(source.samples), result.pred, mb.scan + 16 * place.k,
-                                       mb.nonzero + place.k);
-        coded |= (mb.nonzero[place.k] != 0 ? 1u : 0u) << place.k;
+        const CodedBlock block =
+            coder.code(load_16(source.samples), result.pred, mb.scan + 16 * place.k);
+        mb.nonzero[place.k] = static_cast<std::uint16_t>(block.nonzero);
+        coded |= (block.nonzero != 0 ? 1u : 0u) << place.k;
         const __m128i right_column = _mm_shuffle_epi8(
-            rec, _mm_setr_epi8(15, 11, 7, 3, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
+            block.samples,
+            _mm_setr_epi8(15, 11, 7, 3, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
         left_columns[place.y] = static_cast<std::uint32_t>(_mm_cvtsi128_si32(right_column));
-        store_4(samples, _mm_extract_epi32(rec, 0));
-        store_4(samples + mb.stride, _mm_extract_epi32(rec, 1));
-        store_4(samples + 2 * mb.stride, _mm_extract_epi32(rec, 2));
-        store_4(samples + 3 * mb.stride, _mm_extract_epi32(rec, 3));
+        store_4(samples, _mm_extract_epi32(block.samples, 0));
+        store_4(samples + stride, _mm_extract_epi32(block.samples, 1));
+        store_4(samples + 2 * stride, _mm_extract_epi32(block.samples, 2));
+        store_4(samples + 3 * stride, _mm_extract_epi32(block.samples, 3));
     }
     return coded;
 }
