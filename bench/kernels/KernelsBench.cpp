@@ -29,10 +29,11 @@ struct Arena {
     alignas(64) std::uint8_t planes[2][kPlaneSize];
     alignas(64) std::uint8_t block[zolt::kArrangedBlock];
     alignas(64) std::uint8_t pred[256];
+    alignas(64) std::uint8_t preds[1024];
     alignas(64) std::int16_t coefs[256];
     alignas(64) std::int16_t scan[256];
     alignas(64) std::int32_t values[16];
-    alignas(64) std::int32_t sums[16];
+    alignas(64) std::int32_t sums[64];
     std::uint16_t nonzero[16];
     std::int16_t dc[16];
     std::uint8_t* current;  // a macroblock
@@ -194,10 +195,14 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) { k.reconstruct_4x4(a.coefs, a.pred, a.current, kStride); }},
     {"block_sums", [](const Kernels& k, Arena& a) { k.block_sums(a.current, kStride, a.sums); }},
     {"hadamard_energy", [](const Kernels& k, Arena& a) { k.hadamard_energy(a.values, a.sums); }},
-    {"phase_sad_16x16",
-     [](const Kernels& k, Arena& a) { k.phase_sad_16x16(a.current, kStride, a.pred, a.sums); }},
-    {"phase_satd_8x8",
-     [](const Kernels& k, Arena& a) { k.phase_satd_8x8(a.current, kStride, a.pred, a.sums); }},
+    {"intra_16x16_modes",
+     [](const Kernels& k, Arena& a) {
+         k.intra_16x16_modes(a.current, kStride, true, true, a.preds, a.sums);
+     }},
+    {"intra_chroma_modes",
+     [](const Kernels& k, Arena& a) {
+         k.intra_chroma_modes(a.current, a.current + 64, kStride, true, true, a.preds, a.sums);
+     }},
     {"phase_satd_4x4",
      [](const Kernels& k, Arena& a) { k.phase_satd_4x4(a.current, kStride, a.pred, a.sums); }},
     {"intra_4x4_modes",

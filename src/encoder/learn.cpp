@@ -1,4 +1,6 @@
 #include <algorithm>
+#include <initializer_list>
+#include <limits>
 
 #include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
@@ -161,38 +163,55 @@ bool decision_treePI(int qp, const ThresholdsPI& thresholds, int x, int y) {
     return t[8] > y && t[9] <= x;
 }
 
-// The candidates of a progressive elimination and their running costs, by mode number.
-template <int count>
-struct Candidates {
-    bool enabled[count] = {};
-    int cost[count] = {};
-
-    int number() const {
-        int n = 0;
-        for (bool e : enabled) {
-            n += e ? 1 : 0;
-        }
-        return n;
+// The four candidates of a progressive elimination and their running costs, by mode number. Those
+// that are dropped go on adding costs, which no longer count.
+class Candidates {
+public:
+    explicit Candidates(std::initializer_list<bool> possible) {
+        std::transform(possible.begin(), possible.end(), m_enabled,
+                       [](bool is_possible) { return is_possible ? -1 : 0; });
     }
+
+    void add(const std::int32_t* distortion) {
+        for (int mode = 0; mode < kModes; ++mode) {
+            m_cost[mode] += distortion[mode];
+        }
+    }
+
+    int number() const { return -(m_enabled[0] + m_enabled[1] + m_enabled[2] + m_enabled[3]); }
 
     double mean_cost() const {
         int sum = 0;
-        for (int mode = 0; mode < count; ++mode) {
-            sum += enabled[mode] ? cost[mode] : 0;
+        for (int mode = 0; mode < kModes; ++mode) {
+            sum += m_cost[mode] & m_enabled[mode];
         }
         return static_cast<double>(sum) / number();
     }
 
-    // The enabled candidate of lowest cost, the first of equal ones; -1 when there is none.
+    // The enabled candidate of lowest cost, the first of equal ones.
     int best() const {
-        int best_mode = -1;
-        for (int mode = 0; mode < count; ++mode) {
-            if (enabled[mode] && (best_mode < 0 || cost[mode] < cost[best_mode])) {
-                best_mode = mode;
-            }
+        constexpr int kWorst = std::numeric_limits<int>::max();
+        int best_mode = 0;
+        int best_cost = kWorst;
+        for (int mode = 0; mode < kModes; ++mode) {
+            const int cost = m_enabled[mode] ? m_cost[mode] : kWorst;
+            best_mode = cost < best_cost ? mode : best_mode;
+            best_cost = std::min(cost, best_cost);
         }
         return best_mode;
     }
+
+    template <typename Test>
+    void drop(Test is_too_high) {
+        for (int mode = 0; mode < kModes; ++mode) {
+            m_enabled[mode] &= is_too_high(m_cost[mode]) ? 0 : -1;
+        }
+    }
+
+private:
+    static constexpr int kModes = 4;
+    int m_enabled[kModes];  // all bits set: enabled
+    int m_cost[kModes] = {};
 };
 
 }  // namespace
@@ -231,78 +250,46 @@ void MacroblockCoder::compute_block_features() {
     g_kernels->hadamard_energy(g_block_sums, g_block_energy);
 }
 
-// Intra 16x16 mode of the macroblock; leaves its prediction in g_mb_pred.
+// Intra 16x16 mode of the macroblock; leaves the predictions in g_intra_pred_16x16.
 int MacroblockCoder::learn16_mode() {
-    alignas(64) std::uint8_t pred[4][256];
-    std::int32_t distortion[4][16];
-    Candidates<4> candidates;
-    const bool possible[4] = {g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left};
-    for (int mode = 0; mode < 4; ++mode) {
-        candidates.enabled[mode] = possible[mode];
-        if (possible[mode]) {
-            ipred16(pred[mode], g_mb_src_y, picture.g_stride_luma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_sad_16x16(g_mb_src_y, picture.g_stride_luma, pred[mode],
-                                       distortion[mode]);
-        }
-    }
+    alignas(16) std::int32_t distortion[16][4];
+    g_kernels->intra_16x16_modes(g_mb_src_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
+                                 g_intra_pred_16x16[0], distortion[0]);
+    Candidates candidates({g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left});
     int best = -1;
     for (int step = 0; step < 16; ++step) {
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.cost[mode] += candidates.enabled[mode] ? distortion[mode][step] : 0;
-        }
+        candidates.add(distortion[step]);
         const double limit = candidates.mean_cost() * thresh_16[step];
         best = candidates.best();
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.enabled[mode] =
-                candidates.enabled[mode] && !(candidates.cost[mode] >= limit);
-        }
+        candidates.drop([limit](int cost) { return cost >= limit; });
         if (candidates.number() < 2) {
             break;
         }
     }
-    g_kernels->copy_16x16(g_mb_pred, pred[best], 16);
     return best;
 }
 
-// Chroma mode of the macroblock; leaves its predictions in g_mb_pred.
+// Chroma mode of the macroblock; leaves the predictions in g_intra_pred_chroma.
 int MacroblockCoder::learn_chroma_mode() {
     constexpr int kLastStep = 11;
-    alignas(64) std::uint8_t pred[4][128];  // Cb, Cr
-    std::int32_t distortion[4][2][16];
-    Candidates<4> candidates;
-    const bool possible[4] = {true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left};
-    for (int mode = 0; mode < 4; ++mode) {
-        candidates.enabled[mode] = possible[mode];
-        if (possible[mode]) {
-            ipred_c(pred[mode], g_mb_src_u, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
-            ipred_c(pred[mode] + 64, g_mb_src_v, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_satd_8x8(g_mb_src_u, picture.g_stride_chroma, pred[mode],
-                                      distortion[mode][0]);
-            g_kernels->phase_satd_8x8(g_mb_src_v, picture.g_stride_chroma, pred[mode] + 64,
-                                      distortion[mode][1]);
-        }
-    }
+    alignas(32) std::int32_t distortion[kLastStep + 1][4];
+    g_kernels->intra_chroma_modes(g_mb_src_u, g_mb_src_v, picture.g_stride_chroma, g_mb_up != 0,
+                                  g_mb_left != 0, g_intra_pred_chroma[0], distortion[0]);
+    Candidates candidates({true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left});
     int best = -1;
     for (int step = 0; step <= kLastStep; ++step) {
-        for (int mode = 0; mode < 4; ++mode) {
-            if (candidates.enabled[mode]) {
-                candidates.cost[mode] += distortion[mode][0][step] + distortion[mode][1][step];
-            }
-        }
-        candidates.cost[0] -= candidates.enabled[0] ? g_intra_lambda : 0;
+        distortion[step][0] -= g_intra_lambda;
+        candidates.add(distortion[step]);
         if (step < 3 || step % 2 == 0) {
             continue;
         }
         const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
         best = candidates.best();
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.enabled[mode] = candidates.enabled[mode] && candidates.cost[mode] <= limit;
-        }
+        candidates.drop([limit](int cost) { return cost > limit; });
         if (candidates.number() == 0) {
             break;
         }
     }
-    std::copy(pred[best], pred[best] + 128, g_mb_pred + 256);
     return best;
 }
 

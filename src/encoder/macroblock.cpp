@@ -63,7 +63,7 @@ void MacroblockCoder::processCurrentMB_P() {
     quantTransform_luma_16x16P();
     picture.g_coded_blocks[g_mapMBNumber] = raster_mask(g_luma_mask);
     predict_inter_chroma();
-    quantTransform_chroma();
+    quantTransform_chroma(g_mb_pred + 256);
     setMBValues_P();
 }
 
@@ -116,12 +116,12 @@ void MacroblockCoder::code_intra() {
     if (g_cur_mb_mode == MB_INTRA16x16) {
         // The chroma mode does not depend on luma, nor luma on chroma.
         g_ipMBPred[0] = static_cast<std::uint8_t>(learn16_mode());
-        quantTransform_luma_16x16();
+        quantTransform_luma_16x16(g_intra_pred_16x16[g_ipMBPred[0]]);
     } else {
         code_intra4x4();
     }
     g_chroma_mode = static_cast<std::uint8_t>(learn_chroma_mode());
-    quantTransform_chroma();
+    quantTransform_chroma(g_intra_pred_chroma[g_chroma_mode]);
     setMBType_CBP();
 }
 

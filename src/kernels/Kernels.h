@@ -196,14 +196,22 @@ struct Kernels {
     // frequencies), [2] the other three of the first column, [3] the remaining nine.
     void (*hadamard_energy)(const std::int32_t* values, std::int32_t* energy);
 
-    // Distortion of a prediction at every sampling phase. 16x16: phase (x, y) at [4 * y + x] is the
-    // sum of absolute differences at the 16 samples (x + 4i, y + 4j). 8x8 and 4x4: the absolute sum
-    // of the 2x2 Hadamard transform of the differences at (x, y), (x + d, y), (x, y + d) and
-    // (x + d, y + d); 8x8: d = 4, 16 phases at [4 * y + x]; 4x4: d = 2, 4 phases at [2 * y + x].
-    void (*phase_sad_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
-                            const std::uint8_t* pred, std::int32_t* distortion);
-    void (*phase_satd_8x8)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
-                           std::int32_t* distortion);
+    // Predictions of all four modes of an intra 16x16 block and of an intra chroma block of both
+    // components (clauses 8.3.3, 8.3.4) from the samples around src, or around u and v, which are
+    // read whether or not they are there; up, left: which of them the mean is of. They are left at
+    // preds one after the other, 256 samples each, or 64 of Cb and 64 of Cr. And their distortions
+    // by sampling phase, that of mode m at [4 * phase + m].
+    //
+    // 16x16: phase 4 * y + x is the sum of absolute differences at the 16 samples (x + 4i, y + 4j).
+    // Chroma: phase 4 * y + x, the first 12, is the absolute sum of the 2x2 Hadamard transform of
+    // the differences at (x, y), (x + 4, y), (x, y + 4) and (x + 4, y + 4), of both components.
+    void (*intra_16x16_modes)(const std::uint8_t* src, std::ptrdiff_t stride, bool up, bool left,
+                              std::uint8_t* preds, std::int32_t* distortion);
+    void (*intra_chroma_modes)(const std::uint8_t* u, const std::uint8_t* v, std::ptrdiff_t stride,
+                               bool up, bool left, std::uint8_t* preds, std::int32_t* distortion);
+
+    // Distortion of a 4x4 prediction by sampling phase, 2 * y + x: the absolute sum of the 2x2
+    // Hadamard transform of the differences at (x, y), (x + 2, y), (x, y + 2) and (x + 2, y + 2).
     void (*phase_satd_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
                            std::int32_t* distortion);
 
