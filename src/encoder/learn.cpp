@@ -11,6 +11,10 @@ namespace {
 constexpr double thresh_16[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
                                   1.0,  1.0,  1.1, 1.1,  1.0, 1.0, 0.0, 0.0};
 
+// Up to here these are quarters, and a cost compares with the real number factor * sum / count as
+// it does in double precision when everything is multiplied by four times the count.
+constexpr int kQuarterSteps = 10;
+
 // The same for the chroma mode search.
 constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
                                       1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0};
@@ -180,37 +184,41 @@ public:
 
     int number() const { return -(m_enabled[0] + m_enabled[1] + m_enabled[2] + m_enabled[3]); }
 
-    double mean_cost() const {
-        int sum = 0;
+    int sum() const {
+        int total = 0;
         for (int mode = 0; mode < kModes; ++mode) {
-            sum += m_cost[mode] & m_enabled[mode];
+            total += m_cost[mode] & m_enabled[mode];
         }
-        return static_cast<double>(sum) / number();
+        return total;
     }
 
-    // The enabled candidate of lowest cost, the first of equal ones.
+    double mean_cost() const { return static_cast<double>(sum()) / number(); }
+
+    template <typename Test>
+    void drop(Test is_too_high) {
+        for (int mode = 0; mode < kModes; ++mode) {
+            m_before[mode] = m_enabled[mode];
+            m_enabled[mode] &= is_too_high(m_cost[mode]) ? 0 : -1;
+        }
+    }
+
+    // The candidate of lowest cost among those before the last drop, the first of equal ones.
     int best() const {
         constexpr int kWorst = std::numeric_limits<int>::max();
         int best_mode = 0;
         int best_cost = kWorst;
         for (int mode = 0; mode < kModes; ++mode) {
-            const int cost = m_enabled[mode] ? m_cost[mode] : kWorst;
+            const int cost = m_before[mode] ? m_cost[mode] : kWorst;
             best_mode = cost < best_cost ? mode : best_mode;
             best_cost = std::min(cost, best_cost);
         }
         return best_mode;
     }
 
-    template <typename Test>
-    void drop(Test is_too_high) {
-        for (int mode = 0; mode < kModes; ++mode) {
-            m_enabled[mode] &= is_too_high(m_cost[mode]) ? 0 : -1;
-        }
-    }
-
 private:
     static constexpr int kModes = 4;
     int m_enabled[kModes];  // all bits set: enabled
+    int m_before[kModes] = {};
     int m_cost[kModes] = {};
 };
 
@@ -256,17 +264,21 @@ int MacroblockCoder::learn16_mode() {
     g_kernels->intra_16x16_modes(g_mb_src_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
                                  g_intra_pred_16x16[0], distortion[0]);
     Candidates candidates({g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left});
-    int best = -1;
     for (int step = 0; step < 16; ++step) {
         candidates.add(distortion[step]);
-        const double limit = candidates.mean_cost() * thresh_16[step];
-        best = candidates.best();
-        candidates.drop([limit](int cost) { return cost >= limit; });
+        if (step < kQuarterSteps) {
+            const int limit = candidates.sum() * static_cast<int>(4 * thresh_16[step]);
+            const int number = candidates.number();
+            candidates.drop([=](int cost) { return 4 * number * cost >= limit; });
+        } else {
+            const double limit = candidates.mean_cost() * thresh_16[step];
+            candidates.drop([limit](int cost) { return cost >= limit; });
+        }
         if (candidates.number() < 2) {
             break;
         }
     }
-    return best;
+    return candidates.best();
 }
 
 // Chroma mode of the macroblock; leaves the predictions in g_intra_pred_chroma.
@@ -276,7 +288,6 @@ int MacroblockCoder::learn_chroma_mode() {
     g_kernels->intra_chroma_modes(g_mb_src_u, g_mb_src_v, picture.g_stride_chroma, g_mb_up != 0,
                                   g_mb_left != 0, g_intra_pred_chroma[0], distortion[0]);
     Candidates candidates({true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left});
-    int best = -1;
     for (int step = 0; step <= kLastStep; ++step) {
         distortion[step][0] -= g_intra_lambda;
         candidates.add(distortion[step]);
@@ -284,13 +295,13 @@ int MacroblockCoder::learn_chroma_mode() {
             continue;
         }
         const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
-        best = candidates.best();
         candidates.drop([limit](int cost) { return cost > limit; });
-        if (candidates.number() == 0) {
+        // A single one wins, whether it would be dropped later or not.
+        if (candidates.number() < 2) {
             break;
         }
     }
-    return best;
+    return candidates.best();
 }
 
 // Mode of intra 4x4 block k, whose predicted mode is predicted_mode; leaves its prediction in pred.

@@ -74,7 +74,36 @@ public:
     explicit Avx2Search(const Intra4x4& mb)
         : m_rule(mb), m_rates(_mm256_broadcastsi128_si256(m_rule.rates)) {}
 
-    SearchResult run(const SearchInput& in) const {
+    void run(const SearchInput* in, SearchResult* out) const {
+        Samples samples[2];
+        __m128i predicted[2], costs[2];
+        // Slot n of the candidates in the low half of pair n, slot n + 4 in the high one; behind
+        // them the predicted mode.
+        alignas(32) std::uint8_t preds[2][10 * 16];
+        for (int i = 0; i < 2; ++i) {
+            samples[i] = samples_of(in[i]);
+        }
+        for (int i = 0; i < 2; ++i) {
+            const __m128i pred = predicted_mode(samples[i], in[i].predicted);
+            store_16(preds[i] + 8 * 16, pred);
+            predicted[i] = predicted_distortion(pred, *in[i].source);
+        }
+        for (int i = 0; i < 2; ++i) {
+            costs[i] =
+                candidate_costs(samples[i], in[i], m_rule.limits(predicted[i]), preds[i]);
+        }
+        for (int i = 0; i < 2; ++i) {
+            out[i] = choose(in[i], predicted[i], costs[i], preds[i]);
+        }
+    }
+
+private:
+    // What the predictions are made of, as set_shuffles() takes it.
+    struct Samples {
+        __m128i row, two, three;
+    };
+
+    static Samples samples_of(const SearchInput& in) {
         const RowShuffles& shuffles = kRowShuffles[in.up_right];
         const __m128i n = _mm_shuffle_epi8(in.neighbours, load_16(shuffles.at.at));
         const __m128i before = _mm_shuffle_epi8(in.neighbours, load_16(shuffles.before.at));
@@ -84,44 +113,39 @@ public:
         // (n[i - 1] + 2 n[i] + n[i + 1] + 2) >> 2
         const __m128i three = _mm_avg_epu8(n, _mm_sub_epi8(_mm_avg_epu8(before, after), odd));
         const __m128i mean = mean_of(in.neighbours, in.available);
-        const __m128i row = _mm_or_si128(n, _mm_slli_si128(mean, kMeanInRow));
+        return {_mm_or_si128(n, _mm_slli_si128(mean, kMeanInRow)), two, three};
+    }
 
-        const auto& own = kPredictionShuffles.predicted[in.predicted];
-        const __m128i predicted =
-            _mm_or_si128(_mm_or_si128(_mm_shuffle_epi8(two, load_16(own[1])),
-                                      _mm_shuffle_epi8(three, load_16(own[2]))),
-                         _mm_shuffle_epi8(row, load_16(own[0])));
-        const __m128i predicted_cost = predicted_distortion(predicted, in.source);
+    static __m128i predicted_mode(const Samples& samples, int mode) {
+        const auto& own = kPredictionShuffles.predicted[mode];
+        return _mm_or_si128(_mm_or_si128(_mm_shuffle_epi8(samples.two, load_16(own[1])),
+                                         _mm_shuffle_epi8(samples.three, load_16(own[2]))),
+                            _mm_shuffle_epi8(samples.row, load_16(own[0])));
+    }
 
-        // Vector n: slots n and n + 4; behind them the predicted mode.
-        alignas(32) std::uint8_t preds[9 * 16];
-        store_16(preds + 8 * 16, predicted);
-        const __m128i costs =
-            _mm_or_si128(candidate_costs(row, two, three, in, m_rule.limits(predicted_cost), preds),
-                         load_16(kUnavailable.slots[in.available][in.predicted]));
+    SearchResult choose(const SearchInput& in, __m128i predicted_cost, __m128i costs,
+                        const std::uint8_t* preds) const {
         const auto best = static_cast<uint32_t>(_mm_cvtsi128_si32(_mm_minpos_epu16(costs)));
         const int cost = static_cast<int>(best & 0xffff);
         const int slot = static_cast<int>(best >> 16);
         const int reference = _mm_cvtsi128_si32(predicted_cost) & 0xffff;
-        const bool other =
-            static_cast<int>(reference > m_rule.kept) & static_cast<int>(cost < (reference & ~3));
+        const int other = static_cast<int>(reference > m_rule.kept) &
+                          static_cast<int>(cost < (reference & ~3));
         const int at = one_of(other, 2 * (slot & 3) + (slot >> 2), 8);
-        const __m128i pred =
-            _mm_shuffle_epi8(load_16(preds + 16 * at), load_16(kButterflyFromPhases.at));
-        return {one_of(other, slot_mode(in.predicted, slot), in.predicted), pred};
+        return {one_of(other, slot_mode(in.predicted, slot), in.predicted),
+                _mm_shuffle_epi8(load_16(preds + 16 * at), load_16(kButterflyFromPhases.at))};
     }
 
-private:
-    // The costs of the slots, those of dropped ones not below kNoCost. Their predictions go to
-    // preds.
-    __m128i candidate_costs(__m128i row, __m128i two, __m128i three, const SearchInput& in,
-                            __m128i limits, std::uint8_t* preds) const {
-        const __m256i rows = _mm256_broadcastsi128_si256(row);
-        const __m256i twos = _mm256_broadcastsi128_si256(two);
-        const __m256i threes = _mm256_broadcastsi128_si256(three);
-        const __m256i source_sums = _mm256_broadcastsi128_si256(load_16(in.source.sums));
+    // The costs of the slots, not below kNoCost where they are dropped or not possible. Their
+    // predictions go to preds.
+    __m128i candidate_costs(const Samples& samples, const SearchInput& in, __m128i limits,
+                            std::uint8_t* preds) const {
+        const __m256i rows = _mm256_broadcastsi128_si256(samples.row);
+        const __m256i twos = _mm256_broadcastsi128_si256(samples.two);
+        const __m256i threes = _mm256_broadcastsi128_si256(samples.three);
+        const __m256i source_sums = _mm256_broadcastsi128_si256(load_16(in.source->sums));
         const __m256i source_differences =
-            _mm256_broadcastsi128_si256(load_16(in.source.differences));
+            _mm256_broadcastsi128_si256(load_16(in.source->differences));
         __m256i sums[4], differences[4];
         for (int n = 0; n < 4; ++n) {
             const auto& shuffles = kPredictionShuffles.candidates[in.predicted][n];
@@ -154,7 +178,8 @@ private:
         };
         // Slots 0..3 in the low lane, 4..7 in the high one, 32 bits each.
         const __m256i all = _mm256_packus_epi32(last_costs(0), last_costs(2));
-        return _mm_packus_epi32(low_lane(all), high_lane(all));
+        return _mm_or_si128(_mm_packus_epi32(low_lane(all), high_lane(all)),
+                            load_16(kUnavailable.slots[in.available][in.predicted]));
     }
 
     SearchRule m_rule;

@@ -78,42 +78,73 @@ public:
           m_rates(_mm512_broadcastq_epi64(m_rule.rates)),
           m_kept(_mm_cvtsi32_si128(mb.kept)) {}
 
-    SearchResult run(const SearchInput& in) const {
-        const __m512i table = sample_table(in);
-        const __m512i left = _mm512_permutexvar_epi8(
-            load_64(kPredictionSelections.candidates[in.predicted][0]), table);
-        const __m512i right = _mm512_permutexvar_epi8(
-            load_64(kPredictionSelections.candidates[in.predicted][1]), table);
-        const __m128i predicted = _mm512_castsi512_si128(_mm512_permutexvar_epi8(
-            _mm512_castsi128_si512(load_16(kPredictionSelections.predicted[in.predicted])), table));
-        const __m128i predicted_cost = predicted_distortion(predicted, in.source);
+    void run(const SearchInput* in, SearchResult* out) const {
+        __m512i table[2];
+        Predictions preds[2];
+        __m128i predicted_cost[2], costs[2];
+        for (int i = 0; i < 2; ++i) {
+            table[i] = sample_table(in[i]);
+        }
+        for (int i = 0; i < 2; ++i) {
+            preds[i] = predict(table[i], in[i].predicted);
+        }
+        for (int i = 0; i < 2; ++i) {
+            predicted_cost[i] = predicted_distortion(preds[i].predicted, *in[i].source);
+        }
+        for (int i = 0; i < 2; ++i) {
+            costs[i] = candidate_costs(preds[i], in[i], m_rule.limits(predicted_cost[i]));
+        }
+        for (int i = 0; i < 2; ++i) {
+            out[i] = choose(preds[i], in[i].predicted, predicted_cost[i], costs[i]);
+        }
+    }
 
-        const __m512i costs = running_costs(left, right, in.source);
-        const __m512i over =
-            _mm512_subs_epu16(costs, _mm512_broadcastq_epi64(m_rule.limits(predicted_cost)));
+private:
+    // Columns 0 and 1, and 2 and 3 of the candidates, and the predicted mode in phase order.
+    struct Predictions {
+        __m512i left, right;
+        __m128i predicted;
+    };
+
+    static Predictions predict(__m512i table, int mode) {
+        const auto& candidates = kPredictionSelections.candidates[mode];
+        const __m512i predicted =
+            _mm512_castsi128_si512(load_16(kPredictionSelections.predicted[mode]));
+        return {_mm512_permutexvar_epi8(load_64(candidates[0]), table),
+                _mm512_permutexvar_epi8(load_64(candidates[1]), table),
+                _mm512_castsi512_si128(_mm512_permutexvar_epi8(predicted, table))};
+    }
+
+    // The costs of the slots, not below kNoCost where they are dropped or not possible.
+    __m128i candidate_costs(const Predictions& preds, const SearchInput& in,
+                            __m128i limits) const {
+        const __m512i costs = running_costs(preds.left, preds.right, *in.source);
+        const __m512i over = _mm512_subs_epu16(costs, _mm512_broadcastq_epi64(limits));
         const __mmask8 kept = _mm512_testn_epi64_mask(over, over);
         const __m128i last = _mm512_cvtepi64_epi16(_mm512_srli_epi64(costs, 48));
-        const __m128i best =
-            _mm_minpos_epu16(_mm_or_si128(_mm_mask_blend_epi16(kept, _mm_set1_epi16(kNoCost), last),
-                                          load_16(kUnavailable.slots[in.available][in.predicted])));
+        return _mm_or_si128(_mm_mask_blend_epi16(kept, _mm_set1_epi16(kNoCost), last),
+                            load_16(kUnavailable.slots[in.available][in.predicted]));
+    }
 
+    SearchResult choose(const Predictions& preds, int predicted, __m128i predicted_cost,
+                        __m128i costs) const {
         // The first 16 bits decide: the lowest cost against the predicted mode's.
+        const __m128i best = _mm_minpos_epu16(costs);
         const __m128i reference = _mm_and_si128(predicted_cost, _mm_set1_epi16(~3));
         const __m128i other = _mm_and_si128(_mm_cmpgt_epi16(reference, best),
                                             _mm_cmpgt_epi16(predicted_cost, m_kept));
         const __m128i slot = _mm_shuffle_epi8(best, _mm_set1_epi8(2));
         const __m128i selection =
             _mm_add_epi8(_mm_slli_epi16(slot, 3), load_16(kButterflyFromCandidates.at));
-        const __m128i chosen = _mm512_castsi512_si128(
-            _mm512_permutex2var_epi8(left, _mm512_castsi128_si512(selection), right));
-        const __m128i pred =
-            _mm_blendv_epi8(_mm_shuffle_epi8(predicted, load_16(kButterflyFromPhases.at)), chosen,
-                            _mm_broadcastw_epi16(other));
-        const int mode = slot_mode(in.predicted, _mm_extract_epi16(best, 1));
-        return {one_of(_mm_cvtsi128_si32(other) & 1, mode, in.predicted), pred};
+        const __m128i chosen = _mm512_castsi512_si128(_mm512_permutex2var_epi8(
+            preds.left, _mm512_castsi128_si512(selection), preds.right));
+        const __m128i pred = _mm_blendv_epi8(
+            _mm_shuffle_epi8(preds.predicted, load_16(kButterflyFromPhases.at)), chosen,
+            _mm_broadcastw_epi16(other));
+        const int mode = slot_mode(predicted, _mm_extract_epi16(best, 1));
+        return {one_of(_mm_cvtsi128_si32(other) & 1, mode, predicted), pred};
     }
 
-private:
     static __m512i sample_table(const SearchInput& in) {
         const TableSelections& selections = kTableSelections[in.up_right];
         const __m512i neighbours = _mm512_castsi128_si512(in.neighbours);

@@ -164,7 +164,7 @@ struct SearchInput {
     bool up_right;       // E..H are there; otherwise D stands in
     int available;       // 2 * up + left
     int predicted;       // mode
-    const SourceBlock& source;
+    const SourceBlock* source;
 };
 
 // a if condition is 1, b if it is 0, without a branch that a compiler might make of it: which of
@@ -214,56 +214,58 @@ struct SearchRule {
     }
 };
 
-struct CodedBlock {
-    __m128i samples;   // reconstruction in raster order
-    unsigned nonzero;  // mask of the levels that are not 0
+struct CodedBlocks {
+    __m256i samples;        // reconstructions in raster order
+    std::uint32_t nonzero;  // masks of the levels that are not 0, 16 bits each
 };
 
-// A quantiser in vectors, for one block at a time.
+// A quantiser in vectors, for two blocks at a time, one in each lane.
 class BlockCoder {
 public:
     explicit BlockCoder(const Quantizer& q)
-        : m_q(q),
-          m_rounding(_mm_set1_epi32(q.rounding)),
-          m_largest(_mm_set1_epi16(kMaxLevel)),
+        : m_forward{both(q.forward), both(q.forward + 8)},
+          m_dequant{both(q.dequant), both(q.dequant + 8)},
+          m_rounding(_mm256_set1_epi32(q.rounding)),
+          m_largest(_mm256_set1_epi16(kMaxLevel)),
           m_shift(_mm_cvtsi32_si128(q.shift)) {}
 
-    // Codes a block from its samples and their prediction, both in butterfly order: levels in
-    // zig-zag order at scan.
-    CodedBlock code(__m128i samples, __m128i pred, std::int16_t* scan) const {
-        const __m128i zero = _mm_setzero_si128();
-        const __m128i pred_upper = _mm_unpacklo_epi8(pred, zero);
-        const __m128i pred_lower = _mm_unpackhi_epi8(pred, zero);
-        __m128i first = _mm_sub_epi16(_mm_unpacklo_epi8(samples, zero), pred_upper);
-        __m128i last = _mm_sub_epi16(_mm_unpackhi_epi8(samples, zero), pred_lower);
+    // Codes two blocks from their samples and predictions, all in butterfly order: levels in
+    // zig-zag order at scan[0] and scan[1].
+    CodedBlocks code(__m256i samples, __m256i pred, std::int16_t* const* scan) const {
+        const __m256i zero = _mm256_setzero_si256();
+        const __m256i pred_upper = _mm256_unpacklo_epi8(pred, zero);
+        const __m256i pred_lower = _mm256_unpackhi_epi8(pred, zero);
+        __m256i first = _mm256_sub_epi16(_mm256_unpacklo_epi8(samples, zero), pred_upper);
+        __m256i last = _mm256_sub_epi16(_mm256_unpackhi_epi8(samples, zero), pred_lower);
         forward(&first, &last);
         transpose(&first, &last);
         forward(&first, &last);  // now columns 0 and 1, and 2 and 3
-        const __m128i levels_01 = quantize(first, 0);
-        const __m128i levels_23 = quantize(last, 8);
-        __m128i scan_low, scan_high;
-        zigzag(levels_01, levels_23, &scan_low, &scan_high);
-        store_16(scan, scan_low);
-        store_16(scan + 8, scan_high);
-        const int zeros =
-            _mm_movemask_epi8(_mm_cmpeq_epi8(_mm_packs_epi16(scan_low, scan_high), zero));
-        const unsigned nonzero = static_cast<unsigned>(~zeros) & 0xffff;
+        const __m256i levels_01 = quantize(first, m_forward[0]);
+        const __m256i levels_23 = quantize(last, m_forward[1]);
+        const std::uint32_t nonzero = store_levels(levels_01, levels_23, scan);
 
-        first = _mm_mullo_epi16(levels_01, load_16(m_q.dequant));
-        last = _mm_mullo_epi16(levels_23, load_16(m_q.dequant + 8));
+        first = _mm256_mullo_epi16(levels_01, m_dequant[0]);
+        last = _mm256_mullo_epi16(levels_23, m_dequant[1]);
         if (may_exceed_16_bits(first, last)) {
             return {reconstruct_wide(first, last, pred), nonzero};
         }
-        first = _mm_add_epi16(first, _mm_cvtsi32_si128(32));  // the rounding of every sample
+        // The rounding of every sample.
+        first = _mm256_add_epi16(first, _mm256_setr_epi32(32, 0, 0, 0, 32, 0, 0, 0));
         inverse(&first, &last);
         transpose(&first, &last);
         inverse(&first, &last);
-        const __m128i upper = _mm_add_epi16(_mm_srai_epi16(first, 6), pred_upper);
-        const __m128i lower = _mm_add_epi16(_mm_srai_epi16(last, 6), pred_lower);
-        return {_mm_shuffle_epi8(_mm_packus_epi16(upper, lower), raster()), nonzero};
+        const __m256i upper = _mm256_add_epi16(_mm256_srai_epi16(first, 6), pred_upper);
+        const __m256i lower = _mm256_add_epi16(_mm256_srai_epi16(last, 6), pred_lower);
+        return {_mm256_shuffle_epi8(_mm256_packus_epi16(upper, lower),
+                                    _mm256_broadcastsi128_si256(raster())),
+                nonzero};
     }
 
 private:
+    static __m256i both(const std::int16_t* values) {
+        return _mm256_broadcastsi128_si256(load_16(values));
+    }
+
     // Butterfly order is its own inverse.
     static __m128i raster() {
         return _mm_setr_epi8(0, 1, 3, 2, 4, 5, 7, 6, 12, 13, 15, 14, 8, 9, 11, 10);
@@ -271,59 +273,81 @@ private:
 
     // Forward core transform across rows or columns 0 and 1, and 3 and 2; leaves 0 and 1, and 2
     // and 3.
-    static void forward(__m128i* v01, __m128i* v32) {
-        const __m128i upper_half = _mm_setr_epi32(0, 0, -1, -1);
-        const __m128i st = _mm_add_epi16(*v01, *v32);  // 0 + 3, 1 + 2
-        const __m128i du = _mm_sub_epi16(*v01, *v32);  // 0 - 3, 1 - 2
-        const __m128i sd = _mm_unpacklo_epi64(st, du), tu = _mm_unpackhi_epi64(st, du);
+    static void forward(__m256i* v01, __m256i* v32) {
+        const __m256i second = _mm256_setr_epi32(0, 0, -1, -1, 0, 0, -1, -1);
+        const __m256i st = _mm256_add_epi16(*v01, *v32);  // 0 + 3, 1 + 2
+        const __m256i du = _mm256_sub_epi16(*v01, *v32);  // 0 - 3, 1 - 2
+        const __m256i sd = _mm256_unpacklo_epi64(st, du), tu = _mm256_unpackhi_epi64(st, du);
         // s + t and 2d + u; s - t and d - 2u.
-        *v01 = _mm_add_epi16(_mm_add_epi16(sd, _mm_and_si128(sd, upper_half)), tu);
-        *v32 = _mm_sub_epi16(sd, _mm_add_epi16(tu, _mm_and_si128(tu, upper_half)));
+        *v01 = _mm256_add_epi16(_mm256_add_epi16(sd, tu), _mm256_and_si256(sd, second));
+        *v32 = _mm256_sub_epi16(_mm256_sub_epi16(sd, tu), _mm256_and_si256(tu, second));
     }
 
     // Inverse core transform across rows or columns 0 and 1, and 2 and 3; leaves 0 and 1, and 3
     // and 2.
-    static void inverse(__m128i* v01, __m128i* v23) {
-        const auto halve_second = [](__m128i v) {
-            return _mm_blend_epi16(v, _mm_srai_epi16(v, 1), 0xf0);
+    static void inverse(__m256i* v01, __m256i* v23) {
+        const auto halve_second = [](__m256i v) {
+            return _mm256_blend_epi16(v, _mm256_srai_epi16(v, 1), 0xf0);
         };
-        const __m128i eh = _mm_add_epi16(*v01, halve_second(*v23));
-        const __m128i fg = _mm_sub_epi16(halve_second(*v01), *v23);
-        const __m128i ef = _mm_unpacklo_epi64(eh, fg), hg = _mm_unpackhi_epi64(eh, fg);
-        *v01 = _mm_add_epi16(ef, hg);
-        *v23 = _mm_sub_epi16(ef, hg);
+        const __m256i eh = _mm256_add_epi16(*v01, halve_second(*v23));
+        const __m256i fg = _mm256_sub_epi16(halve_second(*v01), *v23);
+        const __m256i ef = _mm256_unpacklo_epi64(eh, fg), hg = _mm256_unpackhi_epi64(eh, fg);
+        *v01 = _mm256_add_epi16(ef, hg);
+        *v23 = _mm256_sub_epi16(ef, hg);
     }
 
     // Exchanges rows and columns. Either may stand in butterfly order before, the other does then
     // after it.
-    static void transpose(__m128i* first, __m128i* last) {
-        const __m128i a = _mm_unpacklo_epi16(*first, *last);
-        const __m128i b = _mm_unpackhi_epi16(*first, *last);
-        *first = _mm_unpacklo_epi16(a, b);
-        *last = _mm_unpackhi_epi16(a, b);
+    static void transpose(__m256i* first, __m256i* last) {
+        const __m256i a = _mm256_unpacklo_epi16(*first, *last);
+        const __m256i b = _mm256_unpackhi_epi16(*first, *last);
+        *first = _mm256_unpacklo_epi16(a, b);
+        *last = _mm256_unpackhi_epi16(a, b);
     }
 
-    __m128i quantize(__m128i c, int position) const {
-        const __m128i forward_factors = load_16(m_q.forward + position);
-        const __m128i magnitude = _mm_abs_epi16(c);
-        const __m128i low = _mm_mullo_epi16(magnitude, forward_factors);
-        const __m128i high = _mm_mulhi_epu16(magnitude, forward_factors);
-        const __m128i first =
-            _mm_srl_epi32(_mm_add_epi32(_mm_unpacklo_epi16(low, high), m_rounding), m_shift);
-        const __m128i second =
-            _mm_srl_epi32(_mm_add_epi32(_mm_unpackhi_epi16(low, high), m_rounding), m_shift);
-        return _mm_sign_epi16(_mm_min_epi16(_mm_packs_epi32(first, second), m_largest), c);
+    __m256i quantize(__m256i c, __m256i factors) const {
+        const __m256i magnitude = _mm256_abs_epi16(c);
+        const __m256i low = _mm256_mullo_epi16(magnitude, factors);
+        const __m256i high = _mm256_mulhi_epu16(magnitude, factors);
+        const __m256i first = _mm256_srl_epi32(
+            _mm256_add_epi32(_mm256_unpacklo_epi16(low, high), m_rounding), m_shift);
+        const __m256i second = _mm256_srl_epi32(
+            _mm256_add_epi32(_mm256_unpackhi_epi16(low, high), m_rounding), m_shift);
+        return _mm256_sign_epi16(_mm256_min_epi16(_mm256_packs_epi32(first, second), m_largest),
+                                 c);
+    }
+
+    static std::uint32_t store_levels(__m256i levels_01, __m256i levels_23,
+                                      std::int16_t* const* scan) {
+        __m128i low[2], high[2];
+        zigzag(low_lane(levels_01), low_lane(levels_23), &low[0], &high[0]);
+        zigzag(high_lane(levels_01), high_lane(levels_23), &low[1], &high[1]);
+        for (int i = 0; i < 2; ++i) {
+            store_16(scan[i], low[i]);
+            store_16(scan[i] + 8, high[i]);
+        }
+        const __m256i bytes =
+            join(_mm_packs_epi16(low[0], high[0]), _mm_packs_epi16(low[1], high[1]));
+        const int zeros =
+            _mm256_movemask_epi8(_mm256_cmpeq_epi8(bytes, _mm256_setzero_si256()));
+        return ~static_cast<std::uint32_t>(zeros);
     }
 
     // No sum of the inverse transform, its rounding included, exceeds the sum of the magnitudes
     // and 32.
-    static bool may_exceed_16_bits(__m128i first, __m128i last) {
+    static bool may_exceed_16_bits(__m256i first, __m256i last) {
         constexpr short kLargestPair = (32767 - 32) / 8;
-        const __m128i pairs = _mm_adds_epi16(_mm_abs_epi16(first), _mm_abs_epi16(last));
-        return _mm_movemask_epi8(_mm_cmpgt_epi16(pairs, _mm_set1_epi16(kLargestPair))) != 0;
+        const __m256i pairs =
+            _mm256_adds_epi16(_mm256_abs_epi16(first), _mm256_abs_epi16(last));
+        return _mm256_movemask_epi8(_mm256_cmpgt_epi16(pairs, _mm256_set1_epi16(kLargestPair))) !=
+               0;
     }
 
-    [[gnu::noinline]] static __m128i reconstruct_wide(__m128i first, __m128i last, __m128i pred) {
+    [[gnu::noinline]] static __m256i reconstruct_wide(__m256i first, __m256i last, __m256i pred) {
+        return join(reconstruct_wide(low_lane(first), low_lane(last), low_lane(pred)),
+                    reconstruct_wide(high_lane(first), high_lane(last), high_lane(pred)));
+    }
+    static __m128i reconstruct_wide(__m128i first, __m128i last, __m128i pred) {
         alignas(32) std::int16_t coefs[16];
         alignas(16) std::uint8_t samples[16];
         store_16(coefs, first);
@@ -333,21 +357,23 @@ private:
         return load_16(samples);
     }
 
-    const Quantizer& m_q;
-    __m128i m_rounding, m_largest, m_shift;
+    __m256i m_forward[2], m_dequant[2];
+    __m256i m_rounding, m_largest;
+    __m128i m_shift;
 };
 
-// The blocks in an order in which neighbours in the list rarely wait for each other, so that the
-// processor works on two at a time.
+// Places of blocks in the order of coding: two at a time that do not depend on each other, and one
+// twice where there is no such pair.
 struct BlockPlace {
     std::uint8_t x, y;      // in blocks
     std::uint8_t k;         // index in decoding order
     std::uint8_t up_right;  // E..H are there: 0 never, 1 where the macroblocks above are, 2 always
 };
-constexpr BlockPlace kPlaces[16] = {{0, 0, 0, 1},  {1, 0, 1, 1},  {2, 0, 4, 1},  {0, 1, 2, 2},
-                                    {3, 0, 5, 1},  {1, 1, 3, 0},  {2, 1, 6, 2},  {0, 2, 8, 2},
-                                    {3, 1, 7, 0},  {1, 2, 9, 2},  {2, 2, 12, 2}, {0, 3, 10, 2},
-                                    {3, 2, 13, 0}, {1, 3, 11, 0}, {2, 3, 14, 2}, {3, 3, 15, 0}};
+constexpr BlockPlace kPlaces[10][2] = {
+    {{0, 0, 0, 1}, {0, 0, 0, 1}},   {{1, 0, 1, 1}, {1, 0, 1, 1}},   {{2, 0, 4, 1}, {0, 1, 2, 2}},
+    {{3, 0, 5, 1}, {1, 1, 3, 0}},   {{2, 1, 6, 2}, {0, 2, 8, 2}},   {{3, 1, 7, 0}, {1, 2, 9, 2}},
+    {{2, 2, 12, 2}, {0, 3, 10, 2}}, {{3, 2, 13, 0}, {1, 3, 11, 0}}, {{2, 3, 14, 2}, {2, 3, 14, 2}},
+    {{3, 3, 15, 0}, {3, 3, 15, 0}}};
 
 inline __m128i load_4(const void* p) {
     std::int32_t value;
@@ -358,57 +384,93 @@ inline void store_4(void* p, std::int32_t value) {
     __builtin_memcpy(p, &value, sizeof value);
 }
 
+// The macroblock while its blocks are coded.
+template <typename Search>
+class MacroblockBlocks {
+public:
+    explicit MacroblockBlocks(const Intra4x4& mb)
+        : m_mb(mb), m_search(mb), m_coder(*mb.quantizer) {
+        for (int y = 0; y < 4; ++y) {
+            const std::uint8_t* row = mb.samples + 4 * y * mb.stride;
+            prepare_blocks(row, mb.stride, m_blocks + 4 * y);
+            m_left_columns[y] = static_cast<std::uint32_t>(row[3 * mb.stride - 1] |
+                                                           row[2 * mb.stride - 1] << 8 |
+                                                           row[mb.stride - 1] << 16) |
+                                static_cast<std::uint32_t>(row[-1]) << 24;
+        }
+    }
+
+    // Codes two blocks; returns the mask of those with levels.
+    std::uint32_t code(const BlockPlace* places) {
+        const SearchInput inputs[2] = {gather(places[0]), gather(places[1])};
+        SearchResult results[2];
+        m_search.run(inputs, results);
+        std::int16_t* const scan[2] = {m_mb.scan + 16 * places[0].k, m_mb.scan + 16 * places[1].k};
+        const CodedBlocks coded = m_coder.code(
+            join(load_16(inputs[0].source->samples), load_16(inputs[1].source->samples)),
+            join(results[0].pred, results[1].pred), scan);
+        return store(places[0], inputs[0], results[0], low_lane(coded.samples),
+                     coded.nonzero & 0xffff) |
+               store(places[1], inputs[1], results[1], high_lane(coded.samples),
+                     coded.nonzero >> 16);
+    }
+
+private:
+    std::int8_t* mode_at(const BlockPlace& place) const {
+        return m_mb.modes + place.y * m_mb.modes_stride + place.x;
+    }
+
+    std::uint8_t* samples_at(const BlockPlace& place) const {
+        return m_mb.samples + 4 * place.y * m_mb.stride + 4 * place.x;
+    }
+
+    SearchInput gather(const BlockPlace& place) const {
+        const std::uint8_t* above = samples_at(place) - m_mb.stride;
+        const __m128i row_above = _mm_unpacklo_epi32(load_4(above), load_4(above + 4));
+        const __m128i others = _mm_insert_epi8(load_4(m_left_columns + place.y), above[-1], 4);
+        const bool up = place.y > 0 || m_mb.up;
+        const bool left = place.x > 0 || m_mb.left;
+        const bool last = place.x == 3 && place.y == 0;
+        const bool up_right = place.up_right + (last ? m_mb.up_right : up) > 1;
+        const std::int8_t* mode = mode_at(place);
+        const int mode_above = mode[-m_mb.modes_stride], mode_left = mode[-1];
+        const int smaller = mode_above < mode_left ? mode_above : mode_left;
+        return {_mm_unpacklo_epi64(row_above, others), up_right, 2 * up + left,
+                smaller >= 0 ? smaller : 2, &m_blocks[4 * place.y + place.x]};
+    }
+
+    // Writes the results of a block; returns its bit in the mask of those with levels.
+    std::uint32_t store(const BlockPlace& place, const SearchInput& input,
+                        const SearchResult& result, __m128i samples, std::uint32_t nonzero) {
+        *mode_at(place) = static_cast<std::int8_t>(result.mode);
+        m_mb.predicted[place.k] = static_cast<std::uint8_t>(input.predicted);
+        m_mb.chosen[place.k] = static_cast<std::uint8_t>(result.mode);
+        m_mb.nonzero[place.k] = static_cast<std::uint16_t>(nonzero);
+        const __m128i right_column = _mm_shuffle_epi8(
+            samples, _mm_setr_epi8(15, 11, 7, 3, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
+        m_left_columns[place.y] = static_cast<std::uint32_t>(_mm_cvtsi128_si32(right_column));
+        std::uint8_t* p = samples_at(place);
+        store_4(p, _mm_extract_epi32(samples, 0));
+        store_4(p + m_mb.stride, _mm_extract_epi32(samples, 1));
+        store_4(p + 2 * m_mb.stride, _mm_extract_epi32(samples, 2));
+        store_4(p + 3 * m_mb.stride, _mm_extract_epi32(samples, 3));
+        return (nonzero != 0 ? 1u : 0u) << place.k;
+    }
+
+    const Intra4x4 m_mb;  // a copy, whose fields need not be read again after every store
+    const Search m_search;
+    const BlockCoder m_coder;
+    SourceBlock m_blocks[16];         // raster order
+    std::uint32_t m_left_columns[4];  // samples left of the next block in each row of blocks
+};
+
 // Kernels::code_intra_4x4 with a mode search.
 template <typename Search>
 [[gnu::always_inline]] inline std::uint32_t code_intra_4x4_with(const Intra4x4& mb) {
-    SourceBlock blocks[16];  // raster order
-    std::uint32_t left_columns[4];
-    for (int y = 0; y < 4; ++y) {
-        const std::uint8_t* row = mb.samples + 4 * y * mb.stride;
-        prepare_blocks(row, mb.stride, blocks + 4 * y);
-        left_columns[y] = row[3 * mb.stride - 1] | row[2 * mb.stride - 1] << 8 |
-                          row[mb.stride - 1] << 16 | static_cast<std::uint32_t>(row[-1]) << 24;
-    }
-    const Search search(mb);
-    const BlockCoder coder(*mb.quantizer);
-    // Not read again after every store.
-    const std::ptrdiff_t stride = mb.stride, modes_stride = mb.modes_stride;
-    std::uint8_t* const predicted_modes = mb.predicted;
-    std::uint8_t* const chosen = mb.chosen;
+    MacroblockBlocks<Search> blocks(mb);
     std::uint32_t coded = 0;
-    for (const BlockPlace& place : kPlaces) {
-        std::uint8_t* samples = mb.samples + 4 * place.y * stride + 4 * place.x;
-        const std::uint8_t* above = samples - stride;
-        const __m128i row_above = _mm_unpacklo_epi32(load_4(above), load_4(above + 4));
-        const __m128i others = _mm_insert_epi8(load_4(left_columns + place.y), above[-1], 4);
-        const bool up = place.y > 0 || mb.up;
-        const bool left = place.x > 0 || mb.left;
-        const bool last = place.x == 3 && place.y == 0;
-        const bool up_right = place.up_right + (last ? mb.up_right : up) > 1;
-
-        std::int8_t* mode = mb.modes + place.y * modes_stride + place.x;
-        const int mode_above = mode[-modes_stride], mode_left = mode[-1];
-        const int smaller = mode_above < mode_left ? mode_above : mode_left;
-        const int predicted = smaller >= 0 ? smaller : 2;
-        const SourceBlock& source = blocks[4 * place.y + place.x];
-        const SearchResult result = search.run(
-            {_mm_unpacklo_epi64(row_above, others), up_right, 2 * up + left, predicted, source});
-        *mode = static_cast<std::int8_t>(result.mode);
-        predicted_modes[place.k] = static_cast<std::uint8_t>(predicted);
-        chosen[place.k] = static_cast<std::uint8_t>(result.mode);
-
-        const CodedBlock block =
-            coder.code(load_16(source.samples), result.pred, mb.scan + 16 * place.k);
-        mb.nonzero[place.k] = static_cast<std::uint16_t>(block.nonzero);
-        coded |= (block.nonzero != 0 ? 1u : 0u) << place.k;
-        const __m128i right_column = _mm_shuffle_epi8(
-            block.samples,
-            _mm_setr_epi8(15, 11, 7, 3, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
-        left_columns[place.y] = static_cast<std::uint32_t>(_mm_cvtsi128_si32(right_column));
-        store_4(samples, _mm_extract_epi32(block.samples, 0));
-        store_4(samples + stride, _mm_extract_epi32(block.samples, 1));
-        store_4(samples + 2 * stride, _mm_extract_epi32(block.samples, 2));
-        store_4(samples + 3 * stride, _mm_extract_epi32(block.samples, 3));
+    for (const auto& places : kPlaces) {
+        coded |= blocks.code(places);
     }
     return coded;
 }
