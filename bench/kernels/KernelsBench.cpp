@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <memory>
 #include <random>
 #include <string>
@@ -28,10 +29,11 @@ struct Arena {
     alignas(64) std::uint8_t planes[2][kPlaneSize];
     alignas(64) std::uint8_t block[zolt::kArrangedBlock];
     alignas(64) std::uint8_t pred[256];
+    alignas(64) std::uint8_t preds[1024];
     alignas(64) std::int16_t coefs[256];
     alignas(64) std::int16_t scan[256];
     alignas(64) std::int32_t values[16];
-    alignas(64) std::int32_t sums[16];
+    alignas(64) std::int32_t sums[64];
     std::uint16_t nonzero[16];
     std::int16_t dc[16];
     std::uint8_t* current;  // a macroblock
@@ -99,6 +101,19 @@ void run_strong_chroma(const Kernels& k, Arena& a) {
 
 const zolt::Quantizer& quantizer() {
     return zolt::inter_quantizer(kQp);
+}
+
+// A macroblock in the middle of a picture, its samples new each time.
+void run_code_intra_4x4(const Kernels& k, Arena& a) {
+    for (int y = 0; y < 16; ++y) {
+        std::memcpy(a.current + y * kStride, a.block + 16 * y, 16);
+    }
+    std::int8_t modes[5 * 5] = {};
+    std::uint8_t predicted[16], chosen[16];
+    const zolt::Intra4x4 macroblock = {a.current,   kStride,   true,         true,   true,
+                                       modes + 6,   5,         &quantizer(), 32,     192,
+                                       {8, 10, 12}, predicted, chosen,       a.scan, a.nonzero};
+    benchmark::DoNotOptimize(k.code_intra_4x4(macroblock));
 }
 
 constexpr Case kCases[] = {
@@ -184,16 +199,21 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) { k.reconstruct_4x4(a.coefs, a.pred, a.current, kStride); }},
     {"block_sums", [](const Kernels& k, Arena& a) { k.block_sums(a.current, kStride, a.sums); }},
     {"hadamard_energy", [](const Kernels& k, Arena& a) { k.hadamard_energy(a.values, a.sums); }},
-    {"phase_sad_16x16",
-     [](const Kernels& k, Arena& a) { k.phase_sad_16x16(a.current, kStride, a.pred, a.sums); }},
-    {"phase_satd_8x8",
-     [](const Kernels& k, Arena& a) { k.phase_satd_8x8(a.current, kStride, a.pred, a.sums); }},
+    {"intra_16x16_modes",
+     [](const Kernels& k, Arena& a) {
+         k.intra_16x16_modes(a.current, kStride, true, true, a.preds, a.sums);
+     }},
+    {"intra_chroma_modes",
+     [](const Kernels& k, Arena& a) {
+         k.intra_chroma_modes(a.current, a.current + 64, kStride, true, true, a.preds, a.sums);
+     }},
     {"phase_satd_4x4",
      [](const Kernels& k, Arena& a) { k.phase_satd_4x4(a.current, kStride, a.pred, a.sums); }},
     {"intra_4x4_modes",
      [](const Kernels& k, Arena& a) {
          k.intra_4x4_modes(a.current, kStride, a.reference(), 100, a.pred, a.coefs);
      }},
+    {"code_intra_4x4", run_code_intra_4x4},
     {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical>},
     {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal>},
     {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical>},
@@ -221,6 +241,9 @@ void measure(benchmark::State& state, const Kernels& kernels, const Case& c) {
 int main(int argc, char** argv) {
     for (const Case& c : kCases) {
         for (const Kernels& kernels : zolt::kernel_tables()) {
+            if (c.run == run_code_intra_4x4 && !kernels.code_intra_4x4) {
+                continue;
+            }
             benchmark::RegisterBenchmark(
                 (std::string(c.name) + "/" + kernels.name).c_str(),
                 [&](benchmark::State& state) { measure(state, kernels, c); });

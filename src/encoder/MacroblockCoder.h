@@ -43,7 +43,9 @@ public:
     std::ptrdiff_t first_block() const;
     void code_intra();
     void code_intra4x4();
+    void code_intra4x4_by_block(std::int8_t* modes, std::ptrdiff_t stride, std::uint8_t* predicted);
     void set_block_availability();
+    std::uint8_t has_up_right() const;
     void generatePredError16x16();
     void predict_inter_chroma();
     void setMBType_CBP();
@@ -51,10 +53,11 @@ public:
     void setMBValues_P();
 
     // ---- transform ----
+    const zolt::Quantizer& luma_quantizer() const;
     void quantTransform_luma_4x4(int k, const std::uint8_t* pred);
-    void quantTransform_luma_16x16();
+    void quantTransform_luma_16x16(const std::uint8_t* pred);
     void quantTransform_luma_16x16P();
-    void quantTransform_chroma();
+    void quantTransform_chroma(const std::uint8_t* pred);
     std::uint32_t quantize_chroma_dc(int component, const std::int16_t* c,
                                      const zolt::Quantizer& quantizer, std::int16_t* coefs);
 
@@ -83,6 +86,8 @@ public:
     int learn16_mode();
     int learn_chroma_mode();
     int learn4_mode(int k, int predicted_mode, std::uint8_t* pred);
+    zolt::Intra4x4 intra4x4_rule(std::int8_t* modes, std::ptrdiff_t stride,
+                                 std::uint8_t* predicted);
     void compute_block_features();
 
     // ---- cavlc: macroblock_layer(), clauses 7.3.5 and 9.2 ----
@@ -153,8 +158,11 @@ public:
     std::int16_t g_pmv_x = 0, g_pmv_y = 0;  // predicted vector, quarter pels
     std::int16_t g_mvd_x = 0, g_mvd_y = 0;  // vector difference, quarter pels
 
-    // Prediction samples: luma 16x16, Cb 8x8, Cr 8x8.
+    // Prediction samples of an inter macroblock: luma 16x16, Cb 8x8, Cr 8x8.
     alignas(64) std::uint8_t g_mb_pred[384] = {};
+    // Those of an intra macroblock by mode, luma, and Cb and Cr.
+    alignas(64) std::uint8_t g_intra_pred_16x16[4][256] = {};
+    alignas(64) std::uint8_t g_intra_pred_chroma[4][128] = {};
     // Scaled coefficients (level * dequant) of luma blocks 0..15 in decoding order and of the four
     // blocks of Cb and of Cr; inside a block column by column. Those of a block without levels are
     // left over from others, or 0 where the DC coefficients have a transform of their own.

@@ -1,4 +1,6 @@
 #include <algorithm>
+#include <initializer_list>
+#include <limits>
 
 #include "encoder/MacroblockCoder.h"
 #include "encoder/tables.h"
@@ -9,12 +11,26 @@ namespace {
 constexpr double thresh_16[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
                                   1.0,  1.0,  1.1, 1.1,  1.0, 1.0, 0.0, 0.0};
 
+// Up to here these are quarters, and a cost compares with the real number factor * sum / count as
+// it does in double precision when everything is multiplied by four times the count.
+constexpr int kQuarterSteps = 10;
+
 // The same for the chroma mode search.
 constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
                                       1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0};
 
 // Factors of the predicted mode's share at which another 4x4 mode is dropped, by step.
 constexpr double thresh_4[3] = {2.0, 1.25, 1.0};
+
+// The predicted 4x4 mode is kept up to this distortion.
+constexpr int kept_distortion(int lambda) {
+    return 8 * lambda + 64;
+}
+
+// What another 4x4 mode pays at each phase.
+constexpr int other_mode_rate(int lambda) {
+    return 2 * lambda;
+}
 
 // 4x4 modes that a block lacks the neighbours for (1), by whether there are samples above and to
 // the left; what follows the nine modes is padding.
@@ -151,38 +167,59 @@ bool decision_treePI(int qp, const ThresholdsPI& thresholds, int x, int y) {
     return t[8] > y && t[9] <= x;
 }
 
-// The candidates of a progressive elimination and their running costs, by mode number.
-template <int count>
-struct Candidates {
-    bool enabled[count] = {};
-    int cost[count] = {};
-
-    int number() const {
-        int n = 0;
-        for (bool e : enabled) {
-            n += e ? 1 : 0;
-        }
-        return n;
+// The four candidates of a progressive elimination and their running costs, by mode number. Those
+// that are dropped go on adding costs, which no longer count.
+class Candidates {
+public:
+    explicit Candidates(std::initializer_list<bool> possible) {
+        std::transform(possible.begin(), possible.end(), m_enabled,
+                       [](bool is_possible) { return is_possible ? -1 : 0; });
     }
 
-    double mean_cost() const {
-        int sum = 0;
-        for (int mode = 0; mode < count; ++mode) {
-            sum += enabled[mode] ? cost[mode] : 0;
+    void add(const std::int32_t* distortion) {
+        for (int mode = 0; mode < kModes; ++mode) {
+            m_cost[mode] += distortion[mode];
         }
-        return static_cast<double>(sum) / number();
     }
 
-    // The enabled candidate of lowest cost, the first of equal ones; -1 when there is none.
+    int number() const { return -(m_enabled[0] + m_enabled[1] + m_enabled[2] + m_enabled[3]); }
+
+    int sum() const {
+        int total = 0;
+        for (int mode = 0; mode < kModes; ++mode) {
+            total += m_cost[mode] & m_enabled[mode];
+        }
+        return total;
+    }
+
+    double mean_cost() const { return static_cast<double>(sum()) / number(); }
+
+    template <typename Test>
+    void drop(Test is_too_high) {
+        for (int mode = 0; mode < kModes; ++mode) {
+            m_before[mode] = m_enabled[mode];
+            m_enabled[mode] &= is_too_high(m_cost[mode]) ? 0 : -1;
+        }
+    }
+
+    // The candidate of lowest cost among those before the last drop, the first of equal ones.
     int best() const {
-        int best_mode = -1;
-        for (int mode = 0; mode < count; ++mode) {
-            if (enabled[mode] && (best_mode < 0 || cost[mode] < cost[best_mode])) {
-                best_mode = mode;
-            }
+        constexpr int kWorst = std::numeric_limits<int>::max();
+        int best_mode = 0;
+        int best_cost = kWorst;
+        for (int mode = 0; mode < kModes; ++mode) {
+            const int cost = m_before[mode] ? m_cost[mode] : kWorst;
+            best_mode = cost < best_cost ? mode : best_mode;
+            best_cost = std::min(cost, best_cost);
         }
         return best_mode;
     }
+
+private:
+    static constexpr int kModes = 4;
+    int m_enabled[kModes];  // all bits set: enabled
+    int m_before[kModes] = {};
+    int m_cost[kModes] = {};
 };
 
 }  // namespace
@@ -221,79 +258,50 @@ void MacroblockCoder::compute_block_features() {
     g_kernels->hadamard_energy(g_block_sums, g_block_energy);
 }
 
-// Intra 16x16 mode of the macroblock; leaves its prediction in g_mb_pred.
+// Intra 16x16 mode of the macroblock; leaves the predictions in g_intra_pred_16x16.
 int MacroblockCoder::learn16_mode() {
-    alignas(64) std::uint8_t pred[4][256];
-    std::int32_t distortion[4][16];
-    Candidates<4> candidates;
-    const bool possible[4] = {g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left};
-    for (int mode = 0; mode < 4; ++mode) {
-        candidates.enabled[mode] = possible[mode];
-        if (possible[mode]) {
-            ipred16(pred[mode], g_mb_src_y, picture.g_stride_luma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_sad_16x16(g_mb_src_y, picture.g_stride_luma, pred[mode],
-                                       distortion[mode]);
-        }
-    }
-    int best = -1;
+    alignas(16) std::int32_t distortion[16][4];
+    g_kernels->intra_16x16_modes(g_mb_src_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
+                                 g_intra_pred_16x16[0], distortion[0]);
+    Candidates candidates({g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left});
     for (int step = 0; step < 16; ++step) {
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.cost[mode] += candidates.enabled[mode] ? distortion[mode][step] : 0;
-        }
-        const double limit = candidates.mean_cost() * thresh_16[step];
-        best = candidates.best();
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.enabled[mode] =
-                candidates.enabled[mode] && !(candidates.cost[mode] >= limit);
+        candidates.add(distortion[step]);
+        if (step < kQuarterSteps) {
+            const int limit = candidates.sum() * static_cast<int>(4 * thresh_16[step]);
+            const int number = candidates.number();
+            candidates.drop([=](int cost) { return 4 * number * cost >= limit; });
+        } else {
+            const double limit = candidates.mean_cost() * thresh_16[step];
+            candidates.drop([limit](int cost) { return cost >= limit; });
         }
         if (candidates.number() < 2) {
             break;
         }
     }
-    g_kernels->copy_16x16(g_mb_pred, pred[best], 16);
-    return best;
+    return candidates.best();
 }
 
-// Chroma mode of the macroblock; leaves its predictions in g_mb_pred.
+// Chroma mode of the macroblock; leaves the predictions in g_intra_pred_chroma.
 int MacroblockCoder::learn_chroma_mode() {
     constexpr int kLastStep = 11;
-    alignas(64) std::uint8_t pred[4][128];  // Cb, Cr
-    std::int32_t distortion[4][2][16];
-    Candidates<4> candidates;
-    const bool possible[4] = {true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left};
-    for (int mode = 0; mode < 4; ++mode) {
-        candidates.enabled[mode] = possible[mode];
-        if (possible[mode]) {
-            ipred_c(pred[mode], g_mb_src_u, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
-            ipred_c(pred[mode] + 64, g_mb_src_v, picture.g_stride_chroma, g_mb_up, g_mb_left, mode);
-            g_kernels->phase_satd_8x8(g_mb_src_u, picture.g_stride_chroma, pred[mode],
-                                      distortion[mode][0]);
-            g_kernels->phase_satd_8x8(g_mb_src_v, picture.g_stride_chroma, pred[mode] + 64,
-                                      distortion[mode][1]);
-        }
-    }
-    int best = -1;
+    alignas(32) std::int32_t distortion[kLastStep + 1][4];
+    g_kernels->intra_chroma_modes(g_mb_src_u, g_mb_src_v, picture.g_stride_chroma, g_mb_up != 0,
+                                  g_mb_left != 0, g_intra_pred_chroma[0], distortion[0]);
+    Candidates candidates({true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left});
     for (int step = 0; step <= kLastStep; ++step) {
-        for (int mode = 0; mode < 4; ++mode) {
-            if (candidates.enabled[mode]) {
-                candidates.cost[mode] += distortion[mode][0][step] + distortion[mode][1][step];
-            }
-        }
-        candidates.cost[0] -= candidates.enabled[0] ? g_intra_lambda : 0;
+        distortion[step][0] -= g_intra_lambda;
+        candidates.add(distortion[step]);
         if (step < 3 || step % 2 == 0) {
             continue;
         }
         const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
-        best = candidates.best();
-        for (int mode = 0; mode < 4; ++mode) {
-            candidates.enabled[mode] = candidates.enabled[mode] && candidates.cost[mode] <= limit;
-        }
-        if (candidates.number() == 0) {
+        candidates.drop([limit](int cost) { return cost > limit; });
+        // A single one wins, whether it would be dropped later or not.
+        if (candidates.number() < 2) {
             break;
         }
     }
-    std::copy(pred[best], pred[best] + 128, g_mb_pred + 256);
-    return best;
+    return candidates.best();
 }
 
 // Mode of intra 4x4 block k, whose predicted mode is predicted_mode; leaves its prediction in pred.
@@ -311,7 +319,7 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
     ipred4(pred, neighbours, up, left, predicted_mode);
     g_kernels->phase_satd_4x4(src, picture.g_stride_luma, pred, d);
     const int predicted_cost = d[0] + d[1] + d[2] + d[3];
-    if ((!up && !left) || predicted_cost <= 8 * g_intra_lambda + 64) {
+    if ((!up && !left) || predicted_cost <= kept_distortion(g_intra_lambda)) {
         return predicted_mode;
     }
 
@@ -320,7 +328,7 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
     g_kernels->intra_4x4_modes(src, picture.g_stride_luma, neighbours,
                                ipred4_dc(neighbours, up, left), modes[0], distortion[0]);
     const int share = predicted_cost >> 2;
-    const std::int16_t rate = static_cast<std::int16_t>(2 * g_intra_lambda);
+    const std::int16_t rate = static_cast<std::int16_t>(other_mode_rate(g_intra_lambda));
     // Sixteen lanes that the compiler can put into vectors; a cost is at most 4 * (2040 + 182).
     std::int16_t cost[16] = {};
     std::int16_t dropped[16];  // 0: still a candidate
@@ -351,4 +359,30 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
         std::copy(modes[best], modes[best] + 16, pred);
     }
     return best;
+}
+
+// The same for all blocks of the macroblock, as Kernels::code_intra_4x4 takes it. modes: the
+// macroblock's entries in the map of modes, with `stride` entries a row; the predicted modes go to
+// predicted.
+zolt::Intra4x4 MacroblockCoder::intra4x4_rule(std::int8_t* modes, std::ptrdiff_t stride,
+                                              std::uint8_t* predicted) {
+    zolt::Intra4x4 mb = {};
+    mb.samples = g_mb_src_y;
+    mb.stride = picture.g_stride_luma;
+    mb.up = g_mb_up != 0;
+    mb.left = g_mb_left != 0;
+    mb.up_right = has_up_right() != 0;
+    mb.modes = modes;
+    mb.modes_stride = stride;
+    mb.quantizer = &luma_quantizer();
+    mb.rate = other_mode_rate(g_intra_lambda);
+    mb.kept = kept_distortion(g_intra_lambda);
+    for (int step = 0; step < 3; ++step) {
+        mb.drop[step] = static_cast<std::int16_t>(4 * (step + 1) * thresh_4[step]);
+    }
+    mb.predicted = predicted;
+    mb.chosen = g_ipMBPred;
+    mb.scan = g_scan_levels;
+    mb.nonzero = g_nonzero;
+    return mb;
 }

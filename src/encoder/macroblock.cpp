@@ -63,7 +63,7 @@ void MacroblockCoder::processCurrentMB_P() {
     quantTransform_luma_16x16P();
     picture.g_coded_blocks[g_mapMBNumber] = raster_mask(g_luma_mask);
     predict_inter_chroma();
-    quantTransform_chroma();
+    quantTransform_chroma(g_mb_pred + 256);
     setMBValues_P();
 }
 
@@ -116,18 +116,17 @@ void MacroblockCoder::code_intra() {
     if (g_cur_mb_mode == MB_INTRA16x16) {
         // The chroma mode does not depend on luma, nor luma on chroma.
         g_ipMBPred[0] = static_cast<std::uint8_t>(learn16_mode());
-        quantTransform_luma_16x16();
+        quantTransform_luma_16x16(g_intra_pred_16x16[g_ipMBPred[0]]);
     } else {
         code_intra4x4();
     }
     g_chroma_mode = static_cast<std::uint8_t>(learn_chroma_mode());
-    quantTransform_chroma();
+    quantTransform_chroma(g_intra_pred_chroma[g_chroma_mode]);
     setMBType_CBP();
 }
 
-// Intra 4x4 luma, block by block: each is predicted from the reconstruction of those before it.
+// Intra 4x4 luma: every block is predicted from the reconstruction of those before it.
 void MacroblockCoder::code_intra4x4() {
-    set_block_availability();
     const std::ptrdiff_t stride = picture.g_blk_width + 2;
     std::int8_t* modes = picture.g_i4mode + (4 * g_mb_y + 1) * stride + 4 * g_mb_x + 1;
     if (!g_mb_left) {
@@ -138,19 +137,37 @@ void MacroblockCoder::code_intra4x4() {
     if (!g_mb_up) {
         std::memset(modes - stride, -1, 4);
     }
+    std::uint8_t predicted[16];
+    if (g_kernels->code_intra_4x4) {
+        g_luma_mask = g_kernels->code_intra_4x4(intra4x4_rule(modes, stride, predicted));
+    } else {
+        code_intra4x4_by_block(modes, stride, predicted);
+    }
+    for (int k = 0; k < 16; ++k) {
+        const int mode = g_ipMBPred[k];
+        g_prev_intra4x4_pred_mode_flag[k] = mode == predicted[k];
+        g_rem_intra4x4_pred_mode[k] =
+            static_cast<std::uint8_t>(mode > predicted[k] ? mode - 1 : mode);
+    }
+}
+
+// modes: the macroblock's entries in the map of modes, with `stride` entries a row; the predicted
+// modes go to predicted.
+void MacroblockCoder::code_intra4x4_by_block(std::int8_t* modes, std::ptrdiff_t stride,
+                                             std::uint8_t* predicted) {
+    set_block_availability();
     g_luma_mask = 0;
     for (int k = 0; k < 16; ++k) {
         std::int8_t* entry = modes + zolt::luma_scan_j[k] * stride + zolt::luma_scan_i[k];
         const int above = entry[-stride];
         const int left = entry[-1];
-        const int predicted = above >= 0 && left >= 0 ? std::min(above, left) : 2;
+        predicted[k] =
+            static_cast<std::uint8_t>(above >= 0 && left >= 0 ? std::min(above, left) : 2);
 
         alignas(32) std::uint8_t pred[16];
-        const int mode = learn4_mode(k, predicted, pred);
+        const int mode = learn4_mode(k, predicted[k], pred);
         *entry = static_cast<std::int8_t>(mode);
         g_ipMBPred[k] = static_cast<std::uint8_t>(mode);
-        g_prev_intra4x4_pred_mode_flag[k] = mode == predicted;
-        g_rem_intra4x4_pred_mode[k] = static_cast<std::uint8_t>(mode > predicted ? mode - 1 : mode);
         quantTransform_luma_4x4(k, pred);
     }
 }
@@ -166,7 +183,11 @@ void MacroblockCoder::set_block_availability() {
         g_blk_up_left[k] = g_blk_up[k] && g_blk_left[k];
         g_blk_up_right[k] = (kNoUpRight >> k & 1) ? 0 : g_blk_up[k];
     }
-    g_blk_up_right[5] = g_mb_up && g_mb_x < picture.g_mb_width - 1;
+    g_blk_up_right[5] = has_up_right();
+}
+
+std::uint8_t MacroblockCoder::has_up_right() const {
+    return g_mb_up && g_mb_x < picture.g_mb_width - 1;
 }
 
 // Search, vector maps and luma prediction of a P macroblock.

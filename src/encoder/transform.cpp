@@ -88,11 +88,15 @@ const zolt::Quantizer& zolt::inter_quantizer(int qp) {
     return kInterQuantizers.by_qp[qp];
 }
 
+// That of intra 4x4 blocks.
+const Quantizer& MacroblockCoder::luma_quantizer() const {
+    return picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(picture.g_mbQp)
+                                               : zolt::inter_quantizer(picture.g_mbQp);
+}
+
 // Intra 4x4 block k: transform, levels, reconstruction in the current picture. pred: 4x4 samples.
 void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
-    const Quantizer& q = picture.g_slp->sliceType == I_SLICE
-                             ? zolt::intra_quantizer(picture.g_mbQp)
-                             : zolt::inter_quantizer(picture.g_mbQp);
+    const Quantizer& q = luma_quantizer();
     std::uint8_t* block =
         g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
@@ -108,15 +112,16 @@ void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
     }
 }
 
-// Intra 16x16 luma (clause 8.5.2): the DC coefficients have a transform of their own.
-void MacroblockCoder::quantTransform_luma_16x16() {
+// Intra 16x16 luma (clause 8.5.2) from its prediction: the DC coefficients have a transform of
+// their own.
+void MacroblockCoder::quantTransform_luma_16x16(const std::uint8_t* pred) {
     const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
     std::int16_t dc[16];
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred, q,
-                                                 dc, g_mb_coefs, g_scan_levels, g_nonzero);
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, pred, q, dc,
+                                                 g_mb_coefs, g_scan_levels, g_nonzero);
     const std::uint32_t constant = g_kernels->code_luma_dc(dc, q, g_mb_coefs, g_luma_dc);
     g_luma_dc_nonzero = static_cast<std::uint16_t>(constant);
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, g_mb_pred, g_mb_src_y,
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_src_y,
                                  picture.g_stride_luma);
 }
 
@@ -147,15 +152,14 @@ void MacroblockCoder::quantTransform_luma_16x16P() {
                                  picture.g_stride_luma);
 }
 
-// Chroma of any macroblock (clause 8.5.4).
-void MacroblockCoder::quantTransform_chroma() {
+// Chroma of any macroblock (clause 8.5.4) from the predictions of Cb and then Cr.
+void MacroblockCoder::quantTransform_chroma(const std::uint8_t* pred) {
     const int qp = zolt::QP_SCALE_CR[picture.g_mbQp];
     const Quantizer& q =
         picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
     g_chroma_ac_mask = 0;
     g_chroma_dc_mask = 0;
     for (int component = 0; component < 2; ++component) {
-        const std::uint8_t* pred = g_mb_pred + 256 + 64 * component;
         std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
         std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
         std::int16_t dc[4];
@@ -166,6 +170,7 @@ void MacroblockCoder::quantTransform_chroma() {
         g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples,
                                    picture.g_stride_chroma);
         g_chroma_ac_mask |= ac_mask << (4 * component);
+        pred += 64;
     }
 }
 

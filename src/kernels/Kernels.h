@@ -56,6 +56,34 @@ struct IyuvRows {
     std::uint8_t *u, *v;
 };
 
+// An intra 4x4 macroblock's luma for Kernels::code_intra_4x4.
+struct Intra4x4 {
+    // Its samples in the picture, which the reconstruction replaces. Those around it are read, as
+    // far as 4 samples to the right of it, whether or not they are there.
+    std::uint8_t* samples;
+    std::ptrdiff_t stride;
+    bool up, left, up_right;  // the macroblocks above, to the left and above to the right are there
+
+    // Its entries in a map of modes by 4x4 block, to be written; those above and to the left of
+    // them are read. A negative one: there is no block.
+    std::int8_t* modes;
+    std::ptrdiff_t modes_stride;
+
+    const Quantizer* quantizer;
+
+    // The predicted mode is kept up to a distortion of `kept`. Otherwise other
+    // modes pay `rate` for each phase, and are dropped after phase n when they cost more than
+    // drop[n] / 4 of the predicted mode's share, a fourth of its distortion.
+    int rate, kept;
+    std::int16_t drop[3];
+
+    // Results by block in decoding order: predicted and chosen modes, the levels in zig-zag order
+    // and the masks of those that are not 0.
+    std::uint8_t *predicted, *chosen;
+    std::int16_t* scan;
+    std::uint16_t* nonzero;
+};
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
@@ -177,14 +205,22 @@ struct Kernels {
     // frequencies), [2] the other three of the first column, [3] the remaining nine.
     void (*hadamard_energy)(const std::int32_t* values, std::int32_t* energy);
 
-    // Distortion of a prediction at every sampling phase. 16x16: phase (x, y) at [4 * y + x] is the
-    // sum of absolute differences at the 16 samples (x + 4i, y + 4j). 8x8 and 4x4: the absolute sum
-    // of the 2x2 Hadamard transform of the differences at (x, y), (x + d, y), (x, y + d) and
-    // (x + d, y + d); 8x8: d = 4, 16 phases at [4 * y + x]; 4x4: d = 2, 4 phases at [2 * y + x].
-    void (*phase_sad_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
-                            const std::uint8_t* pred, std::int32_t* distortion);
-    void (*phase_satd_8x8)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
-                           std::int32_t* distortion);
+    // Predictions of all four modes of an intra 16x16 block and of an intra chroma block of both
+    // components (clauses 8.3.3, 8.3.4) from the samples around src, or around u and v, which are
+    // read whether or not they are there; up, left: which of them the mean is of. They are left at
+    // preds one after the other, 256 samples each, or 64 of Cb and 64 of Cr. And their distortions
+    // by sampling phase, that of mode m at [4 * phase + m].
+    //
+    // 16x16: phase 4 * y + x is the sum of absolute differences at the 16 samples (x + 4i, y + 4j).
+    // Chroma: phase 4 * y + x, the first 12, is the absolute sum of the 2x2 Hadamard transform of
+    // the differences at (x, y), (x + 4, y), (x, y + 4) and (x + 4, y + 4), of both components.
+    void (*intra_16x16_modes)(const std::uint8_t* src, std::ptrdiff_t stride, bool up, bool left,
+                              std::uint8_t* preds, std::int32_t* distortion);
+    void (*intra_chroma_modes)(const std::uint8_t* u, const std::uint8_t* v, std::ptrdiff_t stride,
+                               bool up, bool left, std::uint8_t* preds, std::int32_t* distortion);
+
+    // Distortion of a 4x4 prediction by sampling phase, 2 * y + x: the absolute sum of the 2x2
+    // Hadamard transform of the differences at (x, y), (x + 2, y), (x, y + 2) and (x + 2, y + 2).
     void (*phase_satd_4x4)(const std::uint8_t* src, std::ptrdiff_t stride, const std::uint8_t* pred,
                            std::int32_t* distortion);
 
@@ -195,6 +231,13 @@ struct Kernels {
     void (*intra_4x4_modes)(const std::uint8_t* src, std::ptrdiff_t stride,
                             const std::uint8_t* neighbours, int dc, std::uint8_t* preds,
                             std::int16_t* distortion);
+
+    // Intra 4x4 luma of a macroblock, all blocks at once: mode, levels and reconstruction of every
+    // block, as MacroblockCoder makes them block by block with the entries above. Returns the mask
+    // of the blocks with levels. This one chooses as well, since every block waits for the choice
+    // of the one before; the numbers that it goes by are its caller's. Null where block by block is
+    // the fastest way.
+    std::uint32_t (*code_intra_4x4)(const Intra4x4& macroblock);
 
     // ---- Deblocking (clause 8.7.2) ----
 

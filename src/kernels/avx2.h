@@ -51,5 +51,18 @@ inline __m128i two_rows_of_4(const std::uint8_t* p, std::ptrdiff_t stride) {
     return _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1));
 }
 
+// Puts 16 coefficients kept column by column, positions 0..7 and 8..15, into zig-zag order
+// (Kernels.h, zigzag.h): 0 4 1 2 5 8 12 9, then 6 3 7 10 13 14 11 15.
+inline void zigzag(__m128i low, __m128i high, __m128i* first, __m128i* second) {
+    constexpr char x = -1;  // from the other vector
+    *first = _mm_or_si128(
+        _mm_shuffle_epi8(low, _mm_setr_epi8(0, 1, 8, 9, 2, 3, 4, 5, 10, 11, x, x, x, x, x, x)),
+        _mm_shuffle_epi8(high, _mm_setr_epi8(x, x, x, x, x, x, x, x, x, x, 0, 1, 8, 9, 2, 3)));
+    *second = _mm_or_si128(
+        _mm_shuffle_epi8(low, _mm_setr_epi8(12, 13, 6, 7, 14, 15, x, x, x, x, x, x, x, x, x, x)),
+        _mm_shuffle_epi8(high,
+                         _mm_setr_epi8(x, x, x, x, x, x, 4, 5, 10, 11, 12, 13, 6, 7, 14, 15)));
+}
+
 }  // namespace
 }  // namespace zolt

@@ -29,6 +29,7 @@ void fill_search(Kernels& table);
 void fill_prediction(Kernels& table);
 void fill_residual(Kernels& table);
 void fill_intra(Kernels& table);
+void fill_intra4(Kernels& table);
 void fill_deblock(Kernels& table);
 void fill_color(Kernels& table);
 }  // namespace avx2
@@ -39,6 +40,7 @@ namespace avx512 {
 void fill_search(Kernels& table);
 void fill_prediction(Kernels& table);
 void fill_residual(Kernels& table);
+void fill_intra4(Kernels& table);
 }  // namespace avx512
 
 }  // namespace zolt

@@ -2,6 +2,7 @@
 #include <cstdlib>
 
 #include "kernels/families.h"
+#include "kernels/intra_modes.h"
 #include "kernels/predict_4x4.h"
 
 namespace zolt {
@@ -110,8 +111,8 @@ void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighb
 void scalar::fill_intra(Kernels& table) {
     table.block_sums = block_sums;
     table.hadamard_energy = hadamard_energy;
-    table.phase_sad_16x16 = phase_sad_16x16;
-    table.phase_satd_8x8 = phase_satd_8x8;
+    table.intra_16x16_modes = intra_16x16_modes_by<phase_sad_16x16>;
+    table.intra_chroma_modes = intra_chroma_modes_by<phase_satd_8x8>;
     table.phase_satd_4x4 = phase_satd_4x4;
     table.intra_4x4_modes = intra_4x4_modes;
 }

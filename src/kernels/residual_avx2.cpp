@@ -54,19 +54,9 @@ void transpose_four(__m256i* v) {
     v[3] = _mm256_unpackhi_epi64(even_23, odd_23);
 }
 
-// Puts 16 coefficients kept column by column into zig-zag order (Kernels.h, zigzag.h).
 __m256i zigzag(__m256i v) {
-    constexpr char x = -1;              // from the other lane
-    const __m128i low = low_lane(v);    // positions 0..7
-    const __m128i high = high_lane(v);  // positions 8..15
-    // Order 0 4 1 2 5 8 12 9, then 6 3 7 10 13 14 11 15.
-    const __m128i first = _mm_or_si128(
-        _mm_shuffle_epi8(low, _mm_setr_epi8(0, 1, 8, 9, 2, 3, 4, 5, 10, 11, x, x, x, x, x, x)),
-        _mm_shuffle_epi8(high, _mm_setr_epi8(x, x, x, x, x, x, x, x, x, x, 0, 1, 8, 9, 2, 3)));
-    const __m128i second = _mm_or_si128(
-        _mm_shuffle_epi8(low, _mm_setr_epi8(12, 13, 6, 7, 14, 15, x, x, x, x, x, x, x, x, x, x)),
-        _mm_shuffle_epi8(high,
-                         _mm_setr_epi8(x, x, x, x, x, x, 4, 5, 10, 11, 12, 13, 6, 7, 14, 15)));
+    __m128i first, second;
+    zigzag(low_lane(v), high_lane(v), &first, &second);
     return join(first, second);
 }
 

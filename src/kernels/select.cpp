@@ -33,6 +33,7 @@ public:
             avx2::fill_prediction(last());
             avx2::fill_residual(last());
             avx2::fill_intra(last());
+            avx2::fill_intra4(last());
             avx2::fill_deblock(last());
             avx2::fill_color(last());
         }
@@ -42,6 +43,7 @@ public:
             avx512::fill_search(add("avx512"));
             avx512::fill_prediction(last());
             avx512::fill_residual(last());
+            avx512::fill_intra4(last());
         }
 #endif
     }

@@ -37,11 +37,12 @@ constexpr int kMargin = 64;  // before and after what a kernel may write
 struct Arena {
     alignas(64) std::uint8_t plane[2][kPlaneSize];
     alignas(64) std::uint8_t samples[kMargin + 512 + kMargin];
+    alignas(64) std::uint8_t mode_preds[kMargin + 1024 + kMargin];
     alignas(64) std::int16_t coefs[kMargin + 16 * 16 + kMargin];
     alignas(64) std::int16_t scan[kMargin + 16 * 16 + kMargin];
     alignas(64) std::uint16_t nonzero[kMargin + 16 + kMargin];
     alignas(64) std::int32_t values[kMargin + 16 + kMargin];
-    alignas(64) std::int32_t numbers[kMargin + 16 + kMargin];
+    alignas(64) std::int32_t numbers[kMargin + 64 + kMargin];
     std::int16_t dc[1 + 16];
     std::uint32_t result;
 
@@ -51,6 +52,7 @@ struct Arena {
     std::int16_t* coef() { return coefs + kMargin + 16; }
     std::int16_t* levels() { return scan + kMargin + 16; }
     std::uint16_t* masks() { return nonzero + kMargin + 1; }
+    std::uint8_t* preds() { return mode_preds + kMargin; }
     std::int32_t* out() { return numbers + kMargin; }
 };
 
@@ -341,15 +343,18 @@ constexpr Case kCases[] = {
      }},
     {"hadamard_energy",
      [](const Kernels& k, Arena& a, Random) { k.hadamard_energy(a.values + kMargin, a.out()); }},
-    {"phase_sad_16x16",
+    {"intra_16x16_modes",
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random, 16);
-         k.phase_sad_16x16(src.p, src.stride, a.pred(), a.out());
+         const bool up = random.between(0, 1), left = random.between(0, 1);
+         k.intra_16x16_modes(src.p, src.stride, up, left, a.preds(), a.out());
      }},
-    {"phase_satd_8x8",
+    {"intra_chroma_modes",
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random, 8);
-         k.phase_satd_8x8(src.p, src.stride, a.pred(), a.out());
+         const std::uint8_t* v = a.plane[1] + (src.p - a.plane[0]);
+         const bool up = random.between(0, 1), left = random.between(0, 1);
+         k.intra_chroma_modes(src.p, v, src.stride, up, left, a.preds(), a.out());
      }},
     {"phase_satd_4x4",
      [](const Kernels& k, Arena& a, Random random) {
@@ -375,9 +380,10 @@ constexpr Case kCases[] = {
     {"deblock_chroma_horizontal_strong",
      run_chroma_filter<&Kernels::deblock_chroma_horizontal_strong, true>},
 };
-// All function pointers of a table have a case, those of the colour conversions elsewhere.
+// All function pointers of a table have a case, those of the colour conversions elsewhere, and so
+// code_intra_4x4, which equals steps of the engine.
 static_assert(offsetof(Kernels, rgb32_rows_to_iyuv) ==
-                  sizeof(const char*) + sizeof kCases / sizeof *kCases * sizeof(void (*)()),
+                  sizeof(const char*) + (sizeof kCases / sizeof *kCases + 1) * sizeof(void (*)()),
               "a kernel without a case");
 
 class KernelTable : public testing::TestWithParam<std::tuple<const Kernels*, Case>> {};
