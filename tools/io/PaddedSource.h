@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "io/FilteredSource.h"
+#include "io/PicturePacker.h"
 
 namespace zolt {
 
@@ -18,11 +19,9 @@ public:
     bool read(std::vector<unsigned char>& sample) override;
 
 private:
-    void extend_row(const unsigned char* from, std::size_t from_bytes, unsigned char* to,
-                    std::size_t to_bytes) const;
-
     PictureFormat original_;
     PictureFormat padded_;
+    PicturePacker packer_;
     std::vector<unsigned char> picture_;  // as the other source gives it
 };
 
