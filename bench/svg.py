@@ -108,11 +108,12 @@ class Panel:
         self.lines.append(f'<line class="level" x1="{self.x(value):.1f}" y1="{self.top}" '
                           f'x2="{self.x(value):.1f}" y2="{self.bottom}"/>')
 
-    def upper_right(self, x, y):
-        """Tints what is right of and above a point."""
+    def upper_right(self, x, y, note):
+        """Tints what is right of and above a point, and writes there what that is."""
         self.lines.append(f'<rect class="zone" x="{self.x(x):.1f}" y="{self.top}" '
                           f'width="{self.right - self.x(x):.1f}" '
                           f'height="{self.y(y) - self.top:.1f}"/>')
+        self.lines.append(text((self.x(x) + self.right) / 2, self.top + 16, note, anchor="middle"))
 
     def curve(self, points, series=None):
         """A line through points (x, y); without a series dashed and grey."""
@@ -138,8 +139,8 @@ class Panel:
         taken = [(x - 5, y - 5, x + 5, y + 5) for x, y in points]
         for (x, y), (_, _, label, series) in zip(points, entries):
             width = 7 * len(label)
-            places = [(x + 9, y + 4), (x - 9 - width, y + 4), (x - width / 2, y - 10),
-                      (x - width / 2, y + 20), (x + 9, y - 10), (x + 9, y + 20)]
+            places = [(x + 7, y - 6), (x + 9, y + 4), (x - 9 - width, y + 4),
+                      (x - width / 2, y - 10), (x - width / 2, y + 20), (x + 9, y + 20)]
             boxes = [(a, b - 11, a + width, b + 3) for a, b in places]
             costs = [sum(overlap(box, other) for other in taken) + self.outside(box)
                      for box in boxes]
