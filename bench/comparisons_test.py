@@ -76,7 +76,8 @@ class CompareTest(unittest.TestCase):
         self.assertEqual(done.returncode, 0, done.stderr)
         table = rows(done.stdout)
         self.assertEqual([row[8] for row in table],
-                         ["ultrafast, equal rate", "ultrafast, equal QP"])
+                         ["ultrafast, equal rate", "ultrafast, equal QP",
+                          "ultrafast, --qp alone"])
         self.assertEqual({row[4] for row in table}, {"100.0 %"})
 
     def test_wrong_usage(self):

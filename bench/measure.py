@@ -20,6 +20,7 @@ from dataclasses import dataclass
 from typing import Callable
 
 FRAME_RATE = 30
+RAW_ENDING = ".yuv"
 PREFIX = pathlib.Path(sys.argv[0]).name
 # What x264 may use when the engine is held to a table of kernels.
 RIVAL_TABLES = {
@@ -108,9 +109,16 @@ class Film:
     def bits_per_macroblock(self, rate):
         return rate * 1000 / FRAME_RATE / self.macroblocks
 
+    def add_raw(self):
+        """Writes the samples of both files alone beside them, under RAW_ENDING."""
+        for path in (self.path, self.first):
+            run(["ffmpeg", "-v", "error", "-nostdin", "-y", "-i", path, "-f", "rawvideo",
+                 path.with_suffix(RAW_ENDING)])
+
     def remove(self):
-        self.path.unlink()
-        self.first.unlink()
+        for path in (self.path, self.first):
+            path.unlink()
+            path.with_suffix(RAW_ENDING).unlink(missing_ok=True)
 
 
 def size_argument(text):
@@ -197,10 +205,13 @@ def x264(preset, control, key_interval, options=()):
         "--no-scenecut", *control, *options, "--no-progress", "-o", target, source])
 
 
-def openh264(complexity, rate, key_interval):
-    """openh264enc in a GStreamer pipeline; rate: kbit/s."""
+def openh264(complexity, rate, key_interval, film):
+    """openh264enc in a GStreamer pipeline, for a film with raw files: GStreamer's own Y4M reader
+    refuses some of the headers that ffmpeg writes. rate: kbit/s."""
     return Encoder(f"openh264 {complexity}", lambda source, target: [
-        "gst-launch-1.0", "-q", "filesrc", f"location={source}", "!", "y4mdec", "!", "openh264enc",
+        "gst-launch-1.0", "-q", "filesrc", f"location={source.with_suffix(RAW_ENDING)}",
+        "blocksize=65536", "!", "rawvideoparse", "format=i420", f"width={film.width}",
+        f"height={film.height}", f"framerate={FRAME_RATE}/1", "!", "openh264enc",
         f"complexity={complexity}", "rate-control=bitrate", f"bitrate={1000 * rate}",
         f"gop-size={key_interval}", "multi-thread=1", "scene-change-detection=false", "!",
         "filesink", f"location={target}"])
