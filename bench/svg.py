@@ -49,7 +49,7 @@ class Axis:
         decades = range(math.floor(math.log10(low)), math.ceil(math.log10(high)) + 1)
         values = [factor * 10.0 ** decade for decade in decades for factor in (1, 2, 5)]
         inside = [value for value in values if low <= value <= high]
-        if len(inside) < 3:
+        if len(inside) < 4:
             inside = [round(factor * 10.0 ** decade, 9) for decade in decades
                       for factor in (1, 1.2, 1.5, 2, 2.5, 3, 4, 5, 6, 8)]
         return cls(title, low, high, [(value, f"{value:.10g}") for value in inside
