@@ -24,9 +24,13 @@ import statistics
 import sys
 from dataclasses import dataclass, field
 
+sys.path.insert(0, str(pathlib.Path(__file__).resolve().parent.parent))
+
+import svg
+from markdown import table
+
 LEAD = 3  # Wavefront.cpp: kLead
 BORDER = 29  # half-sample rows above the picture
-COLOURS = ("#2b7bba", "#c8553d", "#3f8f5a", "#8a5bb0", "#a07d1c")
 
 
 @dataclass
@@ -183,11 +187,6 @@ def even_steps(picture):
     return {"steps": [[mean] * width for _ in picture.steps]}
 
 
-def table(head, rows):
-    lines = ["| " + " | ".join(head) + " |", "|" + "---|" * len(head)]
-    return "\n".join(lines + ["| " + " | ".join(row) + " |" for row in rows])
-
-
 def gains_table(films, counts, start_up):
     rows = []
     for name, pictures in films.items():
@@ -240,69 +239,25 @@ def checks_table(films):
                   "two workers simulated", "start of the second"], rows)
 
 
-STYLE = """
-  text { font: 13px sans-serif; fill: #333; }
-  .axis { stroke: #333; } .grid { stroke: #ddd; } .ideal { stroke: #999; stroke-dasharray: 5 4; }
-  .paper { fill: #fff; }
-  @media (prefers-color-scheme: dark) {
-    text { fill: #ccc; } .paper { fill: #1c1c1c; }
-    .axis { stroke: #ccc; } .grid { stroke: #3a3a3a; }
-  }
-"""
-
-
 def plot(films, counts, start_up):
     """An SVG: gain by number of workers, which stand at equal distances."""
-    width, height, left, top = 640, 400, 60, 20
-    right, bottom = width - 130, height - 50
-    columns = len(counts) - 1
-    top_gain = max(2, *(gain(p, counts[-1], start_up) for p in films.values()))
-    step = 2 if top_gain <= 16 else 4
-    top_gain = -(-int(top_gain + 1) // step) * step
-
-    def x(index):
-        return left + (right - left) * index / columns
-
-    def y(value):
-        return bottom - (bottom - top) * value / top_gain
-
-    lines = [f'<svg xmlns="http://www.w3.org/2000/svg" viewBox="0 0 {width} {height}" role="img">',
-             "<title>Pictures a second over those of one worker</title>",
-             f"<style>{STYLE}</style>",
-             f'<rect class="paper" width="{width}" height="{height}"/>']
-    for value in range(0, top_gain + 1, step):
-        lines.append(f'<line class="grid" x1="{left}" y1="{y(value):.1f}" x2="{right}" '
-                     f'y2="{y(value):.1f}"/>')
-        lines.append(f'<text x="{left - 10}" y="{y(value) + 4:.1f}" text-anchor="end">{value}'
-                     "</text>")
-    for index, count in enumerate(counts):
-        lines.append(f'<text x="{x(index):.1f}" y="{bottom + 20}" text-anchor="middle">{count}'
-                     "</text>")
-    lines.append(f'<line class="axis" x1="{left}" y1="{bottom}" x2="{right}" y2="{bottom}"/>')
-    lines.append(f'<line class="axis" x1="{left}" y1="{top}" x2="{left}" y2="{bottom}"/>')
-    lines.append(f'<text x="{(left + right) / 2}" y="{height - 10}" text-anchor="middle">workers'
-                 "</text>")
-    lines.append(f'<text transform="translate(18 {(top + bottom) / 2}) rotate(-90)" '
-                 'text-anchor="middle">pictures a second, one worker = 1</text>')
-    ideal = " ".join(f"{x(i):.1f},{y(count):.1f}" for i, count in enumerate(counts)
-                     if count <= top_gain)
-    lines.append(f'<polyline class="ideal" fill="none" points="{ideal}"/>')
+    gains = {name: [gain(pictures, count, start_up) for count in counts]
+             for name, pictures in films.items()}
+    top_gain = max(2, *(values[-1] for values in gains.values()))
+    workers = svg.Axis("workers", 0, len(counts) - 1,
+                       [(index, str(count)) for index, count in enumerate(counts)])
+    panel = svg.Panel((60, 20, 510, 350), workers,
+                      svg.Axis.linear("pictures a second, one worker = 1", 0, top_gain))
+    panel.curve([(index, count) for index, count in enumerate(counts)
+                 if count <= panel.y_axis.high])
     labels = []
-    for (name, pictures), colour in zip(films.items(), COLOURS):
-        values = [gain(pictures, count, start_up) for count in counts]
-        points = " ".join(f"{x(i):.1f},{y(value):.1f}" for i, value in enumerate(values))
-        lines.append(f'<polyline fill="none" stroke="{colour}" stroke-width="2" '
-                     f'points="{points}"/>')
-        lines += [f'<circle cx="{x(i):.1f}" cy="{y(value):.1f}" r="3" fill="{colour}"/>'
-                  for i, value in enumerate(values)]
-        labels.append([y(values[-1]), name, colour, values[-1]])
-    last = 0.0
-    for place, name, colour, value in sorted(labels):
-        place = max(place, last + 16)
-        lines.append(f'<text x="{right + 8}" y="{place + 4:.1f}" style="fill: {colour}">{name} '
-                     f"({value:.1f})</text>")
-        last = place
-    return "\n".join(lines + ["</svg>", ""])
+    for series, (name, values) in enumerate(gains.items()):
+        panel.curve(list(enumerate(values)), series % svg.SERIES)
+        for index, value in enumerate(values):
+            panel.mark(index, value, series % svg.SERIES)
+        labels.append((values[-1], f"{name} ({values[-1]:.1f})", series % svg.SERIES))
+    panel.labels_at_right(labels)
+    return svg.drawing(640, 400, "Pictures a second over those of one worker", [panel])
 
 
 def main():
