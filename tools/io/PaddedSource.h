@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "io/FilteredSource.h"
+#include "io/PicturePacker.h"
 
 namespace zolt {
 
@@ -18,12 +19,11 @@ public:
     bool read(unsigned char* sample) override;
 
 private:
-    void extend_row(const unsigned char* from, std::size_t from_bytes, unsigned char* to,
-                    std::size_t to_bytes) const;
-
     PictureFormat original_;
     PictureFormat padded_;
-    std::vector<unsigned char> picture_;  // as the other source gives it
+    PicturePacker packer_;
+    std::vector<unsigned char> picture_;       // as the other source gives it
+    std::vector<PicturePacker::Rows> planes_;  // its own
 };
 
 }  // namespace zolt

@@ -41,8 +41,16 @@ struct PictureFormat {
     // What is wrong with a picture size, with what would be right; empty when it can be coded.
     static std::string size_error(int width, int height);
 
+    // Whether pictures of a format have luma and chroma; the others have red, green and blue.
+    static bool is_yuv(int fourcc_code) {
+        return fourcc_code == kIyuv || fourcc_code == kYuy2 || fourcc_code == kAyuv;
+    }
+
     // A side rounded up to whole macroblocks.
     static int rounded_up(int side);
+
+    // This format with both sides rounded up.
+    PictureFormat padded() const { return {fourcc_code, rounded_up(width), rounded_up(height)}; }
 
     // Bytes of a picture in a media sample and in a file.
     std::size_t sample_bytes() const;

@@ -20,7 +20,7 @@ struct StreamDescription {
     std::vector<unsigned char> pic_par_set;
     int width = 0;  // of the coded pictures, luma samples
     int height = 0;
-    FrameRate frame_rate;
+    FrameRate frame_rate;           // 0 to 0: not known
     bool is_constant_rate = false;  // pictures come at the frame rate exactly
     TimeBase time_base;             // of the pictures' times
     // What a time of the input has more than that of the same picture here, in ticks.

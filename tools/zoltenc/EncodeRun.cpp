@@ -7,11 +7,10 @@
 #include "io/SyntheticSource.h"
 #include "io/ToolError.h"
 #include "io/os.h"
-#include "io/thread_runner.h"
 #include "media/IConfigVideoAvc.h"
-#include "zoltenc/EncoderLibrary.h"
-#include "zoltenc/EncoderSession.h"
-#include "zoltenc/HostServices.h"
+#include "session/EncoderLibrary.h"
+#include "session/EncoderSession.h"
+#include "session/HostServices.h"
 #include "zoltenc/JsonLines.h"
 #include "zoltenc/Pacer.h"
 #include "zoltenc/coded_traits.h"
@@ -76,11 +75,18 @@ void EncodeRun::encode() {
 
     // What the library prints on standard output must not enter the stream.
     os_divert_output(options_.verbose);
-    HostServices::announce();
+    const HostServices host(os_program_directory());
+    host.announce();
     const EncoderLibrary library(
-        options_.plugin.empty() ? os_program_directory() + ZOLT_ENCODER_LIBRARY : options_.plugin);
-    EncoderSession session(library, source_->format(), frame_rate_,
-                           {pass_.bit_rate_kbs, options_.key_frame_interval, threads()}, consumer_);
+        options_.plugin.empty() ? os_program_directory() + ZOLT_ENCODER_LIBRARY : options_.plugin,
+        "name the right one with --plugin");
+    const PictureFormat format = source_->format();
+    EncoderSession session(
+        library, host,
+        {pass_.bit_rate_kbs, options_.key_frame_interval,
+         options_.threads.value_or(EncoderSession::useful_threads(format.height))},
+        consumer_);
+    session.begin(format, frame_rate_);
     describe(library);
     begin_summary(library);
 
@@ -166,14 +172,6 @@ void EncodeRun::skip_frames() {
     for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture.data()); ++frame) {}
 }
 
-// Two rows of macroblocks or more for each thread; what another one would do is too little.
-int EncodeRun::threads() const {
-    constexpr int kMacroblock = 16;
-    constexpr int kRowsOfAThread = 2;
-    const int rows = source_->format().height / kMacroblock;
-    return options_.threads.value_or(std::clamp(rows / kRowsOfAThread, 1, processor_count()));
-}
-
 void EncodeRun::choose_frame_rate() {
     const std::optional<FrameRate> stated = source_->frame_rate();
     frame_rate_ = stated ? *stated : options_.frame_rate.value_or(FrameRate{});
@@ -238,7 +236,7 @@ void EncodeRun::encode_all(EncoderSession& session, Progress& progress) {
         }
         consumer_.set_time(time);
         recorder_.set_source(picture.data());
-        session.encode(picture, microseconds(time.start, time_base_));
+        session.encode(picture.data(), picture.size(), microseconds(time.start, time_base_));
         progress.update();
     }
     session.end();

@@ -60,7 +60,6 @@ public:
 private:
     void check_outputs() const;
     void skip_frames();
-    int threads() const;
     void choose_frame_rate();
     void describe_input();
     std::optional<std::int64_t> expected_frames() const;

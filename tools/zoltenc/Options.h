@@ -6,6 +6,7 @@
 
 #include "io/FrameRate.h"
 #include "io/PictureFormat.h"
+#include "session/EncoderSession.h"
 #include "zoltenc/OutputFormat.h"
 
 namespace zolt {
@@ -16,8 +17,7 @@ enum class Fit { crop, pad, scale };
 
 // What the command line asks for.
 struct Options {
-    // The largest bit rate of level 2.2, Main profile (ITU-T H.264 Table A-1).
-    static constexpr int kMaxBitRateKbs = 4000;
+    static constexpr int kMaxBitRateKbs = EncoderSession::kMaxBitRateKbs;
 
     std::string input = "synthetic";              // a file, "-" or "synthetic..."
     std::string output;                           // a file, "-" or an address; "null" for none

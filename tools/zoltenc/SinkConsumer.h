@@ -1,21 +1,17 @@
 #pragma once
 
 #include <cstdint>
-#include <exception>
 #include <functional>
+#include <utility>
 
 #include "io/PictureSink.h"
-#include "media/ISampleConsumer.h"
-
-class IConfigVideoAvc;
+#include "session/StreamConsumer.h"
 
 namespace zolt {
 
 // Takes an encoder's samples and hands them to a sink, with what the encoder does not carry: the
 // input's own times and traits.
-//
-// A failed write must not unwind through the encoder, so it is kept and thrown by `check`.
-class SinkConsumer : public ISampleConsumer {
+class SinkConsumer final : public StreamConsumer {
 public:
     // Is told of every coded picture after it was written.
     using PictureListener = std::function<void(const CodedPicture&)>;
@@ -34,27 +30,15 @@ public:
     // The time of the picture that the encoder is about to be given.
     void set_time(const PictureTime& time) { time_ = time; }
 
-    // Of the encoder that feeds this consumer; null until its stream configuration came.
-    IConfigVideoAvc* stream() const { return stream_; }
-    std::int64_t pictures() const { return pictures_; }
-
-    // Throws what went wrong since the last call.
-    void check();
-
-    void Notify(IEvent* event) override;
-    int PutStreamConfig(ISampleStreamConfig* config) override;
-    void PutSample(ISample* sample) override;
-    void EndOfSamples() override {}
-
 private:
+    void begin_stream(IConfigVideoAvc& stream) override;
+    void take_picture(ISample& sample) override;
+
     PictureSink& sink_;
     PictureListener listener_;
-    IConfigVideoAvc* stream_ = nullptr;
     StreamDescription description_;
     bool described_ = false;  // the sink knows the stream as it is now
     PictureTime time_;
-    std::int64_t pictures_ = 0;
-    std::exception_ptr failure_;
 };
 
 }  // namespace zolt

@@ -1,4 +1,4 @@
-#include "zoltenc/EncoderLibrary.h"
+#include "session/EncoderLibrary.h"
 
 #include "io/ToolError.h"
 #include "media/IMediaEncoder.h"
@@ -16,11 +16,13 @@ std::string as_path(const std::string& file_name) {
 
 }  // namespace
 
-EncoderLibrary::EncoderLibrary(const std::string& file_name)
-    : file_name_(file_name), handle_(dlopen(as_path(file_name).c_str(), RTLD_NOW), dlclose) {
+EncoderLibrary::EncoderLibrary(const std::string& file_name, const std::string& remedy, Place place)
+    : file_name_(file_name),
+      handle_(dlopen((place == Place::kFile ? as_path(file_name) : file_name).c_str(), RTLD_NOW),
+              dlclose) {
     if (!handle_) {
         throw ToolError(file_name + ": cannot be loaded as the encoder library (" + dlerror() +
-                        "); name the right one with --plugin");
+                        "); " + remedy);
     }
     const auto get_encoder_type = find<int (*)()>("GetEncoderType");
     get_encoder_name_ = find<const char* (*)()>("GetEncoderName");

@@ -13,8 +13,15 @@ namespace zolt {
 // GetNewEncoder. Its encoders must be gone before this object is.
 class EncoderLibrary {
 public:
+    enum class Place {
+        kFile,   // the name is a file's
+        kSystem  // the file is where the system's libraries are
+    };
+
     // Throws a ToolError that names the file when it cannot be loaded or is no AVC encoder.
-    explicit EncoderLibrary(const std::string& file_name);
+    // `remedy` ends the message of the former: what the user can do.
+    EncoderLibrary(const std::string& file_name, const std::string& remedy,
+                   Place place = Place::kFile);
     ~EncoderLibrary();
     EncoderLibrary(const EncoderLibrary&) = delete;
     EncoderLibrary& operator=(const EncoderLibrary&) = delete;
