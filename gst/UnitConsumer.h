@@ -2,6 +2,7 @@
 
 #include <vector>
 
+#include "avc/IdrNumbers.h"
 #include "session/StreamConsumer.h"
 #include "stream_format.h"
 
@@ -25,6 +26,8 @@ private:
     std::vector<unsigned char> nal_;
     bool is_key_ = false;
     ParameterSetUnits sets_;
+    SequenceParameterSet seq_par_set_;
+    IdrNumbers idr_numbers_;
     int width_ = 0;
     int height_ = 0;
 };
