@@ -1,6 +1,7 @@
 """Pipelines to decoders, to the network and to several encoders at once. Streams are those of zoltenc
 for the same pictures and settings."""
 
+import pathlib
 import re
 import signal
 import socket
@@ -10,6 +11,7 @@ import unittest
 
 from gst_runner import ENVIRONMENT, PipelineTest, encoder, file, y4m
 
+PAGE = pathlib.Path(__file__).parents[3] / "docs" / "gstreamer.md"
 BYTE_STREAM = "video/x-h264,stream-format=byte-stream"
 AVC = "video/x-h264,stream-format=avc"
 
@@ -150,6 +152,27 @@ def is_bound(port):
     """Whether a process listens for datagrams at a port of this machine."""
     with open("/proc/net/udp", encoding="ascii") as table:
         return any(line.split()[1].endswith(f":{port:04X}") for line in list(table)[1:])
+
+
+class Documentation(PipelineTest):
+    elements = ("decodebin", "videoconvert", "mp4mux", "rtph264pay", "udpsink", "udpsrc",
+                "rtpjitterbuffer", "rtph264depay", "avdec_h264")
+
+    def test_the_pipelines_of_the_page_run(self):
+        self.make("in.mkv")
+        text = PAGE.read_text(encoding="utf-8").replace("\\\n", " ")
+        pipelines = re.findall(r"^    (?:gst-launch-1.0 -e|./run --gst) (.*)", text, re.M)
+        self.assertGreaterEqual(len(pipelines), 4)
+        for pipeline in pipelines:
+            with self.subTest(pipeline=pipeline):
+                here = pipeline.replace("port=5000", f"port={free_port()}")
+                process = self.start(here.replace("autovideosink", "fakesink"))
+                try:
+                    process.wait(timeout=2)
+                except subprocess.TimeoutExpired:
+                    process.send_signal(signal.SIGINT)
+                self.assertEqual(self.finish(process), "")
+        self.assertEqual(len(self.decode("out.mp4", 320, 240)), 50)
 
 
 class Leaks(PipelineTest):
