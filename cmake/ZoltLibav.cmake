@@ -1,4 +1,5 @@
 # ZOLT_LIBAV: whether FFmpeg's libraries are there for what is built, as the target PkgConfig::LIBAV.
+# Of libavdevice the header is enough to build with; it is loaded when it is needed.
 # Without them the tools are built all the same, with Y4M and raw pictures alone.
 set(ZOLT_LIBAV OFF)
 if(CMAKE_CROSSCOMPILING)
@@ -9,8 +10,9 @@ if(NOT PKG_CONFIG_FOUND)
     return()
 endif()
 pkg_check_modules(LIBAV QUIET IMPORTED_TARGET
-    libavdevice>=59 libavformat>=59 libavcodec>=59 libswscale>=6 libavutil>=57)
-if(NOT LIBAV_FOUND)
+    libavformat>=59 libavcodec>=59 libswscale>=6 libavutil>=57)
+pkg_check_modules(LIBAVDEVICE QUIET libavdevice>=59)
+if(NOT LIBAV_FOUND OR NOT LIBAVDEVICE_FOUND)
     return()
 endif()
 # They may be there for the machine's own width only.
@@ -18,9 +20,9 @@ include(CheckCXXSourceCompiles)
 set(CMAKE_REQUIRED_LIBRARIES PkgConfig::LIBAV)
 check_cxx_source_compiles("
     extern \"C\" {
-    #include <libavdevice/avdevice.h>
+    #include <libavformat/avformat.h>
     }
-    int main() { avdevice_register_all(); }" ZOLT_LIBAV_LINKS)
+    int main() { return avformat_version() == 0; }" ZOLT_LIBAV_LINKS)
 unset(CMAKE_REQUIRED_LIBRARIES)
 if(ZOLT_LIBAV_LINKS)
     set(ZOLT_LIBAV ON)

@@ -90,9 +90,9 @@ void H264Element::close() {
 }
 
 void H264Element::start() {
-    encoder_ = std::make_unique<PictureEncoder>(*library_, element_services());
     const std::lock_guard<std::mutex> lock(mutex_);
     tally_ = {};
+    coded_before_ = 0;
 }
 
 void H264Element::stop() {
@@ -101,9 +101,10 @@ void H264Element::stop() {
 }
 
 bool H264Element::set_format(GstVideoCodecState* input) {
-    const InputDescription description = describe_input(input->info);
     const PictureEncoder::Settings wanted = settings();
-    encoder_->begin(description, wanted);
+    encoder_ = std::make_unique<PictureEncoder>(*library_, element_services(),
+                                                describe_input(input->info), wanted);
+    coded_before_ = tally().microseconds;
     input_.reset(gst_video_codec_state_ref(input));
     announced_kbs_ = wanted.bit_rate_kbs;
     gst_video_encoder_set_latency(element_, 0, 0);
@@ -116,7 +117,7 @@ bool H264Element::set_format(GstVideoCodecState* input) {
 }
 
 void H264Element::set_source_caps() {
-    if (encoder_ == nullptr || !encoder_->has_begun()) {
+    if (encoder_ == nullptr) {
         return;
     }
     const StreamFormat chosen = choose_stream_format();
@@ -145,8 +146,15 @@ void H264Element::set_source_caps() {
 
 GstFlowReturn H264Element::handle_frame(GstVideoCodecFrame* owned) {
     FrameOwner frame(owned);
-    if (encoder_ == nullptr || !encoder_->has_begun()) {
+    if (encoder_ == nullptr) {
         return GST_FLOW_NOT_NEGOTIATED;
+    }
+    // What the reader wants now is to be known before the picture is coded for it.
+    GstPad* const source = GST_VIDEO_ENCODER_SRC_PAD(element_);
+    if (gst_pad_check_reconfigure(source) != FALSE &&
+        gst_video_encoder_negotiate(element_) == FALSE) {
+        gst_pad_mark_reconfigure(source);
+        return GST_PAD_IS_FLUSHING(source) ? GST_FLOW_FLUSHING : GST_FLOW_NOT_NEGOTIATED;
     }
     if (is_late(frame.get())) {
         // Without an output buffer the frame is dropped, and said to be.
@@ -177,7 +185,7 @@ GstFlowReturn H264Element::handle_frame(GstVideoCodecFrame* owned) {
 }
 
 void H264Element::finish() {
-    if (encoder_ != nullptr && encoder_->has_begun()) {
+    if (encoder_ != nullptr) {
         encoder_->end();
     }
 }
@@ -222,7 +230,7 @@ PictureEncoder::Picture H264Element::encode(GstVideoCodecFrame* frame) {
     ++tally_.pictures;
     tally_.key_frames += picture.is_key ? 1 : 0;
     tally_.bits += picture.nal.size() * 8;
-    tally_.microseconds = picture.end;
+    tally_.microseconds = coded_before_ + picture.end;
     return picture;
 }
 

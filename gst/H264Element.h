@@ -64,9 +64,10 @@ private:
 
     // Of the streaming thread, or of the one that changes the state while that does not run.
     std::unique_ptr<EncoderLibrary> library_;
-    std::unique_ptr<PictureEncoder> encoder_;
+    std::unique_ptr<PictureEncoder> encoder_;  // null until there are caps
     StateOwner input_;
-    int announced_kbs_ = 0;  // in the tags
+    std::int64_t coded_before_ = 0;  // with other caps, microseconds
+    int announced_kbs_ = 0;          // in the tags
     StreamFormat stream_format_ = StreamFormat::byte_stream;
 };
 

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <memory>
 #include <optional>
 #include <vector>
 
@@ -29,13 +28,10 @@ public:
         Fit fit = Fit::pad;
     };
 
-    // Both are the caller's and outlive this object.
-    PictureEncoder(const EncoderLibrary& library, const HostServices& host)
-        : library_(library), host_(host) {}
-
-    // Begins a stream of such pictures.
-    void begin(const InputDescription& input, const Settings& settings);
-    bool has_begun() const { return session_ != nullptr; }
+    // Begins a stream of such pictures. `library` and `host` are the caller's and outlive this
+    // object.
+    PictureEncoder(const EncoderLibrary& library, const HostServices& host,
+                   const InputDescription& input, const Settings& settings);
 
     // Take effect with the next picture, which they do not make an IDR picture. A bit rate that
     // needs a higher level is told by the parameter sets of the next IDR picture that comes.
@@ -69,28 +65,28 @@ public:
     Picture encode(const std::vector<PicturePacker::Rows>& rows, std::optional<std::uint64_t> time);
 
     // No more pictures come in this stream.
-    void end() { session_->end(); }
+    void end() { session_.end(); }
 
 private:
+    FrameRate session_rate() const { return input_.frame_rate.value_or(FrameRate{}); }
     ParameterSetUnits player_sets() const;
 
     const EncoderLibrary& library_;
-    const HostServices& host_;
-    InputDescription input_;
-    Fit fit_ = Fit::pad;
-    PictureFormat sample_format_;  // of what the encoder is given
-    std::optional<PicturePacker> packer_;
+    const InputDescription input_;
+    const Fit fit_;
+    const PictureFormat sample_format_;  // of what the encoder is given
+    const PicturePacker packer_;
     std::vector<unsigned char> sample_;
     SessionClock clock_;
-    int shown_width_ = 0;
-    int shown_height_ = 0;
-    int bit_rate_kbs_ = 0;
-    int key_frame_interval_ = 0;
-    int level_kbs_ = 0;  // the largest bit rate since the stream began
+    int bit_rate_kbs_;
+    int key_frame_interval_;
+    int level_kbs_;  // the largest bit rate since the stream began
     bool restarts_ = false;
+    UnitConsumer consumer_;
+    EncoderSession session_;
     ParameterSetUnits sets_;
-    std::optional<UnitConsumer> consumer_;
-    std::unique_ptr<EncoderSession> session_;
+    int shown_width_;
+    int shown_height_;
 };
 
 }  // namespace zolt

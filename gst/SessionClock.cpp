@@ -4,8 +4,15 @@
 
 namespace zolt {
 
+namespace {
+
+// No pause is longer, so that the sum stays in range however many there are.
+constexpr std::int64_t kLongest = 3600LL * 1000 * 1000;
+
+}  // namespace
+
 void SessionClock::set_frame_rate(const FrameRate& rate) {
-    interval_ = std::max<std::int64_t>(rate.sample_time(1), 1);
+    interval_ = std::clamp<std::int64_t>(rate.sample_time(1), 1, kLongest);
 }
 
 std::int64_t SessionClock::next(std::optional<std::uint64_t> buffer_time) {
@@ -17,7 +24,9 @@ std::int64_t SessionClock::next(std::optional<std::uint64_t> buffer_time) {
     }
     const bool follows = buffer_time && last_ && *buffer_time > *last_;
     if (started_) {
-        time_ += follows ? static_cast<std::int64_t>(*buffer_time - *last_) : interval_;
+        time_ += follows ? static_cast<std::int64_t>(
+                               std::min<std::uint64_t>(*buffer_time - *last_, kLongest))
+                         : interval_;
     }
     started_ = true;
     last_ = buffer_time;

@@ -12,6 +12,7 @@
 #include "Film.h"
 #include "Session.h"
 #include "encoder/CEncoder.h"
+#include "io/ThreadRunner.h"
 
 // What a picture costs: by type, size and kernel table at a constant QP; in a session with rate
 // control; and in two sessions on two threads.
@@ -109,6 +110,32 @@ void two_sessions(benchmark::State& state) {
     state.counters["cost"] = median(costs);
 }
 
+// Pictures a second of a session with two threads over those of the same session with its caller's
+// alone, which needs two idle processors: a run of each in turn. Median of the iterations.
+void two_threads(benchmark::State& state) {
+    const int width = static_cast<int>(state.range(0));
+    const int height = static_cast<int>(state.range(1));
+    const int pictures = static_cast<int>(30 * 1280 * 720 / (state.range(0) * state.range(1)));
+    const Film film(width, height);
+    zolt::ThreadRunner runner(2);
+    Session session(width, height, static_cast<int>(state.range(2)));
+    const auto run = [&](zolt::ThreadRunner* lent) {
+        session.lend(lent);
+        const Clock::time_point start = Clock::now();
+        for (int n = 0; n < pictures; ++n) {
+            session.encode(film.picture(n));
+        }
+        return seconds_since(start);
+    };
+    run(&runner);
+    std::vector<double> speedups;
+    for (auto _ : state) {
+        const double one = run(nullptr);
+        speedups.push_back(one / run(&runner));
+    }
+    state.counters["speedup"] = median(speedups);
+}
+
 const bool registered = [] {
     for (const SliceType type : {I_SLICE, P_SLICE}) {
         for (const auto& size : kSizes) {
@@ -126,6 +153,14 @@ const bool registered = [] {
 }();
 
 BENCHMARK(latency)->ArgName("kbit/s")->Arg(2000)->Unit(benchmark::kMillisecond)->Iterations(300);
+BENCHMARK(two_threads)
+    ->ArgNames({"width", "height", "kbit/s"})
+    ->Args({352, 288, 800})
+    ->Args({1280, 720, 2000})
+    ->Args({1920, 1072, 4000})
+    ->Unit(benchmark::kMillisecond)
+    ->UseRealTime()
+    ->Iterations(15);
 BENCHMARK(two_sessions)->Unit(benchmark::kMillisecond)->UseRealTime()->Iterations(9);
 
 }  // namespace

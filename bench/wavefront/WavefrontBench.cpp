@@ -46,7 +46,7 @@ Pictures from_file(const std::string& name, int count) {
     const zolt::PictureFormat format = reader.format();
     Pictures pictures{format.width, format.height, {}};
     std::vector<std::uint8_t> frame(format.sample_bytes());
-    for (int n = 0; n < count && reader.read(frame.data()); ++n) {
+    for (int n = 0; n < count && reader.read(frame); ++n) {
         pictures.frames.push_back(frame);
     }
     return pictures;

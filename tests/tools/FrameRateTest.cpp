@@ -98,13 +98,13 @@ TEST(SyntheticSource, MovesAndIsTheSameEveryTime) {
     std::vector<unsigned char> a(bytes);
     std::vector<unsigned char> b(bytes);
     for (int frame = 0; frame < 3; ++frame) {
-        ASSERT_TRUE(first.read(a.data()));
-        ASSERT_TRUE(second.read(b.data()));
+        ASSERT_TRUE(first.read(a));
+        ASSERT_TRUE(second.read(b));
         EXPECT_EQ(a, b);
         EXPECT_NE(a, before);
         before = a;
     }
-    EXPECT_FALSE(first.read(a.data()));
+    EXPECT_FALSE(first.read(a));
 }
 
 }  // namespace

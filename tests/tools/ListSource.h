@@ -31,13 +31,13 @@ public:
     PictureTime time() const override { return {(next_ - 1) * (next_ - 1), 2 * next_ - 1}; }
     std::string closing_remark() const override { return std::to_string(next_) + " read"; }
     std::optional<std::int64_t> frames_left() const override { return count() - next_; }
-    bool read(unsigned char* sample) override {
+    bool read(std::vector<unsigned char>& sample) override {
         before_read(static_cast<int>(next_));
         if (next_ == count()) {
             return false;
         }
         const Picture& picture = pictures_[next_++];
-        std::copy(picture.begin(), picture.end(), sample);
+        sample = picture;
         return true;
     }
     void interrupt() override { on_interrupt(); }

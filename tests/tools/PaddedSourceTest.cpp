@@ -55,7 +55,7 @@ TEST(PaddedSource, RepeatsTheEdgesInEveryFormat) {
             EXPECT_EQ(source.traits().shown_height, height);
 
             ListSource::Picture result(padded.sample_bytes());
-            ASSERT_TRUE(source.read(result.data()));
+            ASSERT_TRUE(source.read(result));
             int wrong = 0;
             for (int y = 0; y < padded.height; ++y) {
                 for (int x = 0; x < padded.width; ++x) {
@@ -71,7 +71,7 @@ TEST(PaddedSource, RepeatsTheEdgesInEveryFormat) {
                 }
             }
             EXPECT_EQ(wrong, 0);
-            EXPECT_FALSE(source.read(result.data()));
+            EXPECT_FALSE(source.read(result));
         }
     }
 }

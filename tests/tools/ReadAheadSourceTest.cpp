@@ -31,15 +31,15 @@ TEST(ReadAheadSource, GivesWhatTheOtherSourceGivesWithItsTimes) {
     ListSource::Picture picture(kFormat.sample_bytes());
     for (int i = 0; i < kPictures; ++i) {
         EXPECT_EQ(source.frames_left(), kPictures - i);
-        ASSERT_TRUE(source.read(picture.data()));
+        ASSERT_TRUE(source.read(picture));
         EXPECT_EQ(picture,
                   ListSource::Picture(kFormat.sample_bytes(), static_cast<unsigned char>(i)));
         EXPECT_EQ(source.time().start, i * i);
         EXPECT_EQ(source.time().duration, 2 * i + 1);
         EXPECT_EQ(source.closing_remark(), std::to_string(i + 1) + " read");
     }
-    EXPECT_FALSE(source.read(picture.data()));
-    EXPECT_FALSE(source.read(picture.data()));
+    EXPECT_FALSE(source.read(picture));
+    EXPECT_FALSE(source.read(picture));
 }
 
 TEST(ReadAheadSource, ReadsNoFurtherAheadThanAsked) {
@@ -50,7 +50,7 @@ TEST(ReadAheadSource, ReadsNoFurtherAheadThanAsked) {
     EXPECT_EQ(reads, 0);
     ListSource::Picture picture(kFormat.sample_bytes());
     for (int taken = 1; taken <= 10; ++taken) {
-        ASSERT_TRUE(source.read(picture.data()));
+        ASSERT_TRUE(source.read(picture));
         std::this_thread::sleep_for(std::chrono::milliseconds(10));
         EXPECT_LE(reads, taken + 2);
         // While nobody takes anything, the next ones come.
@@ -71,15 +71,15 @@ TEST(ReadAheadSource, DeliversAFailureInItsPlace) {
     ReadAheadSource source(std::move(list), 4);
     ListSource::Picture picture(kFormat.sample_bytes());
     for (int i = 0; i < 3; ++i) {
-        ASSERT_TRUE(source.read(picture.data()));
+        ASSERT_TRUE(source.read(picture));
     }
     try {
-        source.read(picture.data());
+        source.read(picture);
         FAIL() << "no failure";
     } catch (const TruncatedInput& error) {
         EXPECT_STREQ(error.what(), "cut off at 3");
     }
-    EXPECT_FALSE(source.read(picture.data()));
+    EXPECT_FALSE(source.read(picture));
 }
 
 TEST(ReadAheadSource, EndsAReadThatWaits) {
@@ -94,7 +94,7 @@ TEST(ReadAheadSource, EndsAReadThatWaits) {
     {
         ReadAheadSource source(std::move(list), 1);
         ListSource::Picture picture(kFormat.sample_bytes());
-        ASSERT_TRUE(source.read(picture.data()));
+        ASSERT_TRUE(source.read(picture));
     }
     EXPECT_TRUE(interrupted);
     const ReadAheadSource never_read(list_of(5), 1);

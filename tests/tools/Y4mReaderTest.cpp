@@ -127,11 +127,11 @@ TEST(Y4mReader, LeavesOutTheChromaOfHalfPairsInPicturesOfOddSize) {
         }
     }
     std::vector<unsigned char> sample(kSampleBytes);
-    ASSERT_TRUE(reader.read(sample.data()));
+    ASSERT_TRUE(reader.read(sample));
     EXPECT_EQ(std::string(sample.begin(), sample.end()), expected);
-    EXPECT_TRUE(reader.read(sample.data()));
+    EXPECT_TRUE(reader.read(sample));
     EXPECT_EQ(sample[0], 2);
-    EXPECT_FALSE(reader.read(sample.data()));
+    EXPECT_FALSE(reader.read(sample));
 }
 
 // Every possible end of a stream of two pictures: a header that is cut off, whole pictures, or the
@@ -151,12 +151,12 @@ TEST(Y4mReader, ReportsACutAtEveryByte) {
         Y4mReader reader{ByteReader(file.name())};
         const std::size_t frames = (length - header.size()) / frame.size();
         for (std::size_t i = 0; i < frames; ++i) {
-            EXPECT_TRUE(reader.read(sample.data()));
+            EXPECT_TRUE(reader.read(sample));
         }
         if ((length - header.size()) % frame.size() == 0) {
-            EXPECT_FALSE(reader.read(sample.data()));
+            EXPECT_FALSE(reader.read(sample));
         } else {
-            EXPECT_THROW(reader.read(sample.data()), TruncatedInput);
+            EXPECT_THROW(reader.read(sample), TruncatedInput);
         }
     }
 }
@@ -168,7 +168,7 @@ TEST(Y4mReader, RefusesWhatIsNoFrameLine) {
         Y4mReader reader{ByteReader(file.name())};
         std::vector<unsigned char> sample(kSampleBytes);
         try {
-            reader.read(sample.data());
+            reader.read(sample);
             FAIL() << "accepted";
         } catch (const TruncatedInput&) {
             FAIL() << "taken for a cut";
@@ -183,7 +183,7 @@ TEST(Y4mReader, RefusesLinesWithoutEnd) {
     const TemporaryFile frame(kHeader + ("FRAME X" + std::string(100000, 'x')));
     Y4mReader reader{ByteReader(frame.name())};
     std::vector<unsigned char> sample(kSampleBytes);
-    EXPECT_THROW(reader.read(sample.data()), ToolError);
+    EXPECT_THROW(reader.read(sample), ToolError);
 }
 
 }  // namespace

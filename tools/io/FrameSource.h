@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "io/FrameRate.h"
 #include "io/PictureFormat.h"
@@ -52,9 +53,10 @@ public:
     // reports only.
     virtual std::optional<std::int64_t> frames_left() const = 0;
 
-    // Reads the next picture into `sample` (format().sample_bytes() long); false at the end. Throws
-    // TruncatedInput when the input ends within a picture and ToolError when it cannot be read.
-    virtual bool read(unsigned char* sample) = 0;
+    // Reads the next picture into `sample` (format().sample_bytes() long), which may become another
+    // vector of that length; false at the end. Throws TruncatedInput when the input ends within a
+    // picture and ToolError when it cannot be read.
+    virtual bool read(std::vector<unsigned char>& sample) = 0;
 
     // Ends a read that waits for input on another thread, and every later one.
     virtual void interrupt() = 0;

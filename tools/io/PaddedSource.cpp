@@ -17,12 +17,6 @@ PaddedSource::PaddedSource(std::unique_ptr<FrameSource> source)
         throw ToolError(name() + ": padded to multiples of 16, its " + error +
                         "; take --fit crop instead");
     }
-    const unsigned char* row = picture_.data();
-    for (const PictureFormat::Plane& plane : original_.planes()) {
-        planes_.push_back(
-            {row, static_cast<std::ptrdiff_t>(plane.row_bytes), plane.rows, plane.row_bytes});
-        row += plane.rows * plane.row_bytes;
-    }
 }
 
 VideoTraits PaddedSource::traits() const {
@@ -32,11 +26,18 @@ VideoTraits PaddedSource::traits() const {
     return traits;
 }
 
-bool PaddedSource::read(unsigned char* sample) {
-    if (!source().read(picture_.data())) {
+bool PaddedSource::read(std::vector<unsigned char>& sample) {
+    if (!source().read(picture_)) {
         return false;
     }
-    packer_.pack(planes_, sample);
+    std::vector<PicturePacker::Rows> planes;
+    const unsigned char* row = picture_.data();
+    for (const PictureFormat::Plane& plane : original_.planes()) {
+        planes.push_back(
+            {row, static_cast<std::ptrdiff_t>(plane.row_bytes), plane.rows, plane.row_bytes});
+        row += plane.rows * plane.row_bytes;
+    }
+    packer_.pack(planes, sample.data());
     return true;
 }
 

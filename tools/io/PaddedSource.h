@@ -16,14 +16,13 @@ public:
 
     PictureFormat format() const override { return padded_; }
     VideoTraits traits() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
 
 private:
     PictureFormat original_;
     PictureFormat padded_;
     PicturePacker packer_;
-    std::vector<unsigned char> picture_;       // as the other source gives it
-    std::vector<PicturePacker::Rows> planes_;  // its own
+    std::vector<unsigned char> picture_;  // as the other source gives it
 };
 
 }  // namespace zolt

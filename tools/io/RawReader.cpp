@@ -17,8 +17,8 @@ std::optional<std::int64_t> RawReader::frames_left() const {
     return *bytes / static_cast<std::int64_t>(format_.file_bytes());
 }
 
-bool RawReader::read(unsigned char* sample) {
-    const std::size_t got = format_.read(input_, sample);
+bool RawReader::read(std::vector<unsigned char>& sample) {
+    const std::size_t got = format_.read(input_, sample.data());
     if (got == 0) {
         return false;
     }

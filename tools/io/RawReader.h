@@ -15,7 +15,7 @@ public:
     bool states_format() const override { return false; }
     std::optional<FrameRate> frame_rate() const override { return std::nullopt; }
     std::optional<std::int64_t> frames_left() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
     void interrupt() override { input_.interrupt(); }
 
 private:

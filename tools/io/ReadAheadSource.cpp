@@ -38,7 +38,7 @@ std::optional<std::int64_t> ReadAheadSource::frames_left() const {
                    : std::nullopt;
 }
 
-bool ReadAheadSource::read(unsigned char* sample) {
+bool ReadAheadSource::read(std::vector<unsigned char>& sample) {
     if (ended_ || !take()) {
         return false;
     }
@@ -49,7 +49,7 @@ bool ReadAheadSource::read(unsigned char* sample) {
         }
         return false;
     }
-    std::copy(current_.picture.begin(), current_.picture.end(), sample);
+    sample.swap(current_.picture);
     ++frames_read_;
     return true;
 }
@@ -96,7 +96,7 @@ void ReadAheadSource::work() {
 
 void ReadAheadSource::read_into(Result& result) {
     try {
-        result.is_picture = source().read(result.picture.data());
+        result.is_picture = source().read(result.picture);
         result.time = source().time();
         result.closing_remark = source().closing_remark();
     } catch (...) {

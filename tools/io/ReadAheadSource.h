@@ -22,7 +22,7 @@ public:
     PictureTime time() const override { return current_.time; }
     std::string closing_remark() const override { return current_.closing_remark; }
     std::optional<std::int64_t> frames_left() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
 
 private:
     // What a read of the other source gave.

@@ -125,16 +125,16 @@ PictureFormat SyntheticSource::format() const {
     return {PictureFormat::kIyuv, settings_.width, settings_.height};
 }
 
-bool SyntheticSource::read(unsigned char* sample) {
+bool SyntheticSource::read(std::vector<unsigned char>& sample) {
     if (next_ == settings_.frames) {
         return false;
     }
     const Disc disc = disc_at(next_);
     const auto luma_size = static_cast<std::size_t>(settings_.width) * settings_.height;
     const auto chroma_size = static_cast<std::size_t>(settings_.width / 2) * (settings_.height / 2);
-    draw_luma(sample, disc);
-    draw_chroma(sample + luma_size, disc, 1);
-    draw_chroma(sample + luma_size + chroma_size, disc, -1);
+    draw_luma(sample.data(), disc);
+    draw_chroma(sample.data() + luma_size, disc, 1);
+    draw_chroma(sample.data() + luma_size + chroma_size, disc, -1);
     ++next_;
     return true;
 }

@@ -35,7 +35,7 @@ public:
     PictureFormat format() const override;
     std::optional<FrameRate> frame_rate() const override { return settings_.frame_rate; }
     std::optional<std::int64_t> frames_left() const override { return settings_.frames - next_; }
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
     void interrupt() override {}
 
 private:

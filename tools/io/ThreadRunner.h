@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <thread>
@@ -10,7 +11,8 @@
 namespace zolt {
 
 // Threads that wait for an encoder's pictures. One task at a time; the thread that calls Run works
-// on it, too.
+// on it, too. They stay awake for a moment after a task, since the next picture of a file comes
+// sooner than a sleeping thread wakes up, and sleep after that.
 class ThreadRunner final : public IParallelRunner {
 public:
     // Starts threads - 1 threads; threads: from 1.
@@ -23,19 +25,18 @@ public:
     void Run(IParallelTask* task, int workers) noexcept override;
 
 private:
-    void wait_for_tasks();
-    void work(std::unique_lock<std::mutex>& lock);
+    void serve();
+    void work();
 
     std::vector<std::thread> threads_;
 
-    std::mutex mutex_;                  // of what follows
-    std::condition_variable changed_;   // there are workers to call, or the runner ends
-    std::condition_variable finished_;  // the last of them has returned
-    IParallelTask* task_ = nullptr;
-    int next_ = 0;     // the worker to be called next
-    int workers_ = 0;  // of the task
-    int running_ = 0;  // called and not returned
-    bool stopping_ = false;
+    std::mutex mutex_;                  // what a sleeping thread waits for changes under it
+    std::condition_variable called_;    // there are workers to call, or the runner ends
+    std::condition_variable finished_;  // all workers have returned
+    IParallelTask* task_ = nullptr;     // written before uncalled_ rises, read by who lowers it
+    std::atomic<int> uncalled_{0};      // workers of the task that nobody has called
+    std::atomic<int> unfinished_{0};    // workers of the task that have not returned
+    std::atomic<bool> stopping_{false};
 };
 
 }  // namespace zolt

@@ -53,11 +53,11 @@ std::string Y4mReader::remark() const {
                               : "";
 }
 
-bool Y4mReader::read(unsigned char* sample) {
+bool Y4mReader::read(std::vector<unsigned char>& sample) {
     if (!read_frame_header()) {
         return false;
     }
-    const std::size_t got = format_.read(input_, sample);
+    const std::size_t got = format_.read(input_, sample.data());
     if (got < format_.file_bytes()) {
         throw TruncatedInput(name() + ": picture " + std::to_string(frames_read_) +
                              " is cut off: " + std::to_string(got) + " of its " +

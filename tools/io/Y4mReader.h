@@ -21,7 +21,7 @@ public:
     std::optional<FrameRate> frame_rate() const override { return header_.frame_rate; }
     std::optional<std::int64_t> frames_left() const override;
     std::string remark() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
     void interrupt() override { input_.interrupt(); }
 
 private:

@@ -151,7 +151,7 @@ std::optional<std::int64_t> LibavSource::frames_left() const {
     return frames > frames_read_ ? std::optional(frames - frames_read_) : std::nullopt;
 }
 
-bool LibavSource::read(unsigned char* sample) {
+bool LibavSource::read(std::vector<unsigned char>& sample) {
     if (frames_read_ == 0 && input_.side_streams() != nullptr) {
         input_.side_streams()->settle();
     }
@@ -170,7 +170,7 @@ bool LibavSource::read(unsigned char* sample) {
                       "; they are scaled to the first one's " + std::to_string(first.width) + "x" +
                       std::to_string(first.height);
     }
-    converter_->convert(*frame_, sample);
+    converter_->convert(*frame_, sample.data());
     const std::int64_t stated = frame_->best_effort_timestamp;
     time_ = clock_->next(stated == AV_NOPTS_VALUE ? std::nullopt : std::optional(stated),
                          frame_->pkt_duration);

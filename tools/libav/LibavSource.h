@@ -28,7 +28,7 @@ public:
     std::string remark() const override;
     std::string closing_remark() const override;
     std::optional<std::int64_t> frames_left() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
     void interrupt() override { input_.interrupt(); }
 
 private:

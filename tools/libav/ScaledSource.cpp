@@ -48,14 +48,14 @@ VideoTraits ScaledSource::traits() const {
     return traits;
 }
 
-bool ScaledSource::read(unsigned char* sample) {
-    if (!source().read(picture_.data())) {
+bool ScaledSource::read(std::vector<unsigned char>& sample) {
+    if (!source().read(picture_)) {
         return false;
     }
     copy_picture(picture_.data(), original_, *frame_);
     sws_scale(scaler_.get(), frame_->data, frame_->linesize, 0, original_.height, scaled_->data,
               scaled_->linesize);
-    copy_picture(*scaled_, result_, sample);
+    copy_picture(*scaled_, result_, sample.data());
     return true;
 }
 

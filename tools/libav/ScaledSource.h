@@ -16,7 +16,7 @@ public:
 
     PictureFormat format() const override { return result_; }
     VideoTraits traits() const override;
-    bool read(unsigned char* sample) override;
+    bool read(std::vector<unsigned char>& sample) override;
 
 private:
     PictureFormat original_;

@@ -7,7 +7,7 @@
 
 namespace zolt {
 
-// The kinds of devices that give video.
+// The kinds of devices that give video. Throws ToolError when their library cannot be loaded.
 std::vector<const AVInputFormat*> devices();
 
 // The kind of this name, one of those that a kind has; null when there is none.

@@ -1,7 +1,6 @@
 #include "libav/libav.h"
 
 extern "C" {
-#include <libavdevice/avdevice.h>
 #include <libavutil/log.h>
 }
 
@@ -15,7 +14,6 @@ std::string libav_error(int result) {
 
 void libav_prepare(bool verbose) {
     av_log_set_level(verbose ? AV_LOG_WARNING : AV_LOG_QUIET);
-    avdevice_register_all();
 }
 
 }  // namespace zolt

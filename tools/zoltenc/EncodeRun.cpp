@@ -169,7 +169,7 @@ void EncodeRun::check_outputs() const {
 
 void EncodeRun::skip_frames() {
     std::vector<unsigned char> picture(source_->format().sample_bytes());
-    for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture.data()); ++frame) {}
+    for (std::int64_t frame = 0; frame < options_.skip && source_->read(picture); ++frame) {}
 }
 
 void EncodeRun::choose_frame_rate() {
@@ -248,7 +248,7 @@ bool EncodeRun::read_picture(std::vector<unsigned char>& picture) {
         return false;
     }
     try {
-        return source_->read(picture.data());
+        return source_->read(picture);
     } catch (const TruncatedInput& error) {
         // A stop signal cuts off the input too.
         if (StopSignal::received() == 0) {

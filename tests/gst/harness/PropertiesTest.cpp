@@ -108,8 +108,18 @@ TEST(Properties, OutOfRangeIsRefused) {
         g_log_set_always_fatal(fatal);
         EXPECT_EQ(get_uint(element, name), good);
     }
-    ASSERT_TRUE(element.set_caps("format=I420,width=16,height=16,framerate=2147483647/1"));
-    EXPECT_EQ(element.types(0, 2), "KKK");
+}
+
+TEST(Properties, AnyFrameRateIsCoded) {
+    for (const char* const rate :
+         {"2147483647/1", "1/2147483647", "1/1", "0/1", "30000/1001", "1000/1"}) {
+        SCOPED_TRACE(rate);
+        const ElementHarness element("bitrate=4000");
+        ASSERT_TRUE(
+            element.set_caps(std::string("format=I420,width=32,height=16,framerate=") + rate));
+        EXPECT_EQ(element.types(0, 4), "KPPPP");
+        EXPECT_EQ(element.error(), "");
+    }
 }
 
 TEST(Properties, BitRateInForceOutlivesANewBeginning) {

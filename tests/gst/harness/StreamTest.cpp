@@ -203,6 +203,36 @@ TEST(Stream, GoesOnWithOtherCaps) {
     }
 }
 
+// Parameter sets go elsewhere then, so the new reader's stream begins with them.
+TEST(Stream, ReaderMayWantTheOtherFormat) {
+    const ElementHarness element("", kOnlyAvc);
+    ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
+    EXPECT_EQ(element.types(0, 2), "KPP");
+    for (const bool with_start_codes : {true, false}) {
+        gst_harness_set_sink_caps_str(
+            element.harness(),
+            with_start_codes ? "video/x-h264,stream-format=byte-stream" : kOnlyAvc);
+        gst_harness_push_upstream_event(element.harness(), gst_event_new_reconfigure());
+        ASSERT_EQ(element.push(3), GST_FLOW_OK);
+        EXPECT_EQ(element.output_field("stream-format"), with_start_codes ? "byte-stream" : "avc");
+        EXPECT_EQ(element.output_field("codec_data").empty(), with_start_codes);
+        const std::vector<Output> outputs = element.take();
+        ASSERT_EQ(outputs.size(), 1u);
+        EXPECT_TRUE(outputs[0].is_key);
+        EXPECT_EQ(units_of(outputs[0].bytes, with_start_codes).size(), with_start_codes ? 3u : 1u);
+        EXPECT_EQ(element.types(4, 5), "PP");
+    }
+}
+
+// A reader that is looked at anew and wants the same gets the stream that it had.
+TEST(Stream, GoesOnForTheSameReader) {
+    const ElementHarness element("", kOnlyAvc);
+    ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
+    EXPECT_EQ(element.types(0, 2), "KPP");
+    gst_harness_push_upstream_event(element.harness(), gst_event_new_reconfigure());
+    EXPECT_EQ(element.types(3, 5), "PPP");
+}
+
 TEST(Stream, EndsWithItsLastPicture) {
     const ElementHarness element;
     ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
