@@ -37,14 +37,21 @@ H264Element& impl_of(gpointer object) {
     return *static_cast<GstZoltH264Enc*>(object)->impl;
 }
 
+// What kind of element error a failure becomes.
+struct ErrorKind {
+    GQuark domain;
+    gint code;
+};
+
 // Does something of an element; what fails becomes an element error with its text, and `failure` is
 // returned.
 template <class Result, class Action>
-Result guarded(GstVideoEncoder* encoder, Result failure, Action action) {
+Result guarded(GstVideoEncoder* encoder, Result failure, const ErrorKind& kind, Action action) {
     try {
         return action(impl_of(encoder));
     } catch (const std::exception& error) {
-        GST_ELEMENT_ERROR(encoder, LIBRARY, ENCODE, ("%s", error.what()), (nullptr));
+        gst_element_message_full(GST_ELEMENT(encoder), GST_MESSAGE_ERROR, kind.domain, kind.code,
+                                 g_strdup(error.what()), nullptr, __FILE__, GST_FUNCTION, __LINE__);
         return failure;
     }
 }
@@ -130,16 +137,17 @@ void finalize(GObject* object) {
 }
 
 // An operation that succeeds unless it throws.
-template <void (H264Element::*operation)()>
+template <void (H264Element::*operation)(), gint error_code = GST_LIBRARY_ERROR_ENCODE>
 gboolean call(GstVideoEncoder* encoder) {
-    return guarded(encoder, gboolean{FALSE}, [](H264Element& impl) {
-        (impl.*operation)();
-        return gboolean{TRUE};
-    });
+    return guarded(encoder, gboolean{FALSE}, {GST_LIBRARY_ERROR, error_code},
+                   [](H264Element& impl) {
+                       (impl.*operation)();
+                       return gboolean{TRUE};
+                   });
 }
 
 gboolean set_format(GstVideoEncoder* encoder, GstVideoCodecState* state) {
-    return guarded(encoder, gboolean{FALSE},
+    return guarded(encoder, gboolean{FALSE}, {GST_STREAM_ERROR, GST_STREAM_ERROR_FORMAT},
                    [state](H264Element& impl) { return gboolean{impl.set_format(state)}; });
 }
 
@@ -149,7 +157,7 @@ gboolean negotiate(GstVideoEncoder* encoder) {
 }
 
 GstFlowReturn handle_frame(GstVideoEncoder* encoder, GstVideoCodecFrame* frame) {
-    return guarded(encoder, GST_FLOW_ERROR,
+    return guarded(encoder, GST_FLOW_ERROR, {GST_LIBRARY_ERROR, GST_LIBRARY_ERROR_ENCODE},
                    [frame](H264Element& impl) { return impl.handle_frame(frame); });
 }
 
@@ -225,7 +233,7 @@ static void gst_zolt_h264_enc_class_init(GstZoltH264EncClass* klass) {
     gst_type_mark_as_plugin_api(fit_type(), static_cast<GstPluginAPIFlags>(0));
 
     GstVideoEncoderClass* const encoder_class = GST_VIDEO_ENCODER_CLASS(klass);
-    encoder_class->open = call<&H264Element::open>;
+    encoder_class->open = call<&H264Element::open, GST_LIBRARY_ERROR_INIT>;
     encoder_class->close = call<&H264Element::close>;
     encoder_class->start = call<&H264Element::start>;
     encoder_class->stop = call<&H264Element::stop>;

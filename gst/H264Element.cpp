@@ -107,6 +107,7 @@ bool H264Element::set_format(GstVideoCodecState* input) {
     coded_before_ = tally().microseconds;
     input_.reset(gst_video_codec_state_ref(input));
     announced_kbs_ = wanted.bit_rate_kbs;
+    stream_format_ = choose_stream_format();
     gst_video_encoder_set_latency(element_, 0, 0);
     set_source_caps();
     if (gst_video_encoder_negotiate(element_) == FALSE) {
