@@ -15,7 +15,8 @@ constexpr double thresh_16[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
 // it does in double precision when everything is multiplied by four times the count.
 constexpr int kQuarterSteps = 10;
 
-// The same for the chroma mode search.
+// The same for the chroma mode search. These are fifths, which doubles do not hold: where a cost
+// times five times the count equals the sum times five times the factor, rounding decides.
 constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
                                       1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0};
 
@@ -194,6 +195,12 @@ public:
 
     double mean_cost() const { return static_cast<double>(sum()) / number(); }
 
+    // Whether a candidate's cost passes the test, or one's that was dropped.
+    template <typename Test>
+    bool any(Test test) const {
+        return test(m_cost[0]) | test(m_cost[1]) | test(m_cost[2]) | test(m_cost[3]);
+    }
+
     template <typename Test>
     void drop(Test is_too_high) {
         for (int mode = 0; mode < kModes; ++mode) {
@@ -288,14 +295,24 @@ int MacroblockCoder::learn_chroma_mode() {
     g_kernels->intra_chroma_modes(g_mb_src_u, g_mb_src_v, picture.g_stride_chroma, g_mb_up != 0,
                                   g_mb_left != 0, g_intra_pred_chroma[0], distortion[0]);
     Candidates candidates({true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left});
-    for (int step = 0; step <= kLastStep; ++step) {
+    const auto add = [&](int step) {
         distortion[step][0] -= g_intra_lambda;
         candidates.add(distortion[step]);
-        if (step < 3 || step % 2 == 0) {
-            continue;
+    };
+    add(0);
+    add(1);
+    for (int step = 3; step <= kLastStep; step += 2) {
+        add(step - 1);
+        add(step);
+        // A cost exceeds an integer limit when it exceeds the real one that was rounded down.
+        const int number = 5 * candidates.number();
+        const int product = static_cast<int>(5 * thresh_chroma[step]) * candidates.sum();
+        if (product >= 0 && !candidates.any([=](int cost) { return number * cost == product; })) {
+            candidates.drop([=](int cost) { return number * cost > product; });
+        } else {
+            const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
+            candidates.drop([limit](int cost) { return cost > limit; });
         }
-        const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
-        candidates.drop([limit](int cost) { return cost > limit; });
         // A single one wins, whether it would be dropped later or not.
         if (candidates.number() < 2) {
             break;

@@ -74,25 +74,25 @@ public:
     explicit Avx2Search(const Intra4x4& mb)
         : m_rule(mb), m_rates(_mm256_broadcastsi128_si256(m_rule.rates)) {}
 
+    template <int kBlocks>
     void run(const SearchInput* in, SearchResult* out) const {
         Samples samples[2];
         __m128i predicted[2], costs[2];
         // Slot n of the candidates in the low half of pair n, slot n + 4 in the high one; behind
         // them the predicted mode.
         alignas(32) std::uint8_t preds[2][10 * 16];
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             samples[i] = samples_of(in[i]);
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             const __m128i pred = predicted_mode(samples[i], in[i].predicted);
             store_16(preds[i] + 8 * 16, pred);
             predicted[i] = predicted_distortion(pred, *in[i].source);
         }
-        for (int i = 0; i < 2; ++i) {
-            costs[i] =
-                candidate_costs(samples[i], in[i], m_rule.limits(predicted[i]), preds[i]);
+        for (int i = 0; i < kBlocks; ++i) {
+            costs[i] = candidate_costs(samples[i], in[i], m_rule.limits(predicted[i]), preds[i]);
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             out[i] = choose(in[i], predicted[i], costs[i], preds[i]);
         }
     }
@@ -129,8 +129,8 @@ private:
         const int cost = static_cast<int>(best & 0xffff);
         const int slot = static_cast<int>(best >> 16);
         const int reference = _mm_cvtsi128_si32(predicted_cost) & 0xffff;
-        const int other = static_cast<int>(reference > m_rule.kept) &
-                          static_cast<int>(cost < (reference & ~3));
+        const int other =
+            static_cast<int>(reference > m_rule.kept) & static_cast<int>(cost < (reference & ~3));
         const int at = one_of(other, 2 * (slot & 3) + (slot >> 2), 8);
         return {one_of(other, slot_mode(in.predicted, slot), in.predicted),
                 _mm_shuffle_epi8(load_16(preds + 16 * at), load_16(kButterflyFromPhases.at))};

@@ -78,23 +78,24 @@ public:
           m_rates(_mm512_broadcastq_epi64(m_rule.rates)),
           m_kept(_mm_cvtsi32_si128(mb.kept)) {}
 
+    template <int kBlocks>
     void run(const SearchInput* in, SearchResult* out) const {
         __m512i table[2];
         Predictions preds[2];
         __m128i predicted_cost[2], costs[2];
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             table[i] = sample_table(in[i]);
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             preds[i] = predict(table[i], in[i].predicted);
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             predicted_cost[i] = predicted_distortion(preds[i].predicted, *in[i].source);
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             costs[i] = candidate_costs(preds[i], in[i], m_rule.limits(predicted_cost[i]));
         }
-        for (int i = 0; i < 2; ++i) {
+        for (int i = 0; i < kBlocks; ++i) {
             out[i] = choose(preds[i], in[i].predicted, predicted_cost[i], costs[i]);
         }
     }
@@ -116,8 +117,7 @@ private:
     }
 
     // The costs of the slots, not below kNoCost where they are dropped or not possible.
-    __m128i candidate_costs(const Predictions& preds, const SearchInput& in,
-                            __m128i limits) const {
+    __m128i candidate_costs(const Predictions& preds, const SearchInput& in, __m128i limits) const {
         const __m512i costs = running_costs(preds.left, preds.right, *in.source);
         const __m512i over = _mm512_subs_epu16(costs, _mm512_broadcastq_epi64(limits));
         const __mmask8 kept = _mm512_testn_epi64_mask(over, over);
@@ -136,11 +136,11 @@ private:
         const __m128i slot = _mm_shuffle_epi8(best, _mm_set1_epi8(2));
         const __m128i selection =
             _mm_add_epi8(_mm_slli_epi16(slot, 3), load_16(kButterflyFromCandidates.at));
-        const __m128i chosen = _mm512_castsi512_si128(_mm512_permutex2var_epi8(
-            preds.left, _mm512_castsi128_si512(selection), preds.right));
-        const __m128i pred = _mm_blendv_epi8(
-            _mm_shuffle_epi8(preds.predicted, load_16(kButterflyFromPhases.at)), chosen,
-            _mm_broadcastw_epi16(other));
+        const __m128i chosen = _mm512_castsi512_si128(
+            _mm512_permutex2var_epi8(preds.left, _mm512_castsi128_si512(selection), preds.right));
+        const __m128i pred =
+            _mm_blendv_epi8(_mm_shuffle_epi8(preds.predicted, load_16(kButterflyFromPhases.at)),
+                            chosen, _mm_broadcastw_epi16(other));
         const int mode = slot_mode(predicted, _mm_extract_epi16(best, 1));
         return {one_of(_mm_cvtsi128_si32(other) & 1, mode, predicted), pred};
     }

@@ -161,7 +161,7 @@ inline void prepare_blocks(const std::uint8_t* src, std::ptrdiff_t stride, Sourc
 // What a mode search knows of its block.
 struct SearchInput {
     __m128i neighbours;  // as gathered() tells
-    bool up_right;       // E..H are there; otherwise D stands in
+    int up_right;        // 1: E..H are there; otherwise D stands in
     int available;       // 2 * up + left
     int predicted;       // mode
     const SourceBlock* source;
@@ -313,8 +313,7 @@ private:
             _mm256_add_epi32(_mm256_unpacklo_epi16(low, high), m_rounding), m_shift);
         const __m256i second = _mm256_srl_epi32(
             _mm256_add_epi32(_mm256_unpackhi_epi16(low, high), m_rounding), m_shift);
-        return _mm256_sign_epi16(_mm256_min_epi16(_mm256_packs_epi32(first, second), m_largest),
-                                 c);
+        return _mm256_sign_epi16(_mm256_min_epi16(_mm256_packs_epi32(first, second), m_largest), c);
     }
 
     static std::uint32_t store_levels(__m256i levels_01, __m256i levels_23,
@@ -328,8 +327,7 @@ private:
         }
         const __m256i bytes =
             join(_mm_packs_epi16(low[0], high[0]), _mm_packs_epi16(low[1], high[1]));
-        const int zeros =
-            _mm256_movemask_epi8(_mm256_cmpeq_epi8(bytes, _mm256_setzero_si256()));
+        const int zeros = _mm256_movemask_epi8(_mm256_cmpeq_epi8(bytes, _mm256_setzero_si256()));
         return ~static_cast<std::uint32_t>(zeros);
     }
 
@@ -337,8 +335,7 @@ private:
     // and 32.
     static bool may_exceed_16_bits(__m256i first, __m256i last) {
         constexpr short kLargestPair = (32767 - 32) / 8;
-        const __m256i pairs =
-            _mm256_adds_epi16(_mm256_abs_epi16(first), _mm256_abs_epi16(last));
+        const __m256i pairs = _mm256_adds_epi16(_mm256_abs_epi16(first), _mm256_abs_epi16(last));
         return _mm256_movemask_epi8(_mm256_cmpgt_epi16(pairs, _mm256_set1_epi16(kLargestPair))) !=
                0;
     }
@@ -362,18 +359,45 @@ private:
     __m128i m_shift;
 };
 
-// Places of blocks in the order of coding: two at a time that do not depend on each other, and one
-// twice where there is no such pair.
+// The blocks in the order of coding: two, then six pairs of which neither depends on the other,
+// then two.
 struct BlockPlace {
     std::uint8_t x, y;      // in blocks
     std::uint8_t k;         // index in decoding order
     std::uint8_t up_right;  // E..H are there: 0 never, 1 where the macroblocks above are, 2 always
 };
-constexpr BlockPlace kPlaces[10][2] = {
-    {{0, 0, 0, 1}, {0, 0, 0, 1}},   {{1, 0, 1, 1}, {1, 0, 1, 1}},   {{2, 0, 4, 1}, {0, 1, 2, 2}},
-    {{3, 0, 5, 1}, {1, 1, 3, 0}},   {{2, 1, 6, 2}, {0, 2, 8, 2}},   {{3, 1, 7, 0}, {1, 2, 9, 2}},
-    {{2, 2, 12, 2}, {0, 3, 10, 2}}, {{3, 2, 13, 0}, {1, 3, 11, 0}}, {{2, 3, 14, 2}, {2, 3, 14, 2}},
-    {{3, 3, 15, 0}, {3, 3, 15, 0}}};
+constexpr BlockPlace kPlaces[16] = {{0, 0, 0, 1},  {1, 0, 1, 1},   //
+                                    {2, 0, 4, 1},  {0, 1, 2, 2},   //
+                                    {3, 0, 5, 1},  {1, 1, 3, 0},   //
+                                    {2, 1, 6, 2},  {0, 2, 8, 2},   //
+                                    {3, 1, 7, 0},  {1, 2, 9, 2},   //
+                                    {2, 2, 12, 2}, {0, 3, 10, 2},  //
+                                    {3, 2, 13, 0}, {1, 3, 11, 0},  //
+                                    {2, 3, 14, 2}, {3, 3, 15, 0}};
+
+// What a block has around it, by the macroblocks that are there: up + 2 * left + 4 * up right.
+struct BlockNeighbours {
+    std::uint8_t available[16];  // 2 * up + left
+    std::uint8_t up_right[16];   // 1: E..H are there
+};
+struct MacroblockNeighbours {
+    BlockNeighbours of[8];
+};
+constexpr MacroblockNeighbours macroblock_neighbours() {
+    MacroblockNeighbours table{};
+    for (int there = 0; there < 8; ++there) {
+        for (int n = 0; n < 16; ++n) {
+            const BlockPlace& place = kPlaces[n];
+            const bool up = place.y > 0 || (there & 1) != 0;
+            const bool left = place.x > 0 || (there & 2) != 0;
+            const bool above_right = place.k == 5 ? (there & 4) != 0 : up;
+            table.of[there].available[n] = static_cast<std::uint8_t>(2 * up + left);
+            table.of[there].up_right[n] = place.up_right + above_right > 1 ? 1 : 0;
+        }
+    }
+    return table;
+}
+constexpr MacroblockNeighbours kMacroblockNeighbours = macroblock_neighbours();
 
 inline __m128i load_4(const void* p) {
     std::int32_t value;
@@ -389,78 +413,98 @@ template <typename Search>
 class MacroblockBlocks {
 public:
     explicit MacroblockBlocks(const Intra4x4& mb)
-        : m_mb(mb), m_search(mb), m_coder(*mb.quantizer) {
+        : m_stride(mb.stride),
+          m_modes_stride(mb.modes_stride),
+          m_search(mb),
+          m_coder(*mb.quantizer) {
         for (int y = 0; y < 4; ++y) {
             const std::uint8_t* row = mb.samples + 4 * y * mb.stride;
-            prepare_blocks(row, mb.stride, m_blocks + 4 * y);
-            m_left_columns[y] = static_cast<std::uint32_t>(row[3 * mb.stride - 1] |
-                                                           row[2 * mb.stride - 1] << 8 |
-                                                           row[mb.stride - 1] << 16) |
-                                static_cast<std::uint32_t>(row[-1]) << 24;
+            prepare_blocks(row, mb.stride, m_sources + 4 * y);
+            m_left_columns[y] =
+                static_cast<std::uint32_t>(row[3 * mb.stride - 1] | row[2 * mb.stride - 1] << 8 |
+                                           row[mb.stride - 1] << 16) |
+                static_cast<std::uint32_t>(row[-1]) << 24;
+        }
+        const BlockNeighbours& neighbours =
+            kMacroblockNeighbours.of[mb.up + 2 * mb.left + 4 * mb.up_right];
+        for (int n = 0; n < 16; ++n) {
+            const BlockPlace& place = kPlaces[n];
+            m_blocks[n] = {mb.samples + 4 * place.y * mb.stride + 4 * place.x,
+                           mb.modes + place.y * mb.modes_stride + place.x,
+                           &m_sources[4 * place.y + place.x],
+                           &m_left_columns[place.y],
+                           mb.scan + 16 * place.k,
+                           place.k,
+                           neighbours.available[n],
+                           neighbours.up_right[n]};
         }
     }
 
-    // Codes two blocks; returns the mask of those with levels.
-    std::uint32_t code(const BlockPlace* places) {
-        const SearchInput inputs[2] = {gather(places[0]), gather(places[1])};
+    // Codes kBlocks blocks, 1 or 2, of the order of coding from n.
+    template <int kBlocks>
+    [[gnu::always_inline]] void code(const Intra4x4& mb, int n) {
+        const Block* const blocks = m_blocks + n;
+        SearchInput inputs[2];
         SearchResult results[2];
-        m_search.run(inputs, results);
-        std::int16_t* const scan[2] = {m_mb.scan + 16 * places[0].k, m_mb.scan + 16 * places[1].k};
+        for (int i = 0; i < kBlocks; ++i) {
+            inputs[i] = gather(blocks[i]);
+        }
+        m_search.template run<kBlocks>(inputs, results);
+        constexpr int kSecond = kBlocks - 1;
+        std::int16_t* const scan[2] = {blocks[0].scan, blocks[kSecond].scan};
         const CodedBlocks coded = m_coder.code(
-            join(load_16(inputs[0].source->samples), load_16(inputs[1].source->samples)),
-            join(results[0].pred, results[1].pred), scan);
-        return store(places[0], inputs[0], results[0], low_lane(coded.samples),
-                     coded.nonzero & 0xffff) |
-               store(places[1], inputs[1], results[1], high_lane(coded.samples),
-                     coded.nonzero >> 16);
+            join(load_16(inputs[0].source->samples), load_16(inputs[kSecond].source->samples)),
+            join(results[0].pred, results[kSecond].pred), scan);
+        store(mb, blocks[0], inputs[0].predicted, results[0].mode, low_lane(coded.samples),
+              coded.nonzero);
+        if (kBlocks == 2) {
+            store(mb, blocks[1], inputs[1].predicted, results[1].mode, high_lane(coded.samples),
+                  coded.nonzero >> 16);
+        }
     }
 
 private:
-    std::int8_t* mode_at(const BlockPlace& place) const {
-        return m_mb.modes + place.y * m_mb.modes_stride + place.x;
-    }
+    struct Block {
+        std::uint8_t* samples;
+        std::int8_t* mode;
+        const SourceBlock* source;
+        std::uint32_t* left_column;
+        std::int16_t* scan;
+        std::uint32_t k;
+        std::uint8_t available, up_right;
+    };
 
-    std::uint8_t* samples_at(const BlockPlace& place) const {
-        return m_mb.samples + 4 * place.y * m_mb.stride + 4 * place.x;
-    }
-
-    SearchInput gather(const BlockPlace& place) const {
-        const std::uint8_t* above = samples_at(place) - m_mb.stride;
+    SearchInput gather(const Block& block) const {
+        const std::uint8_t* above = block.samples - m_stride;
         const __m128i row_above = _mm_unpacklo_epi32(load_4(above), load_4(above + 4));
-        const __m128i others = _mm_insert_epi8(load_4(m_left_columns + place.y), above[-1], 4);
-        const bool up = place.y > 0 || m_mb.up;
-        const bool left = place.x > 0 || m_mb.left;
-        const bool last = place.x == 3 && place.y == 0;
-        const bool up_right = place.up_right + (last ? m_mb.up_right : up) > 1;
-        const std::int8_t* mode = mode_at(place);
-        const int mode_above = mode[-m_mb.modes_stride], mode_left = mode[-1];
+        const __m128i others = _mm_insert_epi8(load_4(block.left_column), above[-1], 4);
+        const int mode_above = block.mode[-m_modes_stride], mode_left = block.mode[-1];
         const int smaller = mode_above < mode_left ? mode_above : mode_left;
-        return {_mm_unpacklo_epi64(row_above, others), up_right, 2 * up + left,
-                smaller >= 0 ? smaller : 2, &m_blocks[4 * place.y + place.x]};
+        return {_mm_unpacklo_epi64(row_above, others), block.up_right, block.available,
+                smaller >= 0 ? smaller : 2, block.source};
     }
 
-    // Writes the results of a block; returns its bit in the mask of those with levels.
-    std::uint32_t store(const BlockPlace& place, const SearchInput& input,
-                        const SearchResult& result, __m128i samples, std::uint32_t nonzero) {
-        *mode_at(place) = static_cast<std::int8_t>(result.mode);
-        m_mb.predicted[place.k] = static_cast<std::uint8_t>(input.predicted);
-        m_mb.chosen[place.k] = static_cast<std::uint8_t>(result.mode);
-        m_mb.nonzero[place.k] = static_cast<std::uint16_t>(nonzero);
+    void store(const Intra4x4& mb, const Block& block, int predicted, int mode, __m128i samples,
+               std::uint32_t nonzero) const {
+        *block.mode = static_cast<std::int8_t>(mode);
+        mb.predicted[block.k] = static_cast<std::uint8_t>(predicted);
+        mb.chosen[block.k] = static_cast<std::uint8_t>(mode);
+        mb.nonzero[block.k] = static_cast<std::uint16_t>(nonzero);
         const __m128i right_column = _mm_shuffle_epi8(
             samples, _mm_setr_epi8(15, 11, 7, 3, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1, -1));
-        m_left_columns[place.y] = static_cast<std::uint32_t>(_mm_cvtsi128_si32(right_column));
-        std::uint8_t* p = samples_at(place);
+        store_4(block.left_column, _mm_cvtsi128_si32(right_column));
+        std::uint8_t* p = block.samples;
         store_4(p, _mm_extract_epi32(samples, 0));
-        store_4(p + m_mb.stride, _mm_extract_epi32(samples, 1));
-        store_4(p + 2 * m_mb.stride, _mm_extract_epi32(samples, 2));
-        store_4(p + 3 * m_mb.stride, _mm_extract_epi32(samples, 3));
-        return (nonzero != 0 ? 1u : 0u) << place.k;
+        store_4(p + m_stride, _mm_extract_epi32(samples, 1));
+        store_4(p + 2 * m_stride, _mm_extract_epi32(samples, 2));
+        store_4(p + 3 * m_stride, _mm_extract_epi32(samples, 3));
     }
 
-    const Intra4x4 m_mb;  // a copy, whose fields need not be read again after every store
+    const std::ptrdiff_t m_stride, m_modes_stride;
     const Search m_search;
     const BlockCoder m_coder;
-    SourceBlock m_blocks[16];         // raster order
+    Block m_blocks[16];               // order of coding
+    SourceBlock m_sources[16];        // raster order
     std::uint32_t m_left_columns[4];  // samples left of the next block in each row of blocks
 };
 
@@ -468,9 +512,18 @@ private:
 template <typename Search>
 [[gnu::always_inline]] inline std::uint32_t code_intra_4x4_with(const Intra4x4& mb) {
     MacroblockBlocks<Search> blocks(mb);
+    for (int n = 0; n < 2; ++n) {
+        blocks.template code<1>(mb, n);
+    }
+    for (int n = 2; n < 14; n += 2) {
+        blocks.template code<2>(mb, n);
+    }
+    for (int n = 14; n < 16; ++n) {
+        blocks.template code<1>(mb, n);
+    }
     std::uint32_t coded = 0;
-    for (const auto& places : kPlaces) {
-        coded |= blocks.code(places);
+    for (int k = 0; k < 16; ++k) {
+        coded |= (mb.nonzero[k] != 0 ? 1u : 0u) << k;
     }
     return coded;
 }

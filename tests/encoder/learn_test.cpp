@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 #include <cstdlib>
 #include <vector>
 
@@ -122,6 +123,98 @@ TEST_F(LearnedTree, InterOrIntra) {
                     << "QP " << qp << ", x " << x << ", y " << y;
             }
         }
+    }
+}
+
+// Distortions that stand-ins for the mode kernels give, by phase and mode.
+std::int32_t stand_in_distortions[16][4];
+
+void stand_in_16x16(const std::uint8_t*, std::ptrdiff_t, bool, bool, std::uint8_t*,
+                    std::int32_t* distortion) {
+    std::copy(stand_in_distortions[0], stand_in_distortions[0] + 64, distortion);
+}
+void stand_in_chroma(const std::uint8_t*, const std::uint8_t*, std::ptrdiff_t, bool, bool,
+                     std::uint8_t*, std::int32_t* distortion) {
+    std::copy(stand_in_distortions[0], stand_in_distortions[0] + 48, distortion);
+}
+
+// The eliminations as they are described, in double precision. drops(cost, mean, step) tells which
+// candidates go after a step, decides(step) after which steps any do.
+template <typename Decides, typename Drops>
+int plain_elimination(std::array<bool, 4> enabled, int rate, int last, unsigned fewest,
+                      Decides decides, Drops drops) {
+    int cost[4] = {}, best = -1;
+    for (int step = 0; step <= last; ++step) {
+        for (int mode = 0; mode < 4; ++mode) {
+            cost[mode] += enabled[mode] ? stand_in_distortions[step][mode] : 0;
+        }
+        cost[0] -= enabled[0] ? rate : 0;
+        if (!decides(step)) {
+            continue;
+        }
+        int sum = 0, count = 0;
+        best = -1;
+        for (int mode = 0; mode < 4; ++mode) {
+            if (enabled[mode]) {
+                sum += cost[mode];
+                ++count;
+                best = best < 0 || cost[mode] < cost[best] ? mode : best;
+            }
+        }
+        const double mean = static_cast<double>(sum) / count;
+        unsigned left = 0;
+        for (int mode = 0; mode < 4; ++mode) {
+            enabled[mode] = enabled[mode] && !drops(cost[mode], mean, step);
+            left += enabled[mode];
+        }
+        if (left < fewest) {
+            break;
+        }
+    }
+    return best;
+}
+
+int plain_16x16_mode(bool up, bool left) {
+    constexpr double kFactors[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
+                                     1.0,  1.0,  1.1, 1.1,  1.0, 1.0, 0.0, 0.0};
+    return plain_elimination(
+        {up, left, true, up && left}, 0, 15, 2, [](int) { return true; },
+        [&](int cost, double mean, int step) { return cost >= mean * kFactors[step]; });
+}
+
+int plain_chroma_mode(bool up, bool left, int rate) {
+    constexpr double kFactors[12] = {0, 0, 0, 2.0, 0, 1.6, 0, 1.2, 0, 1.0, 0, 1.0};
+    return plain_elimination(
+        {true, left, up, up && left}, rate, 11, 1,
+        [](int step) { return step >= 3 && step % 2 == 1; },
+        [&](int cost, double mean, int step) {
+            return cost > static_cast<int>(kFactors[step] * mean);
+        });
+}
+
+// Costs that are close to each other, so that they meet their limits exactly again and again.
+TEST(ModeElimination, EqualsTheDescriptionInDoublePrecision) {
+    zolt::Kernels kernels = zolt::scalar_kernels();
+    kernels.intra_16x16_modes = stand_in_16x16;
+    kernels.intra_chroma_modes = stand_in_chroma;
+    Picture picture(16, 16, kernels);
+    MacroblockCoder coder(picture);
+    zolt_test::Random random(5);
+    for (int iteration = 0; iteration < 400000; ++iteration) {
+        const int base = 1 << random.between(0, 8);
+        const int unit = random.between(1, 12);
+        for (auto& phase : stand_in_distortions) {
+            for (std::int32_t& d : phase) {
+                d = unit * random.between(base / 2, base + base / 4);
+            }
+        }
+        coder.g_mb_up = random.between(0, 3) > 0;
+        coder.g_mb_left = random.between(0, 3) > 0;
+        coder.g_intra_lambda = random.between(1, 91);
+        const bool up = coder.g_mb_up != 0, left = coder.g_mb_left != 0;
+        ASSERT_EQ(coder.learn16_mode(), plain_16x16_mode(up, left)) << "iteration " << iteration;
+        ASSERT_EQ(coder.learn_chroma_mode(), plain_chroma_mode(up, left, coder.g_intra_lambda))
+            << "iteration " << iteration;
     }
 }
 
