@@ -91,7 +91,7 @@ void code(const char* input, const char* output_name, zolt_test::Settings settin
     std::vector<std::uint8_t> picture(format.sample_bytes());
     Counts all, inter_pictures;
     int pictures = 0;
-    for (; reader.read(picture.data()); ++pictures) {
+    for (; reader.read(picture); ++pictures) {
         write_unit(output, encoding.encode(picture.data()));
         all.add(encoding.engine().picture);
         if (encoding.engine().g_pic_type == P_SLICE) {
