@@ -4,7 +4,6 @@
 #include "encoder/MacroblockCoder.h"
 #include "encoder/bitops.h"
 #include "encoder/tables.h"
-#include "kernels/zigzag.h"
 
 namespace {
 
