@@ -218,6 +218,31 @@ TEST(ModeElimination, EqualsTheDescriptionInDoublePrecision) {
     }
 }
 
+// Three chroma candidates of which the third's cost is 1.2 times the mean after step 7: in double
+// precision the limit is then that cost or, where the product is rounded down below it, one less.
+TEST(ModeElimination, RoundsTheChromaLimitInDoublePrecision) {
+    zolt::Kernels kernels = zolt::scalar_kernels();
+    kernels.intra_chroma_modes = stand_in_chroma;
+    Picture picture(16, 16, kernels);
+    MacroblockCoder coder(picture);
+    coder.g_mb_up = coder.g_mb_left = 1;
+    coder.g_intra_lambda = 0;
+    int dropped = 0;
+    for (int sum = 10; sum < 2000; sum += 10) {
+        for (auto& phase : stand_in_distortions) {
+            std::fill(phase, phase + 4, 0);
+        }
+        stand_in_distortions[0][3] = 100;  // dropped after step 3
+        stand_in_distortions[7][0] = stand_in_distortions[7][1] = sum * 3 / 10;
+        stand_in_distortions[7][2] = sum * 4 / 10;
+        stand_in_distortions[8][0] = stand_in_distortions[8][1] = sum;
+        const int mode = coder.learn_chroma_mode();
+        ASSERT_EQ(mode, plain_chroma_mode(true, true, 0)) << "sum " << sum;
+        dropped += mode != 2;
+    }
+    EXPECT_GT(dropped, 0) << "no limit was rounded down";
+}
+
 class ModeSearch : public testing::Test {
 protected:
     // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) around it.
