@@ -1,6 +1,7 @@
 """Pipelines to decoders, to the network and to several encoders at once. Streams are those of zoltenc
 for the same pictures and settings."""
 
+import os
 import pathlib
 import re
 import signal
@@ -12,6 +13,7 @@ import unittest
 from gst_runner import ENVIRONMENT, PipelineTest, encoder, file, y4m
 
 PAGE = pathlib.Path(__file__).parents[3] / "docs" / "gstreamer.md"
+PIPELINES_TEST = os.environ["PIPELINES_TEST"]
 BYTE_STREAM = "video/x-h264,stream-format=byte-stream"
 AVC = "video/x-h264,stream-format=avc"
 
@@ -178,19 +180,27 @@ class Documentation(PipelineTest):
 class Leaks(PipelineTest):
     elements = ("videotestsrc", "h264parse", "mp4mux")
 
+    # The tracer announces what it may write, then writes a line for every leak.
+    tracer = {"GST_TRACERS": "leaks", "GST_DEBUG": "GST_TRACER:7"}
+
+    def assert_no_leaks(self, messages):
+        self.assertIn("object-alive.class", messages)
+        self.assertEqual(re.findall(r"object-alive, type-name=\(string\)[^%].*", messages), [])
+
     def test_the_leaks_tracer_finds_nothing(self):
         for source, rest in (
             ("format=I420,width=320,height=240", f"{AVC} ! mp4mux ! fakesink"),
             ("format=BGRA,width=314,height=230", f"{BYTE_STREAM} ! h264parse ! fakesink"),
         ):
             with self.subTest(source=source):
-                errors = self.finish(self.start(
+                self.assert_no_leaks(self.finish(self.start(
                     f"videotestsrc num-buffers=40 ! video/x-raw,{source},framerate=30/1 !",
-                    encoder("key-int-max=10"), "!", rest,
-                    GST_TRACERS="leaks", GST_DEBUG="GST_TRACER:7"))
-                # The tracer announces what it may write, then writes a line for every leak.
-                self.assertIn("object-alive.class", errors)
-                self.assertEqual(re.findall(r"object-alive, type-name=\(string\)[^%].*", errors), [])
+                    encoder("key-int-max=10"), "!", rest, **self.tracer)))
+
+    def test_nothing_is_left_of_a_pipeline_that_changed(self):
+        result = subprocess.run([PIPELINES_TEST, "--gtest_filter=*Renegotiation*"], check=True,
+                                capture_output=True, text=True, env={**ENVIRONMENT, **self.tracer})
+        self.assert_no_leaks(result.stderr)
 
 
 if __name__ == "__main__":
