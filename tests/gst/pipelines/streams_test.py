@@ -27,7 +27,8 @@ class Inspect(PipelineTest):
         properties = re.findall(r"^  ([a-z-]+) *: ", result.stdout, re.M)
         for name in ("bitrate", "fit", "key-int-max", "plugin-path", "stats", "threads"):
             self.assertIn(name, properties)
-        for caps in ("profile: main", "alignment: au", "stream-format: { (string)avc, (string)byte-stream }",
+        for caps in ("profile: main", "alignment: au",
+                     "stream-format: { (string)avc, (string)byte-stream }",
                      *(f"(string){name}" for name in FORMATS)):
             self.assertIn(caps, result.stdout)
 
@@ -36,8 +37,8 @@ class Decoders(PipelineTest):
     elements = ("y4mdec", "h264parse", "avdec_h264", "openh264dec")
 
     def test_decoders_agree_and_the_stream_is_that_of_zoltenc(self):
-        # Without decoding, an encoder's reconstruction is not to be seen: that of the engine equals what
-        # ffmpeg decodes, and so do the outputs of both decoders.
+        # The element does not show its reconstruction. The engine's equals what ffmpeg decodes, as its
+        # own tests say, and so does what each decoder gives here.
         frames = 60
         for width, height, caps, settings in (
             (320, 240, BYTE_STREAM, {"bitrate": 600, "key-int-max": 25}),
