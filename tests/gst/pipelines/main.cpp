@@ -7,5 +7,7 @@ int main(int argc, char** argv) {
     g_setenv("GST_PLUGIN_PATH", ZOLT_ELEMENT_FOLDER, TRUE);
     g_setenv("GST_REGISTRY", ZOLT_REGISTRY, TRUE);
     gst_init(&argc, &argv);
-    return RUN_ALL_TESTS();
+    const int result = RUN_ALL_TESTS();
+    gst_deinit();  // tracers report then
+    return result;
 }
