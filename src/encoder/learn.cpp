@@ -7,16 +7,17 @@
 
 namespace {
 
-// Factors of the mean cost at which a candidate of the 16x16 mode search is dropped, by step.
-constexpr double thresh_16[16] = {2.25, 1.75, 1.5, 1.25, 1.0, 1.0, 1.0, 1.0,
-                                  1.0,  1.0,  1.1, 1.1,  1.0, 1.0, 0.0, 0.0};
+// Factors of the mean cost at which a candidate of the 16x16 mode search is dropped, by step, in
+// quarters. A cost compares with factor * sum / count in double precision as it does in integers
+// when everything is multiplied by four times the count. With factor 1 at least one of several
+// candidates goes, as not all are below the mean: after the last of these steps one is left at
+// most.
+constexpr int kLastStep16 = 6;
+constexpr int thresh_16[kLastStep16 + 1] = {9, 7, 6, 5, 4, 4, 4};
 
-// Up to here these are quarters, and a cost compares with the real number factor * sum / count as
-// it does in double precision when everything is multiplied by four times the count.
-constexpr int kQuarterSteps = 10;
-
-// The same for the chroma mode search. These are fifths, which doubles do not hold: where a cost
-// times five times the count equals the sum times five times the factor, rounding decides.
+// Factors of the mean cost above which a candidate of the chroma mode search is dropped, by step.
+// They are fifths, which doubles do not hold: where a cost times five times the count equals the
+// sum times five times the factor, rounding decides.
 constexpr double thresh_chroma[16] = {2.5, 2.5, 2.0, 2.0, 1.6, 1.6, 1.2, 1.2,
                                       1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0, 1.0};
 
@@ -267,20 +268,15 @@ void MacroblockCoder::compute_block_features() {
 
 // Intra 16x16 mode of the macroblock; leaves the predictions in g_intra_pred_16x16.
 int MacroblockCoder::learn16_mode() {
-    alignas(16) std::int32_t distortion[16][4];
+    alignas(16) std::int32_t distortion[8][4];
     g_kernels->intra_16x16_modes(g_mb_src_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
                                  g_intra_pred_16x16[0], distortion[0]);
     Candidates candidates({g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left});
-    for (int step = 0; step < 16; ++step) {
+    for (int step = 0; step <= kLastStep16; ++step) {
         candidates.add(distortion[step]);
-        if (step < kQuarterSteps) {
-            const int limit = candidates.sum() * static_cast<int>(4 * thresh_16[step]);
-            const int number = candidates.number();
-            candidates.drop([=](int cost) { return 4 * number * cost >= limit; });
-        } else {
-            const double limit = candidates.mean_cost() * thresh_16[step];
-            candidates.drop([limit](int cost) { return cost >= limit; });
-        }
+        const int limit = thresh_16[step] * candidates.sum();
+        const int factor = 4 * candidates.number();
+        candidates.drop([=](int cost) { return factor * cost >= limit; });
         if (candidates.number() < 2) {
             break;
         }

@@ -211,9 +211,10 @@ struct Kernels {
     // preds one after the other, 256 samples each, or 64 of Cb and 64 of Cr. And their distortions
     // by sampling phase, that of mode m at [4 * phase + m].
     //
-    // 16x16: phase 4 * y + x is the sum of absolute differences at the 16 samples (x + 4i, y + 4j).
-    // Chroma: phase 4 * y + x, the first 12, is the absolute sum of the 2x2 Hadamard transform of
-    // the differences at (x, y), (x + 4, y), (x, y + 4) and (x + 4, y + 4), of both components.
+    // 16x16: phase 4 * y + x, the first 8, is the sum of absolute differences at the 16 samples
+    // (x + 4i, y + 4j). Chroma: phase 4 * y + x, the first 12, is the absolute sum of the 2x2
+    // Hadamard transform of the differences at (x, y), (x + 4, y), (x, y + 4) and (x + 4, y + 4),
+    // of both components.
     void (*intra_16x16_modes)(const std::uint8_t* src, std::ptrdiff_t stride, bool up, bool left,
                               std::uint8_t* preds, std::int32_t* distortion);
     void (*intra_chroma_modes)(const std::uint8_t* u, const std::uint8_t* v, std::ptrdiff_t stride,

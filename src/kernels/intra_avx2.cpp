@@ -165,7 +165,7 @@ void intra_16x16_modes(const uint8_t* src, ptrdiff_t stride, bool up, bool left,
     }
     const FourRows vertical_rows(by_phase(vertical), by_phase(vertical));
     const FourRows mean_rows(means, means);
-    for (int y = 0; y < 4; ++y) {
+    for (int y = 0; y < 2; ++y) {
         const auto source_rows = [=](int row) {
             return by_phase(join(load_16(src + row * stride), load_16(src + (row + 8) * stride)));
         };

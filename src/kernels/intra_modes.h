@@ -17,7 +17,7 @@ void intra_16x16_modes_by(const std::uint8_t* src, std::ptrdiff_t stride, bool u
         predict_16x16(preds, src, stride, up, left, mode);
         std::int32_t phases[16];
         sad(src, stride, preds, phases);
-        for (int phase = 0; phase < 16; ++phase) {
+        for (int phase = 0; phase < 8; ++phase) {
             distortion[kIntraModes * phase + mode] = phases[phase];
         }
     }

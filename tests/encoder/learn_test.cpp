@@ -131,7 +131,7 @@ std::int32_t stand_in_distortions[16][4];
 
 void stand_in_16x16(const std::uint8_t*, std::ptrdiff_t, bool, bool, std::uint8_t*,
                     std::int32_t* distortion) {
-    std::copy(stand_in_distortions[0], stand_in_distortions[0] + 64, distortion);
+    std::copy(stand_in_distortions[0], stand_in_distortions[0] + 32, distortion);
 }
 void stand_in_chroma(const std::uint8_t*, const std::uint8_t*, std::ptrdiff_t, bool, bool,
                      std::uint8_t*, std::int32_t* distortion) {
