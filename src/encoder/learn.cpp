@@ -199,7 +199,9 @@ public:
     // Whether a candidate's cost passes the test, or one's that was dropped.
     template <typename Test>
     bool any(Test test) const {
-        return test(m_cost[0]) | test(m_cost[1]) | test(m_cost[2]) | test(m_cost[3]);
+        return static_cast<int>(test(m_cost[0])) + static_cast<int>(test(m_cost[1])) +
+                   static_cast<int>(test(m_cost[2])) + static_cast<int>(test(m_cost[3])) !=
+               0;
     }
 
     template <typename Test>
