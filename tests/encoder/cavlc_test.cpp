@@ -293,6 +293,18 @@ TEST_F(ResidualBlock, EverySetOfPositions) {
     }
 }
 
+// The longest total_zeros and run_before, 30 bits, at every fill of the cursor's window.
+TEST_F(ResidualBlock, LongestRunsAtEveryBitPosition) {
+    for (const Table table : {kNc0, kNc2, kNc4, kNc8}) {
+        for (int magnitude = 1; magnitude <= 16; ++magnitude) {
+            std::vector<int> levels = {magnitude, 0, 0, 0, 0, 0, 0, 0, 1, 1, 1, 1, 1, 1, 1, 1};
+            for (int position = 0; position < 8; ++position) {
+                ASSERT_NO_FATAL_FAILURE(check(levels, table)) << "magnitude " << magnitude;
+            }
+        }
+    }
+}
+
 // Levels of every magnitude, alone and after levels that have raised suffixLength.
 TEST_F(ResidualBlock, EveryMagnitude) {
     Random random(4);

@@ -45,6 +45,11 @@ struct Bench {
         for (int b = 0; b < (kSize / 4 + 2) * (kSize / 4 + 1); ++b) {
             picture.g_i4mode[b] = static_cast<std::int8_t>(random.between(0, 8));
         }
+        code(mb);
+    }
+
+    // Codes macroblock mb of what the picture holds.
+    void code(int mb) {
         coder.g_mapMBNumber = mb;
         coder.g_mb_x = mb % picture.g_mb_width;
         coder.g_mb_y = mb / picture.g_mb_width;
@@ -87,6 +92,38 @@ TEST_P(Intra4x4Macroblock, EqualsBlockByBlock) {
         ASSERT_EQ(std::memcmp(&a.picture.g_i4mode[0], &e.picture.g_i4mode[0], blocks), 0);
     }
     EXPECT_GT(changed, 4000 * 16 / 10) << "hardly any mode search was decided";
+}
+
+// Residuals that are quantised to coefficients whose inverse transform has a sum beyond 16 bits.
+TEST_P(Intra4x4Macroblock, SumsBeyond16Bits) {
+    constexpr int kBlock[16] = {255, 10, 0,   255, 255, 255, 255, 197,
+                                203, 0,  255, 255, 255, 238, 0,   0};
+    for (const int around : {0, 255}) {
+        const auto reconstruct = [&](const Kernels& kernels) {
+            Bench bench(kernels);
+            Picture& picture = bench.picture;
+            const std::ptrdiff_t stride = picture.g_stride_luma;
+            for (int y = -1; y < kSize; ++y) {
+                std::memset(picture.g_cur_y + y * stride - 1, around, kSize + 5);
+            }
+            std::uint8_t* block = picture.g_cur_y + 16 * stride + 16;
+            for (int n = 0; n < 16; ++n) {
+                block[n / 4 * stride + n % 4] =
+                    static_cast<std::uint8_t>(around == 0 ? kBlock[n] : 255 - kBlock[n]);
+            }
+            picture.g_mbQp = 51;
+            picture.g_slp->sliceType = I_SLICE;
+            std::memset(picture.g_i4mode, 2, (kSize / 4 + 2) * (kSize / 4 + 1));
+            bench.code(4);
+            std::vector<int> samples;
+            for (int n = 0; n < 16; ++n) {
+                samples.push_back(block[n / 4 * stride + n % 4]);
+            }
+            return samples;
+        };
+        EXPECT_EQ(reconstruct(*GetParam()), reconstruct(zolt::scalar_kernels()))
+            << "all around is " << around;
+    }
 }
 
 std::vector<const Kernels*> tables() {

@@ -243,6 +243,25 @@ TEST(ModeElimination, RoundsTheChromaLimitInDoublePrecision) {
     EXPECT_GT(dropped, 0) << "no limit was rounded down";
 }
 
+// The mean of the costs -1 and 0 gives the limit -0.8 after step 5. Truncated it is 0, so that the
+// other mode stays, which wins by what DC costs later.
+TEST(ModeElimination, TruncatesNegativeChromaLimitsTowardsZero) {
+    zolt::Kernels kernels = zolt::scalar_kernels();
+    kernels.intra_chroma_modes = stand_in_chroma;
+    Picture picture(16, 16, kernels);
+    MacroblockCoder coder(picture);
+    coder.g_mb_up = 0;
+    coder.g_mb_left = 1;
+    coder.g_intra_lambda = 1;
+    for (auto& phase : stand_in_distortions) {
+        std::fill(phase, phase + 4, 0);
+    }
+    stand_in_distortions[0][0] = 4;
+    stand_in_distortions[5][0] = 1;
+    stand_in_distortions[6][0] = 100;
+    EXPECT_EQ(coder.learn_chroma_mode(), 1);
+}
+
 class ModeSearch : public testing::Test {
 protected:
     // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) around it.
