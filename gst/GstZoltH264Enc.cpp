@@ -68,30 +68,34 @@ GType fit_type() {
 
 void set_property(GObject* object, guint id, const GValue* value, GParamSpec* spec) {
     H264Element& impl = impl_of(object);
-    PictureEncoder::Settings settings = impl.settings();
+    const auto set_number = [&impl, value](int PictureEncoder::Settings::*setting) {
+        impl.change_settings([&](PictureEncoder::Settings& settings) {
+            settings.*setting = static_cast<int>(g_value_get_uint(value));
+        });
+    };
     switch (id) {
         case kBitRate:
-            settings.bit_rate_kbs = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::bit_rate_kbs);
             break;
         case kKeyIntMax:
-            settings.key_frame_interval = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::key_frame_interval);
             break;
         case kThreads:
-            settings.threads = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::threads);
             break;
         case kFit:
-            settings.fit = static_cast<Fit>(g_value_get_enum(value));
+            impl.change_settings([value](PictureEncoder::Settings& settings) {
+                settings.fit = static_cast<Fit>(g_value_get_enum(value));
+            });
             break;
         case kPluginPath: {
             const gchar* const path = g_value_get_string(value);
             impl.set_plugin_path(path == nullptr ? "" : path);
-            return;
+            break;
         }
         default:
             G_OBJECT_WARN_INVALID_PROPERTY_ID(object, id, spec);
-            return;
     }
-    impl.set_settings(settings);
 }
 
 GstStructure* stats_of(const H264Element& impl) {

@@ -60,9 +60,9 @@ PictureEncoder::Settings H264Element::settings() const {
     return settings_;
 }
 
-void H264Element::set_settings(const PictureEncoder::Settings& settings) {
+void H264Element::change_settings(const std::function<void(PictureEncoder::Settings&)>& change) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    settings_ = settings;
+    change(settings_);
 }
 
 std::string H264Element::plugin_path() const {

@@ -2,6 +2,7 @@
 
 #include <gst/video/video.h>
 
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -21,7 +22,8 @@ public:
 
     // Properties.
     PictureEncoder::Settings settings() const;
-    void set_settings(const PictureEncoder::Settings& settings);
+    // `change` alters the settings while no other thread can.
+    void change_settings(const std::function<void(PictureEncoder::Settings&)>& change);
     std::string plugin_path() const;
     void set_plugin_path(const std::string& path);
     CodingTally tally() const;
