@@ -165,6 +165,11 @@ GstFlowReturn handle_frame(GstVideoEncoder* encoder, GstVideoCodecFrame* frame) 
                    [frame](H264Element& impl) { return impl.handle_frame(frame); });
 }
 
+GstFlowReturn pre_push(GstVideoEncoder* encoder, GstVideoCodecFrame* frame) {
+    return guarded(encoder, GST_FLOW_ERROR, {GST_LIBRARY_ERROR, GST_LIBRARY_ERROR_ENCODE},
+                   [frame](H264Element& impl) { return impl.pre_push(frame); });
+}
+
 GstFlowReturn finish(GstVideoEncoder* encoder) {
     return call<&H264Element::finish>(encoder) != FALSE ? GST_FLOW_OK : GST_FLOW_ERROR;
 }
@@ -244,6 +249,7 @@ static void gst_zolt_h264_enc_class_init(GstZoltH264EncClass* klass) {
     encoder_class->set_format = set_format;
     encoder_class->negotiate = negotiate;
     encoder_class->handle_frame = handle_frame;
+    encoder_class->pre_push = pre_push;
     encoder_class->finish = finish;
     encoder_class->flush = call<&H264Element::flush>;
     encoder_class->propose_allocation = propose_allocation;

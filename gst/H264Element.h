@@ -38,6 +38,8 @@ public:
     void set_source_caps();
     // Takes the frame in every case.
     GstFlowReturn handle_frame(GstVideoCodecFrame* frame);
+    // Writes the picture that has been coded last the way that downstream wants it by then.
+    GstFlowReturn pre_push(GstVideoCodecFrame* frame);
     void finish();
     void flush();
 
@@ -53,6 +55,9 @@ private:
     using StateOwner = std::unique_ptr<GstVideoCodecState, StateRelease>;
 
     bool is_late(const GstVideoCodecFrame* frame) const;
+    GstFlowReturn negotiate();
+    GstFlowReturn encode_and_push(FrameOwner frame);
+    AccessUnit unit_of(const GstVideoCodecFrame* frame, StreamFormat format) const;
     PictureEncoder::Picture encode(GstVideoCodecFrame* frame);
     void send_tags();
     StreamFormat choose_stream_format() const;
