@@ -68,30 +68,34 @@ GType fit_type() {
 
 void set_property(GObject* object, guint id, const GValue* value, GParamSpec* spec) {
     H264Element& impl = impl_of(object);
-    PictureEncoder::Settings settings = impl.settings();
+    const auto set_number = [&impl, value](int PictureEncoder::Settings::*setting) {
+        impl.change_settings([&](PictureEncoder::Settings& settings) {
+            settings.*setting = static_cast<int>(g_value_get_uint(value));
+        });
+    };
     switch (id) {
         case kBitRate:
-            settings.bit_rate_kbs = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::bit_rate_kbs);
             break;
         case kKeyIntMax:
-            settings.key_frame_interval = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::key_frame_interval);
             break;
         case kThreads:
-            settings.threads = static_cast<int>(g_value_get_uint(value));
+            set_number(&PictureEncoder::Settings::threads);
             break;
         case kFit:
-            settings.fit = static_cast<Fit>(g_value_get_enum(value));
+            impl.change_settings([value](PictureEncoder::Settings& settings) {
+                settings.fit = static_cast<Fit>(g_value_get_enum(value));
+            });
             break;
         case kPluginPath: {
             const gchar* const path = g_value_get_string(value);
             impl.set_plugin_path(path == nullptr ? "" : path);
-            return;
+            break;
         }
         default:
             G_OBJECT_WARN_INVALID_PROPERTY_ID(object, id, spec);
-            return;
     }
-    impl.set_settings(settings);
 }
 
 GstStructure* stats_of(const H264Element& impl) {
@@ -159,6 +163,11 @@ gboolean negotiate(GstVideoEncoder* encoder) {
 GstFlowReturn handle_frame(GstVideoEncoder* encoder, GstVideoCodecFrame* frame) {
     return guarded(encoder, GST_FLOW_ERROR, {GST_LIBRARY_ERROR, GST_LIBRARY_ERROR_ENCODE},
                    [frame](H264Element& impl) { return impl.handle_frame(frame); });
+}
+
+GstFlowReturn pre_push(GstVideoEncoder* encoder, GstVideoCodecFrame* frame) {
+    return guarded(encoder, GST_FLOW_ERROR, {GST_LIBRARY_ERROR, GST_LIBRARY_ERROR_ENCODE},
+                   [frame](H264Element& impl) { return impl.pre_push(frame); });
 }
 
 GstFlowReturn finish(GstVideoEncoder* encoder) {
@@ -240,6 +249,7 @@ static void gst_zolt_h264_enc_class_init(GstZoltH264EncClass* klass) {
     encoder_class->set_format = set_format;
     encoder_class->negotiate = negotiate;
     encoder_class->handle_frame = handle_frame;
+    encoder_class->pre_push = pre_push;
     encoder_class->finish = finish;
     encoder_class->flush = call<&H264Element::flush>;
     encoder_class->propose_allocation = propose_allocation;

@@ -2,7 +2,9 @@
 
 #include <gst/pbutils/pbutils.h>
 
+#include <algorithm>
 #include <optional>
+#include <utility>
 
 #include "debug_category.h"
 #include "input_caps.h"
@@ -60,9 +62,9 @@ PictureEncoder::Settings H264Element::settings() const {
     return settings_;
 }
 
-void H264Element::set_settings(const PictureEncoder::Settings& settings) {
+void H264Element::change_settings(const std::function<void(PictureEncoder::Settings&)>& change) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    settings_ = settings;
+    change(settings_);
 }
 
 std::string H264Element::plugin_path() const {
@@ -151,38 +153,68 @@ GstFlowReturn H264Element::handle_frame(GstVideoCodecFrame* owned) {
         return GST_FLOW_NOT_NEGOTIATED;
     }
     // What the reader wants now is to be known before the picture is coded for it.
-    GstPad* const source = GST_VIDEO_ENCODER_SRC_PAD(element_);
-    if (gst_pad_check_reconfigure(source) != FALSE &&
-        gst_video_encoder_negotiate(element_) == FALSE) {
-        gst_pad_mark_reconfigure(source);
-        return GST_PAD_IS_FLUSHING(source) ? GST_FLOW_FLUSHING : GST_FLOW_NOT_NEGOTIATED;
+    if (gst_pad_check_reconfigure(GST_VIDEO_ENCODER_SRC_PAD(element_)) != FALSE) {
+        const GstFlowReturn negotiated = negotiate();
+        if (negotiated != GST_FLOW_OK) {
+            return negotiated;
+        }
     }
     if (is_late(frame.get())) {
         // Without an output buffer the frame is dropped, and said to be.
         return gst_video_encoder_finish_frame(element_, frame.release());
     }
+    const GstFlowReturn pushed = encode_and_push(std::move(frame));
+    if (pushed == GST_FLOW_OK) {
+        encoder_->mark_taken();
+    }
+    return pushed;
+}
+
+GstFlowReturn H264Element::negotiate() {
+    if (gst_video_encoder_negotiate(element_) != FALSE) {
+        return GST_FLOW_OK;
+    }
+    GstPad* const source = GST_VIDEO_ENCODER_SRC_PAD(element_);
+    gst_pad_mark_reconfigure(source);
+    return GST_PAD_IS_FLUSHING(source) ? GST_FLOW_FLUSHING : GST_FLOW_NOT_NEGOTIATED;
+}
+
+GstFlowReturn H264Element::encode_and_push(FrameOwner frame) {
     const PictureEncoder::Picture picture = encode(frame.get());
-    if (picture.has_new_sets && gst_video_encoder_negotiate(element_) == FALSE) {
-        return GST_FLOW_NOT_NEGOTIATED;
+    if (picture.is_key) {
+        GST_VIDEO_CODEC_FRAME_SET_SYNC_POINT(frame.get());
     }
-    const AccessUnit unit(stream_format_, picture.is_key ? &encoder_->sets() : nullptr,
-                          picture.nal);
+    frame->dts = frame->pts;
+    if (picture.has_new_sets) {
+        const GstFlowReturn negotiated = negotiate();
+        if (negotiated != GST_FLOW_OK) {
+            return negotiated;
+        }
+    }
+    // Until it is pushed, the reader may come to want the other format: there is room for both.
+    const std::size_t room = std::max(unit_of(frame.get(), StreamFormat::byte_stream).bytes(),
+                                      unit_of(frame.get(), StreamFormat::avc).bytes());
     const GstFlowReturn allocated =
-        gst_video_encoder_allocate_output_frame(element_, frame.get(), unit.bytes());
-    if (allocated != GST_FLOW_OK) {
-        return allocated;
-    }
+        gst_video_encoder_allocate_output_frame(element_, frame.get(), room);
+    return allocated != GST_FLOW_OK ? allocated
+                                    : gst_video_encoder_finish_frame(element_, frame.release());
+}
+
+GstFlowReturn H264Element::pre_push(GstVideoCodecFrame* frame) {
+    const AccessUnit unit = unit_of(frame, stream_format_);
     GstMapInfo map;
     if (gst_buffer_map(frame->output_buffer, &map, GST_MAP_WRITE) == FALSE) {
         throw ToolError("an output buffer cannot be written");
     }
     unit.write(map.data);
     gst_buffer_unmap(frame->output_buffer, &map);
-    if (picture.is_key) {
-        GST_VIDEO_CODEC_FRAME_SET_SYNC_POINT(frame.get());
-    }
-    frame->dts = frame->pts;
-    return gst_video_encoder_finish_frame(element_, frame.release());
+    gst_buffer_set_size(frame->output_buffer, static_cast<gssize>(unit.bytes()));
+    return GST_FLOW_OK;
+}
+
+AccessUnit H264Element::unit_of(const GstVideoCodecFrame* frame, StreamFormat format) const {
+    const bool is_key = GST_VIDEO_CODEC_FRAME_IS_SYNC_POINT(frame);
+    return {format, is_key ? &encoder_->sets() : nullptr, encoder_->nal()};
 }
 
 void H264Element::finish() {
@@ -230,7 +262,7 @@ PictureEncoder::Picture H264Element::encode(GstVideoCodecFrame* frame) {
     const std::lock_guard<std::mutex> lock(mutex_);
     ++tally_.pictures;
     tally_.key_frames += picture.is_key ? 1 : 0;
-    tally_.bits += picture.nal.size() * 8;
+    tally_.bits += encoder_->nal().size() * 8;
     tally_.microseconds = coded_before_ + picture.end;
     return picture;
 }

@@ -2,6 +2,7 @@
 
 #include <gst/video/video.h>
 
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -21,7 +22,8 @@ public:
 
     // Properties.
     PictureEncoder::Settings settings() const;
-    void set_settings(const PictureEncoder::Settings& settings);
+    // `change` alters the settings while no other thread can.
+    void change_settings(const std::function<void(PictureEncoder::Settings&)>& change);
     std::string plugin_path() const;
     void set_plugin_path(const std::string& path);
     CodingTally tally() const;
@@ -36,6 +38,8 @@ public:
     void set_source_caps();
     // Takes the frame in every case.
     GstFlowReturn handle_frame(GstVideoCodecFrame* frame);
+    // Writes the picture that has been coded last the way that downstream wants it by then.
+    GstFlowReturn pre_push(GstVideoCodecFrame* frame);
     void finish();
     void flush();
 
@@ -51,6 +55,9 @@ private:
     using StateOwner = std::unique_ptr<GstVideoCodecState, StateRelease>;
 
     bool is_late(const GstVideoCodecFrame* frame) const;
+    GstFlowReturn negotiate();
+    GstFlowReturn encode_and_push(FrameOwner frame);
+    AccessUnit unit_of(const GstVideoCodecFrame* frame, StreamFormat format) const;
     PictureEncoder::Picture encode(GstVideoCodecFrame* frame);
     void send_tags();
     StreamFormat choose_stream_format() const;

@@ -74,7 +74,7 @@ void PictureEncoder::set_key_frame_interval(int frames) {
 
 PictureEncoder::Picture PictureEncoder::encode(const std::vector<PicturePacker::Rows>& rows,
                                                std::optional<std::uint64_t> time) {
-    if (restarts_) {
+    if (restarts_ || !is_taken_) {
         session_.begin(sample_format_, session_rate());
         restarts_ = false;
     }
@@ -84,6 +84,7 @@ PictureEncoder::Picture PictureEncoder::encode(const std::vector<PicturePacker::
         packer_.pack(rows, sample_.data());
         sample = sample_.data();
     }
+    is_taken_ = false;
     session_.encode(sample, sample_format_.sample_bytes(), clock_.next(time));
 
     bool has_new_sets = false;
@@ -92,7 +93,7 @@ PictureEncoder::Picture PictureEncoder::encode(const std::vector<PicturePacker::
         has_new_sets = sets != sets_;
         sets_ = std::move(sets);
     }
-    return {consumer_.nal(), consumer_.is_key(), has_new_sets, clock_.end()};
+    return {consumer_.is_key(), has_new_sets, clock_.end()};
 }
 
 ParameterSetUnits PictureEncoder::player_sets() const {

@@ -54,15 +54,20 @@ public:
     // The parameter sets of the pictures from the last IDR picture on.
     const ParameterSetUnits& sets() const { return sets_; }
 
-    // A coded picture: a bare NAL unit, valid until the next one.
+    // The picture coded last, a bare NAL unit.
+    const std::vector<unsigned char>& nal() const { return consumer_.nal(); }
+
     struct Picture {
-        const std::vector<unsigned char>& nal;
         bool is_key;
         bool has_new_sets;
         std::int64_t end;  // of the pictures so far, microseconds from the start of the first one
     };
     // Codes a picture of the input; its time, if it has any, is in nanoseconds.
     Picture encode(const std::vector<PicturePacker::Rows>& rows, std::optional<std::uint64_t> time);
+
+    // The reader has the picture coded last. Without this call the stream begins anew with the next
+    // one, which could not refer to it.
+    void mark_taken() { is_taken_ = true; }
 
     // No more pictures come in this stream.
     void end() { session_.end(); }
@@ -82,6 +87,7 @@ private:
     int key_frame_interval_;
     int level_kbs_;  // the largest bit rate since the stream began
     bool restarts_ = false;
+    bool is_taken_ = true;
     UnitConsumer consumer_;
     EncoderSession session_;
     ParameterSetUnits sets_;

@@ -124,5 +124,23 @@ TEST(Life, PropertiesMayBeSetOnAnyThread) {
     setter.join();
 }
 
+// Each keeps what its own thread has set.
+TEST(Life, PropertiesSetAtTheSameTimeAreAllKept) {
+    const ElementHarness element;
+    const auto set_and_get = [&element](const char* name, int* lost) {
+        for (guint n = 1; n <= 4000; ++n) {
+            guint got = 0;
+            g_object_set(element.element(), name, n, nullptr);
+            g_object_get(element.element(), name, &got, nullptr);
+            *lost += got == n ? 0 : 1;
+        }
+    };
+    int lost[2] = {};
+    std::thread other(set_and_get, "key-int-max", &lost[0]);
+    set_and_get("bitrate", &lost[1]);
+    other.join();
+    EXPECT_EQ(lost[0] + lost[1], 0);
+}
+
 }  // namespace
 }  // namespace zolt_test

@@ -247,6 +247,79 @@ TEST(Stream, EndsWithItsLastPicture) {
     EXPECT_TRUE(ended);
 }
 
+// What a probe does when the element asks downstream for buffers: another reader takes over.
+GstPadProbeReturn change_reader(GstPad* pad, GstPadProbeInfo* info, gpointer harness) {
+    if (GST_QUERY_TYPE(GST_PAD_PROBE_INFO_QUERY(info)) != GST_QUERY_ALLOCATION) {
+        return GST_PAD_PROBE_OK;
+    }
+    auto* const of_harness = static_cast<GstHarness*>(harness);
+    gst_pad_remove_probe(pad, GST_PAD_PROBE_INFO_ID(info));
+    gst_harness_set_sink_caps_str(of_harness, "video/x-h264,stream-format=byte-stream");
+    gst_harness_push_upstream_event(of_harness, gst_event_new_reconfigure());
+    return GST_PAD_PROBE_OK;
+}
+
+// A larger bit rate has the caps sent anew after its key frame has been coded.
+TEST(Stream, ReaderMayChangeWhileAPictureIsCoded) {
+    const ElementHarness element("bitrate=100 key-int-max=2", kOnlyAvc);
+    ASSERT_TRUE(element.set_caps(i420_fields(320, 240)));
+    EXPECT_EQ(element.types(0, 1), "KP");
+    gst_pad_add_probe(element.harness()->sinkpad, GST_PAD_PROBE_TYPE_QUERY_DOWNSTREAM,
+                      change_reader, element.harness(), nullptr);
+    g_object_set(element.element(), "bitrate", 4000, nullptr);
+    ASSERT_EQ(element.push(2), GST_FLOW_OK);
+    EXPECT_EQ(element.output_field("stream-format"), "byte-stream");
+    const std::vector<Output> outputs = element.take();
+    ASSERT_EQ(outputs.size(), 1u);
+    EXPECT_EQ(units_of(outputs[0].bytes, true).size(), 3u);
+}
+
+GstPadProbeReturn refuse(GstPad*, GstPadProbeInfo* info, gpointer) {
+    gst_buffer_unref(GST_PAD_PROBE_INFO_BUFFER(info));
+    GST_PAD_PROBE_INFO_FLOW_RETURN(info) = GST_FLOW_NOT_LINKED;
+    return GST_PAD_PROBE_HANDLED;
+}
+
+// Pictures that nobody got are nothing that later ones may refer to.
+TEST(Stream, BeginsAnewAfterPicturesThatWereNotTaken) {
+    const ElementHarness element;
+    ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
+    EXPECT_EQ(element.types(0, 2), "KPP");
+    GstPad* const source = gst_element_get_static_pad(element.element(), "src");
+    const gulong probe =
+        gst_pad_add_probe(source, GST_PAD_PROBE_TYPE_BUFFER, refuse, nullptr, nullptr);
+    EXPECT_EQ(element.push(3), GST_FLOW_NOT_LINKED);
+    EXPECT_EQ(element.push(4), GST_FLOW_NOT_LINKED);
+    gst_pad_remove_probe(source, probe);
+    gst_object_unref(source);
+    EXPECT_EQ(element.types(5, 7), "KPP");
+}
+
+GstPadProbeReturn refuse_caps(GstPad*, GstPadProbeInfo* info, gpointer) {
+    GstQuery* const query = GST_PAD_PROBE_INFO_QUERY(info);
+    if (GST_QUERY_TYPE(query) != GST_QUERY_ACCEPT_CAPS) {
+        return GST_PAD_PROBE_OK;
+    }
+    gst_query_set_accept_caps_result(query, FALSE);
+    return GST_PAD_PROBE_HANDLED;
+}
+
+TEST(Stream, GoesOnAfterCapsThatTheReaderRefuses) {
+    const ElementHarness element;
+    ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
+    EXPECT_EQ(element.types(0, 2), "KPP");
+    const gulong probe =
+        gst_pad_add_probe(element.harness()->sinkpad, GST_PAD_PROBE_TYPE_QUERY_DOWNSTREAM,
+                          refuse_caps, nullptr, nullptr);
+    element.set_caps(i420_fields(640, 480));
+    EXPECT_EQ(element.push(3), GST_FLOW_NOT_NEGOTIATED);
+    gst_pad_remove_probe(element.harness()->sinkpad, probe);
+    ASSERT_TRUE(element.set_caps(i420_fields(64, 48)));
+    EXPECT_EQ(element.types(4, 6), "KPP");
+    EXPECT_EQ(element.output_field("width"), "64");
+    EXPECT_EQ(element.error(), "");
+}
+
 TEST(Stream, TimesMayBeMissingOrJump) {
     const ElementHarness element("bitrate=100");
     ASSERT_TRUE(element.set_caps(i420_fields(64, 48, "framerate=0/1")));
