@@ -1,7 +1,11 @@
 #include <gtest/gtest.h>
 
+#include <optional>
+#include <string>
+
 #include "ElementHarness.h"
 #include "common/Encoding.h"
+#include "input_caps.h"
 #include "pictures.h"
 
 namespace zolt_test {
@@ -93,6 +97,42 @@ TEST(Formats, ThreadsDoNotChangeTheStream) {
             ASSERT_EQ(element.push(n), GST_FLOW_OK);
             expect_engine_stream(element, engine, padded_i420(info, n), n);
         }
+    }
+}
+
+// What the parameter sets say of the pictures, as Tables E-1 and E-3 to E-5 count it.
+TEST(Formats, ShapesAndColoursAreThoseOfTheCaps) {
+    struct Case {
+        const char* fields;
+        int sar_width, sar_height, primaries, transfer, matrix;
+        std::optional<bool> full_range;
+    };
+    const Case cases[] = {
+        {"format=I420,pixel-aspect-ratio=24/22,colorimetry=bt709", 12, 11, 1, 1, 1, false},
+        {"format=I420,pixel-aspect-ratio=0/1,colorimetry=bt2020", 0, 0, 9, 15, 9, false},
+        {"format=I420,pixel-aspect-ratio=65536/1,colorimetry=bt601", 0, 0, 6, 6, 6, false},
+        // Parts that are not known are left to what goes with the matrix.
+        {"format=I420,colorimetry=2:4:0:0", 1, 1, 6, 6, 6, false},
+        {"format=I420,colorimetry=1:4:0:0", 1, 1, 1, 13, 6, true},
+        // RGB is converted; its primaries and transfer stay.
+        {"format=RGB,colorimetry=1:1:5:7", 1, 1, 9, 1, 6, true},
+        {"format=RGB,colorimetry=1:1:0:0", 1, 1, 1, 13, 6, true},
+    };
+    for (const Case& a_case : cases) {
+        SCOPED_TRACE(a_case.fields);
+        GstCaps* const caps = gst_caps_from_string(
+            (std::string("video/x-raw,width=64,height=48,framerate=30/1,") + a_case.fields)
+                .c_str());
+        GstVideoInfo info;
+        ASSERT_TRUE(gst_video_info_from_caps(&info, caps));
+        gst_caps_unref(caps);
+        const zolt::VideoTraits traits = zolt::describe_input(info).traits;
+        EXPECT_EQ(traits.sar_width, a_case.sar_width);
+        EXPECT_EQ(traits.sar_height, a_case.sar_height);
+        EXPECT_EQ(traits.colour.colour_primaries, a_case.primaries);
+        EXPECT_EQ(traits.colour.transfer_characteristics, a_case.transfer);
+        EXPECT_EQ(traits.colour.matrix_coefficients, a_case.matrix);
+        EXPECT_EQ(traits.colour.video_full_range, a_case.full_range);
     }
 }
 

@@ -93,6 +93,10 @@ TEST(Properties, ALargerBitRateRaisesTheLevelWithTheNextKeyFrame) {
     EXPECT_EQ(element.types(6, 6), "K");
     EXPECT_EQ(element.output_field("level"), "2.1");
     EXPECT_NE(element.output_field("codec_data"), sets);
+    // A decoder made for it is not told to be smaller again.
+    g_object_set(element.element(), "bitrate", 500, nullptr);
+    EXPECT_EQ(element.types(7, 12), "PPPPPK");
+    EXPECT_EQ(element.output_field("level"), "2.1");
 }
 
 // What the engine would end the process for never reaches it.
@@ -159,6 +163,29 @@ TEST(Properties, StatsCountWhatCameOut) {
     EXPECT_NEAR(stats.bit_rate, static_cast<double>(bits) / 1.5 / 1000, 0.1);
 }
 
+// Neither other caps nor a jump to another place of the source take away from the time coded.
+TEST(Properties, StatsGoOnUntilTheElementIsStopped) {
+    const ElementHarness element("bitrate=400");
+    ASSERT_TRUE(element.set_caps(kCaps));
+    element.types(0, 29);
+    ASSERT_TRUE(element.set_caps("format=I420,width=64,height=48,framerate=30/1"));
+    element.types(30, 44);
+    gst_harness_push_event(element.harness(), gst_event_new_flush_start());
+    gst_harness_push_event(element.harness(), gst_event_new_flush_stop(TRUE));
+    GstSegment segment;
+    gst_segment_init(&segment, GST_FORMAT_TIME);
+    gst_harness_push_event(element.harness(), gst_event_new_segment(&segment));
+    element.types(30000, 30014);
+    const Stats stats = stats_of(element);
+    EXPECT_EQ(stats.pictures, 60u);
+    EXPECT_NEAR(stats.bit_rate, static_cast<double>(stats.bits) / 2.0 / 1000, 0.1);
+
+    gst_element_set_state(element.element(), GST_STATE_READY);
+    EXPECT_EQ(stats_of(element).pictures, 60u);
+    gst_element_set_state(element.element(), GST_STATE_PLAYING);
+    EXPECT_EQ(stats_of(element).pictures, 0u);
+}
+
 TEST(Properties, TagsNameTheEncoderAndItsBitRate) {
     const ElementHarness element("bitrate=700");
     ASSERT_TRUE(element.set_caps(kCaps));
@@ -170,6 +197,12 @@ TEST(Properties, TagsNameTheEncoderAndItsBitRate) {
     ASSERT_TRUE(second.set_caps(kCaps));
     EXPECT_EQ(second.types(0, 1), "KP");
     EXPECT_EQ(last_tag(second, GST_TAG_NOMINAL_BITRATE), "700000");
+
+    const ElementHarness third;
+    ASSERT_TRUE(third.set_caps(kCaps));
+    EXPECT_EQ(third.types(0, 0), "K");
+    EXPECT_NE(last_tag(third, GST_TAG_VIDEO_CODEC).find("H.264"), std::string::npos);
+
     g_object_set(second.element(), "bitrate", 900, nullptr);
     EXPECT_EQ(second.types(2, 3), "PP");
     EXPECT_EQ(last_tag(second, GST_TAG_NOMINAL_BITRATE), "900000");
