@@ -103,39 +103,28 @@ __m256i centre_samples(__m256i outer, __m256i middle, __m256i inner) {
     return _mm256_packs_epi32(_mm256_srai_epi32(low, 10), _mm256_srai_epi32(high, 10));
 }
 
-// Unrounded vertical sums from six rows, as 16-bit lanes.
-__m256i vertical_sums(const __m256i* r) {
-    const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(r[2], r[3]), 2),
-                                       _mm256_add_epi16(r[1], r[4]));
-    return _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(r[0], r[5]), t),
+// Unrounded sums of the six samples around each of 16 positions in a row, as 16-bit lanes.
+__m256i horizontal_sums(const uint8_t* row) {
+    const auto at = [row](int n) { return _mm256_cvtepu8_epi16(load_16(row + n)); };
+    const __m256i t = _mm256_sub_epi16(_mm256_slli_epi16(_mm256_add_epi16(at(0), at(1)), 2),
+                                       _mm256_add_epi16(at(-1), at(2)));
+    return _mm256_add_epi16(_mm256_add_epi16(_mm256_add_epi16(at(-2), at(3)), t),
                             _mm256_slli_epi16(t, 2));
 }
 
 void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
-    // Columns -2..13, and columns 6..21, from six rows that move down.
-    __m256i left[6], right[6];
-    const auto load_row = [&](int slot, int y) {
-        const uint8_t* row = src + y * stride;
-        left[slot] = _mm256_cvtepu8_epi16(load_16(row - 2));
-        right[slot] = join(high_lane(left[slot]), _mm_cvtepu8_epi16(load_8(row + 14)));
-    };
+    __m256i sums[6];  // of rows -2..3 around the current one
     for (int i = 0; i < 5; ++i) {
-        load_row(i, i - 2);
+        sums[i] = horizontal_sums(src + (i - 2) * stride);
     }
     for (int y = 0; y < 16; ++y) {
-        load_row(5, y + 3);
-        const __m256i a = vertical_sums(left);
-        const __m256i b = vertical_sums(right);
-        // Sums that start n columns later.
-        const __m256i a1 = _mm256_alignr_epi8(b, a, 2), a2 = _mm256_alignr_epi8(b, a, 4);
-        const __m256i a3 = _mm256_alignr_epi8(b, a, 6), a4 = _mm256_alignr_epi8(b, a, 8);
-        const __m256i a5 = _mm256_alignr_epi8(b, a, 10);
-        const __m256i samples = centre_samples(_mm256_add_epi16(a, a5), _mm256_add_epi16(a1, a4),
-                                               _mm256_add_epi16(a2, a3));
+        sums[5] = horizontal_sums(src + (y + 3) * stride);
+        const __m256i samples =
+            centre_samples(_mm256_add_epi16(sums[0], sums[5]), _mm256_add_epi16(sums[1], sums[4]),
+                           _mm256_add_epi16(sums[2], sums[3]));
         store_16(pred + 16 * y, _mm_packus_epi16(low_lane(samples), high_lane(samples)));
         for (int i = 0; i < 5; ++i) {
-            left[i] = left[i + 1];
-            right[i] = right[i + 1];
+            sums[i] = sums[i + 1];
         }
     }
 }

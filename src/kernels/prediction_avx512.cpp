@@ -66,61 +66,6 @@ void half_horizontal_row(const uint8_t* src, uint8_t* dst, int count) {
 
 // ---- Inter prediction ----
 
-// Unrounded vertical sums from six rows, as 16-bit lanes.
-__m512i vertical_sums(const __m512i* r) {
-    const __m512i t = _mm512_sub_epi16(_mm512_slli_epi16(_mm512_add_epi16(r[2], r[3]), 2),
-                                       _mm512_add_epi16(r[1], r[4]));
-    return _mm512_add_epi16(_mm512_add_epi16(_mm512_add_epi16(r[0], r[5]), t),
-                            _mm512_slli_epi16(t, 2));
-}
-
-// (outer - 5 * middle + 20 * inner + 512) >> 10 with 32-bit sums.
-__m512i centre_samples(__m512i outer, __m512i middle, __m512i inner) {
-    const __m512i ones = _mm512_set1_epi16(1);
-    const __m512i outer_middle = _mm512_set1_epi32(static_cast<int>(0xfffb0001u));  // 1, -5
-    const __m512i inner_rounding = _mm512_set1_epi32(512 << 16 | 20);
-    const __m512i low =
-        _mm512_add_epi32(_mm512_madd_epi16(_mm512_unpacklo_epi16(outer, middle), outer_middle),
-                         _mm512_madd_epi16(_mm512_unpacklo_epi16(inner, ones), inner_rounding));
-    const __m512i high =
-        _mm512_add_epi32(_mm512_madd_epi16(_mm512_unpackhi_epi16(outer, middle), outer_middle),
-                         _mm512_madd_epi16(_mm512_unpackhi_epi16(inner, ones), inner_rounding));
-    return _mm512_packs_epi32(_mm512_srai_epi32(low, 10), _mm512_srai_epi32(high, 10));
-}
-
-void centre_16x16(uint8_t* pred, const uint8_t* src, ptrdiff_t stride) {
-    // Rows y and y + 8 in the halves: columns -2..13, and columns 6..21, from six rows that move
-    // down.
-    __m512i left[6], right[6];
-    const auto load_row = [&](int slot, int y) {
-        const uint8_t* row = src + y * stride;
-        const uint8_t* later = row + 8 * stride;
-        left[slot] = _mm512_cvtepu8_epi16(join(load_16(row - 2), load_16(later - 2)));
-        right[slot] = _mm512_cvtepu8_epi16(join(load_16(row + 6), load_16(later + 6)));
-    };
-    for (int i = 0; i < 5; ++i) {
-        load_row(i, i - 2);
-    }
-    for (int y = 0; y < 8; ++y) {
-        load_row(5, y + 3);
-        const __m512i a = vertical_sums(left);
-        const __m512i b = vertical_sums(right);
-        // Sums that start n columns later.
-        const __m512i a1 = _mm512_alignr_epi8(b, a, 2), a2 = _mm512_alignr_epi8(b, a, 4);
-        const __m512i a3 = _mm512_alignr_epi8(b, a, 6), a4 = _mm512_alignr_epi8(b, a, 8);
-        const __m512i a5 = _mm512_alignr_epi8(b, a, 10);
-        const __m512i samples = centre_samples(_mm512_add_epi16(a, a5), _mm512_add_epi16(a1, a4),
-                                               _mm512_add_epi16(a2, a3));
-        const __m256i rows = to_samples(samples);
-        store_16(pred + 16 * y, _mm256_castsi256_si128(rows));
-        store_16(pred + 16 * y + 128, _mm256_extracti128_si256(rows, 1));
-        for (int i = 0; i < 5; ++i) {
-            left[i] = left[i + 1];
-            right[i] = right[i + 1];
-        }
-    }
-}
-
 void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t stride, int fx,
                 int fy) {
     const __m512i columns = _mm512_set1_epi16(static_cast<short>((8 - fx) | fx << 8));
@@ -155,7 +100,6 @@ void chroma_8x8(uint8_t* pred, const uint8_t* u, const uint8_t* v, ptrdiff_t str
 void avx512::fill_prediction(Kernels& table) {
     table.half_vertical_row = half_vertical_row;
     table.half_horizontal_row = half_horizontal_row;
-    table.centre_16x16 = centre_16x16;
     table.chroma_8x8 = chroma_8x8;
 }
 
