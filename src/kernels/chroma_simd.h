@@ -3,9 +3,9 @@
 #include "kernels/Kernels.h"
 #include "kernels/avx2.h"
 
-// The chroma DC coefficients of both components in one vector of 32-bit values, for the files
-// compiled for AVX2 and AVX-512 (avx2.h): those of the four blocks of Cb in the low lane, of Cr in
-// the high one.
+// What code_chroma of the files compiled for AVX2 and for AVX-512 shares (avx2.h). The chroma DC
+// coefficients of both components stand in one vector of 32-bit values: those of the four blocks of
+// Cb in the low lane, of Cr in the high one.
 namespace zolt {
 namespace {
 
@@ -46,17 +46,20 @@ inline std::uint32_t code_chroma_dc(__m256i* dc, const Quantizer& quantizer, std
     return ~static_cast<std::uint32_t>(_mm_movemask_epi8(_mm_packs_epi16(zeros, zeros))) & 0xff;
 }
 
-// In the low 16 bits of every 64, blocks in order.
-inline __m256i constants_of_blocks(__m128i dc) {
-    return _mm256_and_si256(_mm256_cvtepu32_epi64(dc), _mm256_set1_epi64x(0xffff));
+// Both components' prediction as their reconstruction.
+inline void copy_prediction(const Chroma& chroma) {
+    for (int c = 0; c < 2; ++c) {
+        for (int y = 0; y < 8; ++y) {
+            store_8(chroma.dst[c] + y * chroma.dst_stride, load_8(chroma.pred + 64 * c + 8 * y));
+        }
+    }
 }
 
-// Residual samples of blocks that have nothing but a constant coefficient (clause 8.5.12.2).
-inline __m256i constant_residual(__m256i constants) {
-    const __m256i to_all =
-        _mm256_broadcastsi128_si256(_mm_setr_epi8(0, 1, 0, 1, 0, 1, 0, 1, 8, 9, 8, 9, 8, 9, 8, 9));
-    return _mm256_srai_epi16(
-        _mm256_add_epi16(_mm256_shuffle_epi8(constants, to_all), _mm256_set1_epi16(32)), 6);
+// Rows y and y + 4 of a component's reconstruction.
+inline void store_two_rows(const Chroma& chroma, int component, int y, __m128i samples) {
+    std::uint8_t* const row = chroma.dst[component] + y * chroma.dst_stride;
+    store_8(row, samples);
+    store_8(row + 4 * chroma.dst_stride, _mm_unpackhi_epi64(samples, samples));
 }
 
 }  // namespace

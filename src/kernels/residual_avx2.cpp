@@ -276,7 +276,21 @@ __m256i two_rows_of_8(const uint8_t* p, ptrdiff_t stride) {
     blocks_to_columns(scaled, v);
 }
 
-uint32_t code_chroma(const Chroma& chroma) {
+// In the low 16 bits of every 64, blocks in order.
+__m256i constants_of_blocks(__m128i dc) {
+    return _mm256_and_si256(_mm256_cvtepu32_epi64(dc), _mm256_set1_epi64x(0xffff));
+}
+
+// Residual samples of blocks that have nothing but a constant coefficient (clause 8.5.12.2).
+__m256i constant_residual(__m256i constants) {
+    const __m256i to_all =
+        _mm256_broadcastsi128_si256(_mm_setr_epi8(0, 1, 0, 1, 0, 1, 0, 1, 8, 9, 8, 9, 8, 9, 8, 9));
+    return _mm256_srai_epi16(
+        _mm256_add_epi16(_mm256_shuffle_epi8(constants, to_all), _mm256_set1_epi16(32)), 6);
+}
+
+uint32_t code_chroma(const Chroma& macroblock) {
+    const Chroma chroma = macroblock;  // a copy, which no store can change
     const Quantizer& quantizer = *chroma.quantizer;
     __m256i v[2][4];  // of each component what code_four has
     uint32_t ac_mask = 0;
@@ -299,10 +313,7 @@ uint32_t code_chroma(const Chroma& chroma) {
     store_16(chroma.nonzero, _mm_setzero_si128());
     const uint32_t levels = code_chroma_dc(&dc, quantizer, chroma.dc);
     if ((ac_mask | levels) == 0) {
-        for (int y = 0; y < 8; ++y) {
-            store_8(chroma.dst[0] + y * chroma.dst_stride, load_8(chroma.pred + 8 * y));
-            store_8(chroma.dst[1] + y * chroma.dst_stride, load_8(chroma.pred + 64 + 8 * y));
-        }
+        copy_prediction(chroma);
         return 0;
     }
 
@@ -318,17 +329,14 @@ uint32_t code_chroma(const Chroma& chroma) {
                       chroma.nonzero + 4 * c);
         v[c][0] = _mm256_or_si256(v[c][0], constants[c]);
         if (!inverse_four(v[c])) {
-            return scalar_kernels().code_chroma(chroma);  // nothing is stored at dst yet
+            return scalar_kernels().code_chroma(macroblock);  // nothing is stored at dst yet
         }
     }
     for (int c = 0; c < 2; ++c) {
         for (int y = 0; y < 4; ++y) {
-            uint8_t* const row = chroma.dst[c] + y * chroma.dst_stride;
             const __m256i sum =
                 _mm256_add_epi16(v[c][y], two_rows_of_8(chroma.pred + 64 * c + 8 * y, 8));
-            const __m128i samples = _mm_packus_epi16(low_lane(sum), high_lane(sum));
-            store_8(row, samples);
-            store_8(row + 4 * chroma.dst_stride, _mm_unpackhi_epi64(samples, samples));
+            store_two_rows(chroma, c, y, _mm_packus_epi16(low_lane(sum), high_lane(sum)));
         }
     }
     return ac_mask | levels << 8;
