@@ -199,21 +199,6 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
     return coded;
 }
 
-// From eight blocks in decoding order to their columns, as code_eight has them.
-[[gnu::always_inline]] inline void blocks_to_columns(const __m512i* b, __m512i* v) {
-    const __m512i first = _mm512_setr_epi64(0, 4, 8, 12, 1, 5, 9, 13);
-    const __m512i last = _mm512_setr_epi64(2, 6, 10, 14, 3, 7, 11, 15);
-    const __m512i upper_01 = _mm512_permutex2var_epi64(b[0], first, b[2]);
-    const __m512i upper_23 = _mm512_permutex2var_epi64(b[0], last, b[2]);
-    const __m512i lower_01 = _mm512_permutex2var_epi64(b[1], first, b[3]);
-    const __m512i lower_23 = _mm512_permutex2var_epi64(b[1], last, b[3]);
-    constexpr int kLow = _MM_SHUFFLE(1, 0, 1, 0), kHigh = _MM_SHUFFLE(3, 2, 3, 2);
-    v[0] = _mm512_shuffle_i64x2(upper_01, lower_01, kLow);
-    v[1] = _mm512_shuffle_i64x2(upper_01, lower_01, kHigh);
-    v[2] = _mm512_shuffle_i64x2(upper_23, lower_23, kLow);
-    v[3] = _mm512_shuffle_i64x2(upper_23, lower_23, kHigh);
-}
-
 // From the columns of eight blocks to the rows of their residual. Returns false when 16-bit sums
 // might not be exact: no sum of the inverse transform, rounding included, exceeds the sum of a
 // block's magnitudes.
@@ -234,38 +219,6 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
         rows[y] = _mm512_srai_epi16(_mm512_add_epi16(rows[y], _mm512_set1_epi16(32)), 6);
     }
     return true;
-}
-
-void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
-                       ptrdiff_t stride) {
-    constexpr __mmask8 kBlocks[4] = {0, 0x0f, 0xf0, 0xff};
-    for (int first = 0; first < 16; first += 8) {
-        const uint8_t* half_pred = pred + 16 * first;
-        uint8_t* half_dst = dst + first * stride;
-        if ((mask >> first & 0xff) == 0) {
-            for (int y = 0; y < 8; ++y) {
-                store_16(half_dst + y * stride, load_16(half_pred + 16 * y));
-            }
-            continue;
-        }
-        __m512i blocks[4];
-        for (int i = 0; i < 4; ++i) {
-            const int b = first + 2 * i;
-            blocks[i] = _mm512_maskz_loadu_epi64(kBlocks[mask >> b & 3], coefs + 16 * b);
-        }
-        __m512i rows[4];
-        blocks_to_columns(blocks, rows);
-        if (!inverse_eight(rows)) {
-            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
-            return;
-        }
-        for (int y = 0; y < 4; ++y) {
-            const __m256i samples =
-                to_samples(_mm512_add_epi16(rows[y], two_rows(half_pred + 16 * y, 16)));
-            store_16(half_dst + y * stride, _mm256_castsi256_si128(samples));
-            store_16(half_dst + (y + 4) * stride, _mm256_extracti128_si256(samples, 1));
-        }
-    }
 }
 
 // Rows y and y + 4 of Cb in the low half, of Cr in the high one.
@@ -322,7 +275,6 @@ uint32_t code_chroma(const Chroma& macroblock) {
 
 void avx512::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual_16x16;
-    table.reconstruct_16x16 = reconstruct_16x16;
     table.code_chroma = code_chroma;
 }
 
