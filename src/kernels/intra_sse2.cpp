@@ -1,4 +1,5 @@
 #include "kernels/families.h"
+#include "kernels/hadamard_sse2.h"
 #include "kernels/intra_modes.h"
 #include "kernels/predict_4x4.h"
 #include "kernels/sse2.h"
@@ -29,33 +30,12 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
     }
 }
 
-// 4-point Hadamard transform across four vectors.
-void hadamard(__m128i* v) {
-    const __m128i a = _mm_add_epi32(v[0], v[1]);
-    const __m128i b = _mm_sub_epi32(v[0], v[1]);
-    const __m128i c = _mm_add_epi32(v[2], v[3]);
-    const __m128i d = _mm_sub_epi32(v[2], v[3]);
-    v[0] = _mm_add_epi32(a, c);
-    v[1] = _mm_add_epi32(b, d);
-    v[2] = _mm_sub_epi32(a, c);
-    v[3] = _mm_sub_epi32(b, d);
-}
-
 void hadamard_energy(const int32_t* values, int32_t* energy) {
     __m128i v[4];
     for (int i = 0; i < 4; ++i) {
         v[i] = load(values + 4 * i);
     }
-    hadamard(v);
-    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
-    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
-    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
-    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
-    v[0] = _mm_unpacklo_epi64(a, c);
-    v[1] = _mm_unpackhi_epi64(a, c);
-    v[2] = _mm_unpacklo_epi64(b, d);
-    v[3] = _mm_unpackhi_epi64(b, d);
-    hadamard(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
+    hadamard_4x4(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
     for (__m128i& row : v) {
         row = _mm_srli_epi32(_mm_add_epi32(absolute_32(row), _mm_set1_epi32(8)), 4);
     }

@@ -2,6 +2,7 @@
 
 #include "kernels/chroma_dc.h"
 #include "kernels/families.h"
+#include "kernels/hadamard_sse2.h"
 #include "kernels/sse2.h"
 #include "kernels/zigzag.h"
 
@@ -105,30 +106,6 @@ uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int1
     return static_cast<uint16_t>(nonzero_16(load(scan), load(scan + 8)));
 }
 
-// 4x4 Hadamard transform across four vectors.
-void hadamard_butterfly(__m128i* v) {
-    const __m128i a = _mm_add_epi32(v[0], v[1]);
-    const __m128i b = _mm_sub_epi32(v[0], v[1]);
-    const __m128i c = _mm_add_epi32(v[2], v[3]);
-    const __m128i d = _mm_sub_epi32(v[2], v[3]);
-    v[0] = _mm_add_epi32(a, c);
-    v[1] = _mm_sub_epi32(a, c);
-    v[2] = _mm_sub_epi32(b, d);
-    v[3] = _mm_add_epi32(b, d);
-}
-
-// Exchanges rows and columns.
-void transpose_32(__m128i* v) {
-    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
-    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
-    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
-    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
-    v[0] = _mm_unpacklo_epi64(a, c);
-    v[1] = _mm_unpackhi_epi64(a, c);
-    v[2] = _mm_unpacklo_epi64(b, d);
-    v[3] = _mm_unpackhi_epi64(b, d);
-}
-
 uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* coefs,
                       int16_t* scan) {
     // Block rows of the macroblock: in decoding order blocks 0, 1, 4, 5 and 2, 3, 6, 7 stand side
@@ -138,9 +115,7 @@ uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* co
     const auto low_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpacklo_epi16(x, x), 16); };
     const auto high_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpackhi_epi16(x, x), 16); };
     __m128i v[4] = {low_32(upper), high_32(upper), low_32(lower), high_32(lower)};
-    hadamard_butterfly(v);
-    transpose_32(v);
-    hadamard_butterfly(v);  // now vector j holds column j
+    hadamard_4x4(v);  // now vector j holds column j
 
     // 16-bit factors of values that have 16 bits, the sign included: products of pairs with 0.
     const __m128i forward = _mm_set1_epi32(quantizer.forward[0]);
@@ -168,9 +143,7 @@ uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* co
         scan[n] = levels[kZigzag[n]];
     }
 
-    hadamard_butterfly(v);
-    transpose_32(v);
-    hadamard_butterfly(v);
+    hadamard_4x4(v);
     for (__m128i& row : v) {
         row = _mm_srai_epi32(_mm_add_epi32(row, _mm_set1_epi32(2)), 2);
     }
