@@ -140,8 +140,8 @@ __m256i without_constants(__m256i first_column) {
 }
 
 // Codes a row of four luma blocks from the rows of their residual; dc, coefs, scan and nonzero are
-// those of the first. Returns the mask of the coded ones. The blocks are the first and those 1, 4
-// and 5 after it in decoding order (Figure 6-10).
+// those of the first, the masks 0 before. Returns the mask of the coded ones. The blocks are the
+// first and those 1, 4 and 5 after it in decoding order (Figure 6-10).
 [[gnu::always_inline]] inline uint32_t code_four(__m256i* v, const Quantizer& quantizer,
                                                  int16_t* dc, int16_t* coefs, int16_t* scan,
                                                  uint16_t* nonzero) {
@@ -155,9 +155,8 @@ __m256i without_constants(__m256i first_column) {
         v[0] = without_constants(v[0]);
     }
     const unsigned coded = blocks_with_levels(v, quantizer);
-    for (const int place : kPlace) {
-        nonzero[place] = 0;
-        if (dc) {
+    if (dc) {
+        for (const int place : kPlace) {
             store_32(coefs + 16 * place, _mm256_setzero_si256());
         }
     }
@@ -187,6 +186,7 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
                              const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
                              uint16_t* nonzero) {
     uint32_t coded = 0;
+    store_32(nonzero, _mm256_setzero_si256());
     for (int r = 0; r < 4; ++r, src += 4 * stride, pred += 64) {
         __m256i v[4];
         for (int y = 0; y < 4; ++y) {
