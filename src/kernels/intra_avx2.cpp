@@ -1,8 +1,9 @@
-// Compiled for AVX2: nothing but intrinsics and functions of this file and of avx2.h, so that no
-// inline function that other files share is emitted with instructions that an older processor
-// lacks.
+// Compiled for AVX2: nothing but intrinsics and functions of this file, of avx2.h and of
+// hadamard_simd.h, so that no inline function that other files share is emitted with instructions
+// that an older processor lacks.
 #include "kernels/avx2.h"
 #include "kernels/families.h"
+#include "kernels/hadamard_simd.h"
 
 namespace zolt {
 namespace {
@@ -25,6 +26,10 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
         const __m256i quads = _mm256_madd_epi16(pairs, ones);
         store_16(sums + 4 * block_row, _mm_add_epi32(low_lane(quads), high_lane(quads)));
     }
+}
+
+__m128i absolute_32(__m128i v) {
+    return _mm_abs_epi32(v);
 }
 
 // ---- Intra 16x16 and chroma ----
@@ -305,6 +310,7 @@ void intra_chroma_modes(const uint8_t* u, const uint8_t* v, ptrdiff_t stride, bo
 
 void avx2::fill_intra(Kernels& table) {
     table.block_sums = block_sums;
+    table.hadamard_energy = hadamard_energy_by<absolute_32>;
     table.intra_16x16_modes = intra_16x16_modes;
     table.intra_chroma_modes = intra_chroma_modes;
 }

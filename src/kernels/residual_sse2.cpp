@@ -2,7 +2,7 @@
 
 #include "kernels/chroma_dc.h"
 #include "kernels/families.h"
-#include "kernels/hadamard_sse2.h"
+#include "kernels/hadamard_simd.h"
 #include "kernels/sse2.h"
 #include "kernels/zigzag.h"
 
