@@ -103,6 +103,19 @@ const zolt::Quantizer& quantizer() {
     return zolt::inter_quantizer(kQp);
 }
 
+void code_chroma(const Kernels& k, Arena& a) {
+    std::uint8_t* const dst = a.current + 16 * kStride;
+    benchmark::DoNotOptimize(k.code_chroma({{a.current, a.current + 16},
+                                            kStride,
+                                            a.pred,
+                                            {dst, dst + 16},
+                                            kStride,
+                                            &quantizer(),
+                                            a.scan,
+                                            a.nonzero,
+                                            a.dc}));
+}
+
 // A macroblock in the middle of a picture, its samples new each time.
 void run_code_intra_4x4(const Kernels& k, Arena& a) {
     for (int y = 0; y < 16; ++y) {
@@ -173,11 +186,6 @@ constexpr Case kCases[] = {
          benchmark::DoNotOptimize(k.code_residual_16x16(a.current, kStride, a.pred, quantizer(),
                                                         nullptr, a.coefs, a.scan, a.nonzero));
      }},
-    {"code_residual_8x8",
-     [](const Kernels& k, Arena& a) {
-         benchmark::DoNotOptimize(k.code_residual_8x8(a.current, kStride, a.pred, quantizer(), a.dc,
-                                                      a.coefs, a.scan, a.nonzero));
-     }},
     {"code_residual_4x4",
      [](const Kernels& k, Arena& a) {
          benchmark::DoNotOptimize(k.code_residual_4x4(a.current, kStride, a.pred, quantizer(),
@@ -191,12 +199,9 @@ constexpr Case kCases[] = {
      [](const Kernels& k, Arena& a) {
          k.reconstruct_16x16(a.coefs, 0xffff, a.pred, a.current, kStride);
      }},
-    {"reconstruct_8x8",
-     [](const Kernels& k, Arena& a) {
-         k.reconstruct_8x8(a.coefs, 15, a.pred, a.current, kStride);
-     }},
     {"reconstruct_4x4",
      [](const Kernels& k, Arena& a) { k.reconstruct_4x4(a.coefs, a.pred, a.current, kStride); }},
+    {"code_chroma", code_chroma},
     {"block_sums", [](const Kernels& k, Arena& a) { k.block_sums(a.current, kStride, a.sums); }},
     {"hadamard_energy", [](const Kernels& k, Arena& a) { k.hadamard_energy(a.values, a.sums); }},
     {"intra_16x16_modes",

@@ -58,8 +58,6 @@ public:
     void quantTransform_luma_16x16(const std::uint8_t* pred);
     void quantTransform_luma_16x16P();
     void quantTransform_chroma(const std::uint8_t* pred);
-    std::uint32_t quantize_chroma_dc(int component, const std::int16_t* c,
-                                     const zolt::Quantizer& quantizer, std::int16_t* coefs);
 
     // ---- intrapredict: clause 8.3 ----
     // The 13 neighbours of the 4x4 block at src: L, K, J, I, M, A..H. Where A..D or I..L or M are
@@ -163,22 +161,22 @@ public:
     // Those of an intra macroblock by mode, luma, and Cb and Cr.
     alignas(64) std::uint8_t g_intra_pred_16x16[4][256] = {};
     alignas(64) std::uint8_t g_intra_pred_chroma[4][128] = {};
-    // Scaled coefficients (level * dequant) of luma blocks 0..15 in decoding order and of the four
-    // blocks of Cb and of Cr; inside a block column by column. Those of a block without levels are
-    // left over from others, or 0 where the DC coefficients have a transform of their own.
-    alignas(64) std::int16_t g_mb_coefs[24 * 16] = {};
-    // Levels of the same blocks in zig-zag order, left over from others where a block has none, and
-    // masks of the levels that are not 0.
+    // Scaled coefficients (level * dequant) of luma blocks 0..15 in decoding order; inside a block
+    // column by column. Those of a block without levels are left over from others, or 0 where the
+    // DC coefficients have a transform of their own.
+    alignas(64) std::int16_t g_mb_coefs[16 * 16] = {};
+    // Levels of the same blocks, and of the four of Cb and of Cr, in zig-zag order, left over from
+    // others where a block has none, and masks of the levels that are not 0.
     alignas(64) std::int16_t g_scan_levels[24 * 16] = {};
     std::uint16_t g_nonzero[24] = {};
-    // DC levels: intra 16x16 in zig-zag order, with the mask of those that are not 0, chroma in
-    // raster order.
+    // DC levels: intra 16x16 in zig-zag order, with the mask of those that are not 0, Cb
+    // and then Cr in raster order.
     std::int16_t g_luma_dc[16] = {};
     std::uint16_t g_luma_dc_nonzero = 0;
-    std::int16_t g_chroma_dc[2][4] = {};
+    std::int16_t g_chroma_dc[8] = {};
     // Coded-block masks: bit per block with levels (without the DC levels above).
     unsigned g_luma_mask = 0, g_chroma_ac_mask = 0;
-    unsigned g_chroma_dc_mask = 0;  // bit 0 Cb, bit 1 Cr
+    unsigned g_chroma_dc_mask = 0;  // of the chroma DC levels that are not 0
 
     // Block-sum features of the learned decisions: sums of the 4x4 blocks in raster order, and
     // energy of their Hadamard transform (Kernels::hadamard_energy).

@@ -106,15 +106,6 @@ private:
     alignas(kStride) std::uint8_t m_counts[(kSide + 1) * kStride] = {};
 };
 
-// Of the DC levels of a chroma component.
-unsigned nonzero_mask(const std::int16_t* levels) {
-    unsigned mask = 0;
-    for (int n = 0; n < 4; ++n) {
-        mask |= (levels[n] != 0 ? 1u : 0u) << n;
-    }
-    return mask;
-}
-
 }  // namespace
 
 void MacroblockCoder::writeMBSyntax() {
@@ -204,9 +195,9 @@ void MacroblockCoder::encodeBlock() {
     const int chroma = g_coded_block_pattern >> 4;
     if (chroma != 0) {
         for (int component = 0; component < 2; ++component) {
-            const std::int16_t* dc = g_chroma_dc[component];
-            const bool coded = (g_chroma_dc_mask >> component & 1) != 0;
-            zolt::encodeCAVLCBlock4x4(out, dc, coded ? nonzero_mask(dc) : 0u, 4, zolt::kNcChromaDc);
+            zolt::encodeCAVLCBlock4x4(out, g_chroma_dc + 4 * component,
+                                      g_chroma_dc_mask >> (4 * component) & 0xf, 4,
+                                      zolt::kNcChromaDc);
         }
     }
     if (chroma == 2) {

@@ -70,13 +70,6 @@ int coefficient_cost(const std::int16_t* scan, unsigned nonzero, int cost) {
     return cost;
 }
 
-// Level of a DC value: the rounding offset is doubled and the shift one larger than for AC.
-int quantize_dc(int value, const Quantizer& q) {
-    const int magnitude = std::min(
-        (std::abs(value) * q.forward[0] + 2 * q.rounding) >> (q.shift + 1), zolt::kMaxLevel);
-    return value < 0 ? -magnitude : magnitude;
-}
-
 }  // namespace
 
 const zolt::Quantizer& zolt::intra_quantizer(int qp) {
@@ -156,47 +149,16 @@ void MacroblockCoder::quantTransform_chroma(const std::uint8_t* pred) {
     const int qp = zolt::QP_SCALE_CR[picture.g_mbQp];
     const Quantizer& q =
         picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
-    g_chroma_ac_mask = 0;
-    g_chroma_dc_mask = 0;
-    for (int component = 0; component < 2; ++component) {
-        std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
-        std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
-        std::int16_t dc[4];
-        const std::uint32_t ac_mask = g_kernels->code_residual_8x8(
-            samples, picture.g_stride_chroma, pred, q, dc, coefs,
-            g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
-        const std::uint32_t dc_mask = quantize_chroma_dc(component, dc, q, coefs);
-        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples,
-                                   picture.g_stride_chroma);
-        g_chroma_ac_mask |= ac_mask << (4 * component);
-        pred += 64;
-    }
-}
-
-// The DC coefficients c of a component's four blocks have a 2x2 transform of their own. Writes
-// their levels, and their scaled values to coefs; returns the mask of the blocks that have one.
-std::uint32_t MacroblockCoder::quantize_chroma_dc(int component, const std::int16_t* c,
-                                                  const Quantizer& quantizer, std::int16_t* coefs) {
-    const int f[4] = {c[0] + c[1] + c[2] + c[3], c[0] - c[1] + c[2] - c[3],
-                      c[0] + c[1] - c[2] - c[3], c[0] - c[1] - c[2] + c[3]};
-    const int largest = std::max({std::abs(f[0]), std::abs(f[1]), std::abs(f[2]), std::abs(f[3])});
-    if (largest <= quantizer.dc_dead_zone) {
-        return 0;
-    }
-    g_chroma_dc_mask |= 1u << component;
-    int d[4];
-    for (int b = 0; b < 4; ++b) {
-        const int level = quantize_dc(f[b], quantizer);
-        g_chroma_dc[component][b] = static_cast<std::int16_t>(level);
-        d[b] = level * quantizer.dequant[0];
-    }
-    const int dc[4] = {d[0] + d[1] + d[2] + d[3], d[0] - d[1] + d[2] - d[3],
-                       d[0] + d[1] - d[2] - d[3], d[0] - d[1] - d[2] + d[3]};
-    std::uint32_t mask = 0;
-    for (int b = 0; b < 4; ++b) {
-        const int value = dc[b] >> 1;
-        coefs[16 * b] = static_cast<std::int16_t>(value);
-        mask |= (value != 0 ? 1u : 0u) << b;
-    }
-    return mask;
+    const std::ptrdiff_t stride = picture.g_stride_chroma;
+    const std::uint32_t coded = g_kernels->code_chroma({{g_mb_src_u, g_mb_src_v},
+                                                        stride,
+                                                        pred,
+                                                        {g_mb_src_u, g_mb_src_v},
+                                                        stride,
+                                                        &q,
+                                                        g_scan_levels + 256,
+                                                        g_nonzero + 16,
+                                                        g_chroma_dc});
+    g_chroma_ac_mask = coded & 0xff;
+    g_chroma_dc_mask = coded >> 8;
 }

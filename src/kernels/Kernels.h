@@ -84,6 +84,22 @@ struct Intra4x4 {
     std::uint16_t* nonzero;
 };
 
+// A macroblock's chroma for Kernels::code_chroma; of two pointers the first is Cb's.
+struct Chroma {
+    const std::uint8_t* src[2];  // 8x8 samples each, of which no other ones are read
+    std::ptrdiff_t src_stride;
+    const std::uint8_t* pred;  // the 8x8 prediction of Cb and after it that of Cr
+    std::uint8_t* dst[2];      // of the reconstruction; may be src
+    std::ptrdiff_t dst_stride;
+    const Quantizer* quantizer;
+
+    // Results: AC levels in zig-zag order, behind a 0, and the masks of those that are not 0, of
+    // the four blocks of Cb in raster order and then of Cr; four DC levels of Cb and four of Cr.
+    std::int16_t* scan;
+    std::uint16_t* nonzero;
+    std::int16_t* dc;
+};
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
@@ -156,21 +172,16 @@ struct Kernels {
     // ---- Residual ----
 
     // Prediction error, forward core transform and quantiser of the 16 luma blocks of a macroblock
-    // in decoding order (Figure 6-10), of the four blocks of an 8x8 chroma component in raster
-    // order, and of one 4x4 block: level = sign(c) * min((|c| * forward + rounding) >> shift,
-    // kMaxLevel). Bit b of the result: block b has a level other than 0. Writes such a block's
-    // levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to coefs; of every
-    // block, the mask of the levels that are not 0 to nonzero (bit n: scan position n). With dc,
-    // which takes one value a block, the constant coefficients go there and 0 stands in for them,
-    // and the coefficients of blocks without levels are set to 0.
+    // in decoding order (Figure 6-10), and of one 4x4 block: level = sign(c) * min((|c| * forward +
+    // rounding) >> shift, kMaxLevel). Bit b of the result: block b has a level other than 0. Writes
+    // such a block's levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to
+    // coefs; of every block, the mask of the levels that are not 0 to nonzero (bit n: scan position
+    // n). With dc, which takes one value a block, the constant coefficients go there and 0 stands
+    // in for them, and the coefficients of blocks without levels are set to 0.
     std::uint32_t (*code_residual_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
                                          const std::uint8_t* pred, const Quantizer& quantizer,
                                          std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
                                          std::uint16_t* nonzero);
-    std::uint32_t (*code_residual_8x8)(const std::uint8_t* src, std::ptrdiff_t stride,
-                                       const std::uint8_t* pred, const Quantizer& quantizer,
-                                       std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
-                                       std::uint16_t* nonzero);
     std::uint32_t (*code_residual_4x4)(const std::uint8_t* src, std::ptrdiff_t stride,
                                        const std::uint8_t* pred, const Quantizer& quantizer,
                                        std::int16_t* coefs, std::int16_t* scan,
@@ -190,10 +201,15 @@ struct Kernels {
     // 2^15.
     void (*reconstruct_16x16)(const std::int16_t* coefs, std::uint32_t mask,
                               const std::uint8_t* pred, std::uint8_t* dst, std::ptrdiff_t stride);
-    void (*reconstruct_8x8)(const std::int16_t* coefs, std::uint32_t mask, const std::uint8_t* pred,
-                            std::uint8_t* dst, std::ptrdiff_t stride);
     void (*reconstruct_4x4)(const std::int16_t* coefs, const std::uint8_t* pred, std::uint8_t* dst,
                             std::ptrdiff_t stride);
+
+    // Both chroma components from prediction error to reconstruction (clauses 8.5.4, 8.5.11): AC
+    // levels as code_residual_16x16 has them with dc; DC levels are those of the 2x2 transform of
+    // a component's constant coefficients, by the quantiser of code_luma_dc. Writes the levels of
+    // blocks that have any to scan, masks and DC levels always. Bit b of the result: block b has an
+    // AC level other than 0; bit 8 + n: DC level n is not 0.
+    std::uint32_t (*code_chroma)(const Chroma& chroma);
 
     // ---- Features and distortions of the intra decisions ----
 

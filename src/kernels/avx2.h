@@ -43,14 +43,6 @@ inline __m128i low_lane(__m256i v) {
     return _mm256_castsi256_si128(v);
 }
 
-// Rows y and y + 1 of a 4x4 block.
-inline __m128i two_rows_of_4(const std::uint8_t* p, std::ptrdiff_t stride) {
-    std::int32_t upper, lower;
-    __builtin_memcpy(&upper, p, sizeof upper);
-    __builtin_memcpy(&lower, p + stride, sizeof lower);
-    return _mm_cvtepu8_epi16(_mm_insert_epi32(_mm_cvtsi32_si128(upper), lower, 1));
-}
-
 // Puts 16 coefficients kept column by column, positions 0..7 and 8..15, into zig-zag order
 // (Kernels.h, zigzag.h): 0 4 1 2 5 8 12 9, then 6 3 7 10 13 14 11 15.
 inline void zigzag(__m128i low, __m128i high, __m128i* first, __m128i* second) {

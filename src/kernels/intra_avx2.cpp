@@ -1,8 +1,9 @@
-// Compiled for AVX2: nothing but intrinsics and functions of this file and of avx2.h, so that no
-// inline function that other files share is emitted with instructions that an older processor
-// lacks.
+// Compiled for AVX2: nothing but intrinsics and functions of this file, of avx2.h and of
+// hadamard_simd.h, so that no inline function that other files share is emitted with instructions
+// that an older processor lacks.
 #include "kernels/avx2.h"
 #include "kernels/families.h"
+#include "kernels/hadamard_simd.h"
 
 namespace zolt {
 namespace {
@@ -27,38 +28,8 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
     }
 }
 
-// 4-point Hadamard transform across four vectors.
-void hadamard(__m128i* v) {
-    const __m128i a = _mm_add_epi32(v[0], v[1]);
-    const __m128i b = _mm_sub_epi32(v[0], v[1]);
-    const __m128i c = _mm_add_epi32(v[2], v[3]);
-    const __m128i d = _mm_sub_epi32(v[2], v[3]);
-    v[0] = _mm_add_epi32(a, c);
-    v[1] = _mm_add_epi32(b, d);
-    v[2] = _mm_sub_epi32(a, c);
-    v[3] = _mm_sub_epi32(b, d);
-}
-
-void hadamard_energy(const int32_t* values, int32_t* energy) {
-    __m128i v[4] = {load_16(values), load_16(values + 4), load_16(values + 8),
-                    load_16(values + 12)};
-    hadamard(v);
-    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]), b = _mm_unpackhi_epi32(v[0], v[1]);
-    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]), d = _mm_unpackhi_epi32(v[2], v[3]);
-    v[0] = _mm_unpacklo_epi64(a, c);
-    v[1] = _mm_unpackhi_epi64(a, c);
-    v[2] = _mm_unpacklo_epi64(b, d);
-    v[3] = _mm_unpackhi_epi64(b, d);
-    hadamard(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
-    for (__m128i& row : v) {
-        row = _mm_srli_epi32(_mm_add_epi32(_mm_abs_epi32(row), _mm_set1_epi32(8)), 4);
-    }
-    const __m128i others = _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]);
-    const __m128i low = _mm_unpacklo_epi32(v[0], others);   // lanes 0 of both, lanes 1 of both
-    const __m128i high = _mm_unpackhi_epi32(v[0], others);  // lanes 2, lanes 3
-    const __m128i sums =
-        _mm_add_epi32(_mm_add_epi32(_mm_srli_si128(low, 8), high), _mm_srli_si128(high, 8));
-    store_16(energy, _mm_unpacklo_epi64(low, sums));
+__m128i absolute_32(__m128i v) {
+    return _mm_abs_epi32(v);
 }
 
 // ---- Intra 16x16 and chroma ----
@@ -339,7 +310,7 @@ void intra_chroma_modes(const uint8_t* u, const uint8_t* v, ptrdiff_t stride, bo
 
 void avx2::fill_intra(Kernels& table) {
     table.block_sums = block_sums;
-    table.hadamard_energy = hadamard_energy;
+    table.hadamard_energy = hadamard_energy_by<absolute_32>;
     table.intra_16x16_modes = intra_16x16_modes;
     table.intra_chroma_modes = intra_chroma_modes;
 }

@@ -1,4 +1,5 @@
 #include "kernels/families.h"
+#include "kernels/hadamard_simd.h"
 #include "kernels/intra_modes.h"
 #include "kernels/predict_4x4.h"
 #include "kernels/sse2.h"
@@ -27,44 +28,6 @@ void block_sums(const uint8_t* src, ptrdiff_t stride, int32_t* sums) {
             _mm_packs_epi32(_mm_madd_epi16(low, ones), _mm_madd_epi16(high, ones));
         store(sums + 4 * block_row, _mm_madd_epi16(pairs, ones));
     }
-}
-
-// 4-point Hadamard transform across four vectors.
-void hadamard(__m128i* v) {
-    const __m128i a = _mm_add_epi32(v[0], v[1]);
-    const __m128i b = _mm_sub_epi32(v[0], v[1]);
-    const __m128i c = _mm_add_epi32(v[2], v[3]);
-    const __m128i d = _mm_sub_epi32(v[2], v[3]);
-    v[0] = _mm_add_epi32(a, c);
-    v[1] = _mm_add_epi32(b, d);
-    v[2] = _mm_sub_epi32(a, c);
-    v[3] = _mm_sub_epi32(b, d);
-}
-
-void hadamard_energy(const int32_t* values, int32_t* energy) {
-    __m128i v[4];
-    for (int i = 0; i < 4; ++i) {
-        v[i] = load(values + 4 * i);
-    }
-    hadamard(v);
-    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
-    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
-    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
-    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
-    v[0] = _mm_unpacklo_epi64(a, c);
-    v[1] = _mm_unpackhi_epi64(a, c);
-    v[2] = _mm_unpacklo_epi64(b, d);
-    v[3] = _mm_unpackhi_epi64(b, d);
-    hadamard(v);  // now vector j holds horizontal frequency j, lane i vertical frequency i
-    for (__m128i& row : v) {
-        row = _mm_srli_epi32(_mm_add_epi32(absolute_32(row), _mm_set1_epi32(8)), 4);
-    }
-    const __m128i others = _mm_add_epi32(_mm_add_epi32(v[1], v[2]), v[3]);
-    const __m128i low = _mm_unpacklo_epi32(v[0], others);   // lanes 0 of both, lanes 1 of both
-    const __m128i high = _mm_unpackhi_epi32(v[0], others);  // lanes 2, lanes 3
-    const __m128i sums =
-        _mm_add_epi32(_mm_add_epi32(_mm_srli_si128(low, 8), high), _mm_srli_si128(high, 8));
-    store(energy, _mm_unpacklo_epi64(low, sums));
 }
 
 void phase_sad_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
@@ -159,7 +122,7 @@ void intra_4x4_modes(const uint8_t* src, ptrdiff_t stride, const uint8_t* neighb
 
 void sse2::fill_intra(Kernels& table) {
     table.block_sums = block_sums;
-    table.hadamard_energy = hadamard_energy;
+    table.hadamard_energy = hadamard_energy_by<absolute_32>;
     table.intra_16x16_modes = intra_16x16_modes_by<phase_sad_16x16>;
     table.intra_chroma_modes = intra_chroma_modes_by<phase_satd_8x8>;
     table.phase_satd_4x4 = phase_satd_4x4;

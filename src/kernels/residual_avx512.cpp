@@ -1,7 +1,8 @@
 // Compiled for AVX-512 (F, BW, VL, DQ, VBMI): nothing but intrinsics and functions of this file and
-// of avx512.h, so that no inline function that other files share is emitted with instructions that
-// an older processor lacks.
+// of avx512.h and chroma_simd.h, so that no inline function that other files share is emitted with
+// instructions that an older processor lacks.
 #include "kernels/avx512.h"
+#include "kernels/chroma_simd.h"
 #include "kernels/families.h"
 #include "kernels/zigzag.h"
 
@@ -97,52 +98,57 @@ __m512i quantize(__m512i c, const Quantizer& quantizer, int j) {
     return _mm512_mask_sub_epi16(level, _mm512_movepi16_mask(c), _mm512_setzero_si512(), level);
 }
 
-// Codes the eight blocks of two block rows from the rows of their residual. Returns the mask of the
-// coded ones. In decoding order (Figure 6-10) the blocks of the upper row, in the low half, are 0,
-// 1, 4, 5, those of the lower one 2, 3, 6, 7.
-uint32_t code_eight(__m512i* v, const Quantizer& quantizer, int16_t* dc, int16_t* coefs,
-                    int16_t* scan, uint16_t* nonzero) {
+// Core transform of the rows of eight blocks: leaves column j of them in vector j, 64 bits a block.
+[[gnu::always_inline]] inline void transform_eight(__m512i* v) {
     forward_butterfly(v);
     transpose_eight(v);
-    forward_butterfly(v);  // now vector j holds column j, 64 bits a block
-    if (dc) {
-        store_16(dc, _mm_shuffle_epi32(_mm512_cvtepi64_epi16(v[0]), _MM_SHUFFLE(3, 1, 2, 0)));
-        v[0] = _mm512_maskz_mov_epi16(0xeeeeeeee, v[0]);
-        for (int b = 0; b < 8; b += 2) {
-            store_64(coefs + 16 * b, _mm512_setzero_si512());
-        }
-    }
-    store_16(nonzero, _mm_setzero_si128());
+    forward_butterfly(v);
+}
+
+__m512i without_constants(__m512i first_column) {
+    return _mm512_maskz_mov_epi16(0xeeeeeeee, first_column);
+}
+
+// Whether any of eight blocks in columns has a level other than 0.
+[[gnu::always_inline]] inline bool have_levels(const __m512i* v, const Quantizer& quantizer) {
     __mmask32 beyond = 0;
     for (int j = 0; j < 4; ++j) {
         beyond |= _mm512_cmpgt_epi16_mask(_mm512_abs_epi16(v[j]), column(quantizer.dead_zone, j));
     }
-    if (beyond == 0) {
-        return 0;
-    }
-    __m512i levels[4], scaled[4];
+    return beyond != 0;
+}
+
+// Quantises eight blocks in columns, which become scaled levels, and stores the levels of those
+// that have any, with coefs their scaled ones too. Returns the mask of those. The blocks in the
+// second lane are number step and step + 1, those in the third 6 - step and 7 - step.
+[[gnu::always_inline]] inline uint32_t quantize_eight(__m512i* v, const Quantizer& quantizer,
+                                                      int step, int16_t* coefs, int16_t* scan,
+                                                      uint16_t* nonzero) {
+    __m512i levels[4];
     for (int j = 0; j < 4; ++j) {
         levels[j] = quantize(v[j], quantizer, j);
-        scaled[j] = _mm512_mullo_epi16(levels[j], column(quantizer.dequant, j));
+        v[j] = _mm512_mullo_epi16(levels[j], column(quantizer.dequant, j));
     }
     uint32_t coded = 0;
     const auto store_block = [&](int b, uint32_t mask, __m256i block_coefs, __m256i block_scan) {
         if (mask != 0) {
             nonzero[b] = static_cast<uint16_t>(mask);
-            store_32(coefs + 16 * b, block_coefs);
             store_32(scan + 16 * b, block_scan);
+            if (coefs) {
+                store_32(coefs + 16 * b, block_coefs);
+            }
             coded |= 1u << b;
         }
     };
     for (int odd = 0; odd < 2; ++odd) {
-        // Columns 0 and 1, and 2 and 3, of blocks 0, 4, 2, 6, or of 1, 5, 3, 7.
+        // Columns 0 and 1, and 2 and 3, of the first or of the second block of every lane.
         const auto two_columns = [=](__m512i left, __m512i right) {
             return odd ? _mm512_unpackhi_epi64(left, right) : _mm512_unpacklo_epi64(left, right);
         };
         const __m512i levels_01 = two_columns(levels[0], levels[1]);
         const __m512i levels_23 = two_columns(levels[2], levels[3]);
-        const __m512i scaled_01 = two_columns(scaled[0], scaled[1]);
-        const __m512i scaled_23 = two_columns(scaled[2], scaled[3]);
+        const __m512i scaled_01 = two_columns(v[0], v[1]);
+        const __m512i scaled_23 = two_columns(v[2], v[3]);
         for (int lane = 0; lane < 2; ++lane) {
             const __m512i zigzag = _mm512_add_epi16(
                 load_64(kZigzagIndices.index), _mm512_set1_epi16(static_cast<short>(8 * lane)));
@@ -151,12 +157,29 @@ uint32_t code_eight(__m512i* v, const Quantizer& quantizer, int16_t* dc, int16_t
             const __m512i in_order = _mm512_permutex2var_epi16(levels_01, zigzag, levels_23);
             const __m512i blocks = _mm512_permutex2var_epi64(scaled_01, by_column, scaled_23);
             const uint32_t mask = _mm512_test_epi16_mask(in_order, in_order);
-            const int b = 4 * lane + odd;
+            const int b = step * lane + odd;
             store_block(b, mask & 0xffff, low_half(blocks), low_half(in_order));
-            store_block(b + 2, mask >> 16, high_half(blocks), high_half(in_order));
+            store_block(b + 6 - step, mask >> 16, high_half(blocks), high_half(in_order));
         }
     }
     return coded;
+}
+
+// Codes the eight blocks of two block rows from the rows of their residual. Returns the mask of the
+// coded ones. In decoding order (Figure 6-10) the blocks of the upper row, in the low half, are 0,
+// 1, 4, 5, those of the lower one 2, 3, 6, 7.
+uint32_t code_eight(__m512i* v, const Quantizer& quantizer, int16_t* dc, int16_t* coefs,
+                    int16_t* scan, uint16_t* nonzero) {
+    transform_eight(v);
+    if (dc) {
+        store_16(dc, _mm_shuffle_epi32(_mm512_cvtepi64_epi16(v[0]), _MM_SHUFFLE(3, 1, 2, 0)));
+        v[0] = without_constants(v[0]);
+        for (int b = 0; b < 8; b += 2) {
+            store_64(coefs + 16 * b, _mm512_setzero_si512());
+        }
+    }
+    store_16(nonzero, _mm_setzero_si128());
+    return have_levels(v, quantizer) ? quantize_eight(v, quantizer, 4, coefs, scan, nonzero) : 0;
 }
 
 uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
@@ -176,21 +199,10 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
     return coded;
 }
 
-// Rows of the residual of eight blocks that stand in decoding order, as code_eight takes them.
-// Returns false when 16-bit sums might not be exact: no sum of the inverse transform, rounding
-// included, exceeds the sum of a block's magnitudes.
-[[gnu::always_inline]] inline bool inverse_eight(const __m512i* b, __m512i* rows) {
-    const __m512i first = _mm512_setr_epi64(0, 4, 8, 12, 1, 5, 9, 13);
-    const __m512i last = _mm512_setr_epi64(2, 6, 10, 14, 3, 7, 11, 15);
-    const __m512i upper_01 = _mm512_permutex2var_epi64(b[0], first, b[2]);
-    const __m512i upper_23 = _mm512_permutex2var_epi64(b[0], last, b[2]);
-    const __m512i lower_01 = _mm512_permutex2var_epi64(b[1], first, b[3]);
-    const __m512i lower_23 = _mm512_permutex2var_epi64(b[1], last, b[3]);
-    constexpr int kLow = _MM_SHUFFLE(1, 0, 1, 0), kHigh = _MM_SHUFFLE(3, 2, 3, 2);
-    rows[0] = _mm512_shuffle_i64x2(upper_01, lower_01, kLow);
-    rows[1] = _mm512_shuffle_i64x2(upper_01, lower_01, kHigh);
-    rows[2] = _mm512_shuffle_i64x2(upper_23, lower_23, kLow);
-    rows[3] = _mm512_shuffle_i64x2(upper_23, lower_23, kHigh);
+// From the columns of eight blocks to the rows of their residual. Returns false when 16-bit sums
+// might not be exact: no sum of the inverse transform, rounding included, exceeds the sum of a
+// block's magnitudes.
+[[gnu::always_inline]] inline bool inverse_eight(__m512i* rows) {
     __m512i sum = _mm512_setzero_si512();
     for (int j = 0; j < 4; ++j) {
         sum = _mm512_adds_epi16(sum, _mm512_abs_epi16(rows[j]));
@@ -209,41 +221,61 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
     return true;
 }
 
-void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
-                       ptrdiff_t stride) {
-    constexpr __mmask8 kBlocks[4] = {0, 0x0f, 0xf0, 0xff};
-    for (int first = 0; first < 16; first += 8) {
-        const uint8_t* half_pred = pred + 16 * first;
-        uint8_t* half_dst = dst + first * stride;
-        if ((mask >> first & 0xff) == 0) {
-            for (int y = 0; y < 8; ++y) {
-                store_16(half_dst + y * stride, load_16(half_pred + 16 * y));
-            }
-            continue;
+// Rows y and y + 4 of Cb in the low half, of Cr in the high one.
+__m512i two_rows_of_8(const uint8_t* u, const uint8_t* v, ptrdiff_t stride) {
+    return _mm512_cvtepu8_epi16(join(_mm_unpacklo_epi64(load_8(u), load_8(u + 4 * stride)),
+                                     _mm_unpacklo_epi64(load_8(v), load_8(v + 4 * stride))));
+}
+
+uint32_t code_chroma(const Chroma& macroblock) {
+    const Chroma chroma = macroblock;  // a copy, which no store can change
+    const Quantizer& quantizer = *chroma.quantizer;
+    __m512i v[4];
+    for (int y = 0; y < 4; ++y) {
+        const ptrdiff_t row = y * chroma.src_stride;
+        v[y] = _mm512_sub_epi16(
+            two_rows_of_8(chroma.src[0] + row, chroma.src[1] + row, chroma.src_stride),
+            two_rows_of_8(chroma.pred + 8 * y, chroma.pred + 64 + 8 * y, 8));
+    }
+    transform_eight(v);
+    __m256i dc = _mm256_cvtepi16_epi32(_mm512_cvtepi64_epi16(v[0]));
+    v[0] = without_constants(v[0]);
+    store_16(chroma.nonzero, _mm_setzero_si128());
+    const bool ac = have_levels(v, quantizer);
+    const uint32_t dc_mask = code_chroma_dc(&dc, quantizer, chroma.dc);
+    const __m512i constants = _mm512_maskz_mov_epi16(0x11111111, _mm512_cvtepi32_epi64(dc));
+    uint32_t ac_mask = 0;
+    if (ac) {
+        ac_mask = quantize_eight(v, quantizer, 2, nullptr, chroma.scan, chroma.nonzero);
+        v[0] = _mm512_or_si512(v[0], constants);
+        if (!inverse_eight(v)) {
+            return scalar_kernels().code_chroma(macroblock);  // nothing is stored at dst yet
         }
-        __m512i blocks[4], rows[4];
-        for (int i = 0; i < 4; ++i) {
-            const int b = first + 2 * i;
-            blocks[i] = _mm512_maskz_loadu_epi64(kBlocks[mask >> b & 3], coefs + 16 * b);
-        }
-        if (!inverse_eight(blocks, rows)) {
-            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
-            return;
-        }
-        for (int y = 0; y < 4; ++y) {
-            const __m256i samples =
-                to_samples(_mm512_add_epi16(rows[y], two_rows(half_pred + 16 * y, 16)));
-            store_16(half_dst + y * stride, _mm256_castsi256_si128(samples));
-            store_16(half_dst + (y + 4) * stride, _mm256_extracti128_si256(samples, 1));
+    } else if (dc_mask != 0) {
+        const __m512i all = _mm512_shuffle_epi8(
+            constants,
+            _mm512_broadcast_i32x4(_mm_setr_epi8(0, 1, 0, 1, 0, 1, 0, 1, 8, 9, 8, 9, 8, 9, 8, 9)));
+        v[0] = _mm512_srai_epi16(_mm512_add_epi16(all, _mm512_set1_epi16(32)), 6);
+        v[1] = v[2] = v[3] = v[0];
+    } else {
+        copy_prediction(chroma);
+        return 0;
+    }
+    for (int y = 0; y < 4; ++y) {
+        const __m512i pred = two_rows_of_8(chroma.pred + 8 * y, chroma.pred + 64 + 8 * y, 8);
+        const __m256i samples = to_samples(_mm512_add_epi16(v[y], pred));
+        for (int c = 0; c < 2; ++c) {
+            store_two_rows(chroma, c, y, c == 0 ? low_lane(samples) : high_lane(samples));
         }
     }
+    return ac_mask | dc_mask << 8;
 }
 
 }  // namespace
 
 void avx512::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual_16x16;
-    table.reconstruct_16x16 = reconstruct_16x16;
+    table.code_chroma = code_chroma;
 }
 
 }  // namespace zolt

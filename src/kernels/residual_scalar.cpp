@@ -2,6 +2,7 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "kernels/chroma_dc.h"
 #include "kernels/clip.h"
 #include "kernels/families.h"
 #include "kernels/zigzag.h"
@@ -133,10 +134,7 @@ uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* co
     for (int n = 0; n < 16; ++n) {
         int& c = v[kZigzag[n]];
         c >>= 1;
-        const int magnitude = std::min(
-            (std::abs(c) * quantizer.forward[0] + 2 * quantizer.rounding) >> (quantizer.shift + 1),
-            kMaxLevel);
-        const int level = c < 0 ? -magnitude : magnitude;
+        const int level = quantize_dc(c, quantizer);
         scan[n] = static_cast<int16_t>(level);
         coded |= (level != 0 ? 1u : 0u) << n;
         c = level * quantizer.dequant[0];
@@ -200,25 +198,34 @@ void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
     reconstruct_blocks(16, coefs, mask, pred, 16, dst, stride);
 }
 
-void reconstruct_8x8(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
-                     ptrdiff_t stride) {
-    reconstruct_blocks(4, coefs, mask, pred, 8, dst, stride);
-}
-
 void reconstruct_4x4(const int16_t* coefs, const uint8_t* pred, uint8_t* dst, ptrdiff_t stride) {
     reconstruct_block(coefs, pred, 4, dst, stride);
+}
+
+uint32_t code_chroma(const Chroma& chroma) {
+    uint32_t coded = 0;
+    for (int c = 0; c < 2; ++c) {
+        const uint8_t* pred = chroma.pred + 64 * c;
+        int16_t dc[4], coefs[64];
+        const uint32_t ac_mask =
+            code_residual<4, 8>(chroma.src[c], chroma.src_stride, pred, *chroma.quantizer, dc,
+                                coefs, chroma.scan + 64 * c, chroma.nonzero + 4 * c);
+        const uint32_t levels = code_chroma_dc(dc, *chroma.quantizer, chroma.dc + 4 * c, coefs);
+        reconstruct_blocks(4, coefs, 0xf, pred, 8, chroma.dst[c], chroma.dst_stride);
+        coded |= (ac_mask | levels << 8) << (4 * c);
+    }
+    return coded;
 }
 
 }  // namespace
 
 void scalar::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual<16, 16>;
-    table.code_residual_8x8 = code_residual<4, 8>;
     table.code_residual_4x4 = code_residual_4x4;
     table.code_luma_dc = code_luma_dc;
     table.reconstruct_16x16 = reconstruct_16x16;
-    table.reconstruct_8x8 = reconstruct_8x8;
     table.reconstruct_4x4 = reconstruct_4x4;
+    table.code_chroma = code_chroma;
 }
 
 }  // namespace zolt

@@ -1,4 +1,8 @@
+#include <cstring>
+
+#include "kernels/chroma_dc.h"
 #include "kernels/families.h"
+#include "kernels/hadamard_simd.h"
 #include "kernels/sse2.h"
 #include "kernels/zigzag.h"
 
@@ -102,30 +106,6 @@ uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int1
     return static_cast<uint16_t>(nonzero_16(load(scan), load(scan + 8)));
 }
 
-// 4x4 Hadamard transform across four vectors.
-void hadamard_butterfly(__m128i* v) {
-    const __m128i a = _mm_add_epi32(v[0], v[1]);
-    const __m128i b = _mm_sub_epi32(v[0], v[1]);
-    const __m128i c = _mm_add_epi32(v[2], v[3]);
-    const __m128i d = _mm_sub_epi32(v[2], v[3]);
-    v[0] = _mm_add_epi32(a, c);
-    v[1] = _mm_sub_epi32(a, c);
-    v[2] = _mm_sub_epi32(b, d);
-    v[3] = _mm_add_epi32(b, d);
-}
-
-// Exchanges rows and columns.
-void transpose_32(__m128i* v) {
-    const __m128i a = _mm_unpacklo_epi32(v[0], v[1]);
-    const __m128i b = _mm_unpackhi_epi32(v[0], v[1]);
-    const __m128i c = _mm_unpacklo_epi32(v[2], v[3]);
-    const __m128i d = _mm_unpackhi_epi32(v[2], v[3]);
-    v[0] = _mm_unpacklo_epi64(a, c);
-    v[1] = _mm_unpackhi_epi64(a, c);
-    v[2] = _mm_unpacklo_epi64(b, d);
-    v[3] = _mm_unpackhi_epi64(b, d);
-}
-
 uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* coefs,
                       int16_t* scan) {
     // Block rows of the macroblock: in decoding order blocks 0, 1, 4, 5 and 2, 3, 6, 7 stand side
@@ -135,9 +115,7 @@ uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* co
     const auto low_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpacklo_epi16(x, x), 16); };
     const auto high_32 = [](__m128i x) { return _mm_srai_epi32(_mm_unpackhi_epi16(x, x), 16); };
     __m128i v[4] = {low_32(upper), high_32(upper), low_32(lower), high_32(lower)};
-    hadamard_butterfly(v);
-    transpose_32(v);
-    hadamard_butterfly(v);  // now vector j holds column j
+    hadamard_4x4(v);  // now vector j holds column j
 
     // 16-bit factors of values that have 16 bits, the sign included: products of pairs with 0.
     const __m128i forward = _mm_set1_epi32(quantizer.forward[0]);
@@ -165,9 +143,7 @@ uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* co
         scan[n] = levels[kZigzag[n]];
     }
 
-    hadamard_butterfly(v);
-    transpose_32(v);
-    hadamard_butterfly(v);
+    hadamard_4x4(v);
     for (__m128i& row : v) {
         row = _mm_srai_epi32(_mm_add_epi32(row, _mm_set1_epi32(2)), 2);
     }
@@ -245,18 +221,6 @@ uint32_t code_residual_16x16(const uint8_t* src, ptrdiff_t stride, const uint8_t
     return coded;
 }
 
-uint32_t code_residual_8x8(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
-                           const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
-                           uint16_t* nonzero) {
-    uint32_t coded = 0;
-    for (int n = 0; n < 2; ++n) {
-        coded |= code_two(src + 4 * n * stride, stride, pred + 32 * n, 8, quantizer,
-                          dc ? dc + 2 * n : nullptr, coefs + 32 * n, scan + 32 * n, nonzero + 2 * n)
-                 << (2 * n);
-    }
-    return coded;
-}
-
 uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
                            const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
                            uint16_t* nonzero) {
@@ -306,19 +270,31 @@ void inverse_two(const int16_t* first, const int16_t* second, __m128i* rows) {
 
 alignas(16) constexpr int16_t kNoCoefs[16] = {};
 
-// Two blocks side by side; bits 0 and 1 of mask. Returns false when 16 bits are not enough.
-bool reconstruct_two(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
+// The block at pred and dst, by way of 32-bit sums.
+void reconstruct_wide(const int16_t* coefs, const uint8_t* pred, ptrdiff_t pred_stride,
+                      uint8_t* dst, ptrdiff_t stride) {
+    alignas(16) uint8_t block[16];
+    for (int y = 0; y < 4; ++y) {
+        std::memcpy(block + 4 * y, pred + y * pred_stride, 4);
+    }
+    scalar_kernels().reconstruct_4x4(coefs, block, dst, stride);
+}
+
+// Two blocks side by side; bits 0 and 1 of mask.
+void reconstruct_two(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
                      ptrdiff_t pred_stride, uint8_t* dst, ptrdiff_t stride) {
     if ((mask & 3) == 0) {
         for (int y = 0; y < 4; ++y) {
             store_8(dst + y * stride, load_8(pred + y * pred_stride));
         }
-        return true;
+        return;
     }
     const int16_t* first = mask & 1 ? coefs : kNoCoefs;
     const int16_t* second = mask & 2 ? coefs + 16 : kNoCoefs;
     if (!fits_16_bits(first) || !fits_16_bits(second)) {
-        return false;
+        reconstruct_wide(first, pred, pred_stride, dst, stride);
+        reconstruct_wide(second, pred + 4, pred_stride, dst + 4, stride);
+        return;
     }
     __m128i rows[4];
     inverse_two(first, second, rows);
@@ -326,28 +302,13 @@ bool reconstruct_two(const int16_t* coefs, uint32_t mask, const uint8_t* pred,
         const __m128i sum = _mm_add_epi16(rows[y], widen_low(load_8(pred + y * pred_stride)));
         store_8(dst + y * stride, _mm_packus_epi16(sum, sum));
     }
-    return true;
 }
 
 void reconstruct_16x16(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
                        ptrdiff_t stride) {
     for (int n = 0; n < 8; ++n) {
-        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + pair_y(n) * 16 + pair_x(n), 16,
-                             dst + pair_y(n) * stride + pair_x(n), stride)) {
-            scalar_kernels().reconstruct_16x16(coefs, mask, pred, dst, stride);
-            return;
-        }
-    }
-}
-
-void reconstruct_8x8(const int16_t* coefs, uint32_t mask, const uint8_t* pred, uint8_t* dst,
-                     ptrdiff_t stride) {
-    for (int n = 0; n < 2; ++n) {
-        if (!reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + 32 * n, 8,
-                             dst + 4 * n * stride, stride)) {
-            scalar_kernels().reconstruct_8x8(coefs, mask, pred, dst, stride);
-            return;
-        }
+        reconstruct_two(coefs + 32 * n, mask >> (2 * n), pred + pair_y(n) * 16 + pair_x(n), 16,
+                        dst + pair_y(n) * stride + pair_x(n), stride);
     }
 }
 
@@ -364,16 +325,40 @@ void reconstruct_4x4(const int16_t* coefs, const uint8_t* pred, uint8_t* dst, pt
     }
 }
 
+uint32_t code_chroma(const Chroma& chroma) {
+    const Quantizer& quantizer = *chroma.quantizer;
+    uint32_t coded = 0;
+    for (int c = 0; c < 2; ++c) {
+        const uint8_t* const pred = chroma.pred + 64 * c;
+        alignas(16) int16_t coefs[64];
+        int16_t dc[4];
+        uint32_t ac_mask = 0;
+        for (int n = 0; n < 4; n += 2) {
+            ac_mask |= code_two(chroma.src[c] + 2 * n * chroma.src_stride, chroma.src_stride,
+                                pred + 16 * n, 8, quantizer, dc + n, coefs + 16 * n,
+                                chroma.scan + 64 * c + 16 * n, chroma.nonzero + 4 * c + n)
+                       << n;
+        }
+        const uint32_t levels = code_chroma_dc(dc, quantizer, chroma.dc + 4 * c, coefs);
+        const uint32_t mask = levels != 0 ? 0xf : ac_mask;
+        for (int n = 0; n < 4; n += 2) {
+            reconstruct_two(coefs + 16 * n, mask >> n, pred + 16 * n, 8,
+                            chroma.dst[c] + 2 * n * chroma.dst_stride, chroma.dst_stride);
+        }
+        coded |= (ac_mask | levels << 8) << (4 * c);
+    }
+    return coded;
+}
+
 }  // namespace
 
 void sse2::fill_residual(Kernels& table) {
     table.code_residual_16x16 = code_residual_16x16;
-    table.code_residual_8x8 = code_residual_8x8;
     table.code_residual_4x4 = code_residual_4x4;
     table.code_luma_dc = code_luma_dc;
     table.reconstruct_16x16 = reconstruct_16x16;
-    table.reconstruct_8x8 = reconstruct_8x8;
     table.reconstruct_4x4 = reconstruct_4x4;
+    table.code_chroma = code_chroma;
 }
 
 }  // namespace zolt

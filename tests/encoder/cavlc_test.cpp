@@ -402,7 +402,7 @@ protected:
             return values;
         };
         coder_.g_coded_block_pattern = pattern;
-        coder_.g_chroma_dc_mask = 3;
+        coder_.g_chroma_dc_mask = 0;
         for (int k = 0; k < 24; ++k) {
             const int count = k < 16 && !intra16x16 ? 16 : 15;
             levels.blocks[k] = draw(count, k < 16 ? pattern >> k / 4 & 1 : pattern >= 32);
@@ -430,7 +430,10 @@ protected:
             if (pattern >= 16) {
                 levels.chroma_dc[c] = draw(4, true);
                 std::copy(levels.chroma_dc[c].begin(), levels.chroma_dc[c].end(),
-                          coder_.g_chroma_dc[c]);
+                          coder_.g_chroma_dc + 4 * c);
+                for (int n = 4 * c; n < 4 * c + 4; ++n) {
+                    coder_.g_chroma_dc_mask |= (coder_.g_chroma_dc[n] != 0 ? 1u : 0u) << n;
+                }
             }
         }
         return levels;
@@ -487,8 +490,8 @@ TEST_F(MacroblockResidual, LargestMacroblock) {
     for (std::int16_t& level : coder_.g_scan_levels) {
         level = -zolt::kMaxLevel;
     }
-    for (auto& component : coder_.g_chroma_dc) {
-        std::fill(component, component + 4, std::int16_t{-zolt::kMaxLevel});
+    for (std::int16_t& level : coder_.g_chroma_dc) {
+        level = -zolt::kMaxLevel;
     }
     coder_.g_skip_run = 139263;
     coder_.writeMBSyntax_P();

@@ -54,12 +54,13 @@ TEST(Transform, InverseEqualsMatrixProducts) {
     }
 }
 
+// Forward factors and normAdjust4x4 by QP % 6: rows and columns even, odd, mixed.
+constexpr int kForward[6][3] = {{13107, 5243, 8066}, {11916, 4660, 7490}, {10082, 4194, 6554},
+                                {9362, 3647, 5825},  {8192, 3355, 5243},  {7282, 2893, 4559}};
+constexpr int kNorm[6][3] = {{10, 16, 13}, {11, 18, 14}, {13, 20, 16},
+                             {14, 23, 18}, {16, 25, 20}, {18, 29, 23}};
+
 TEST(Residual, LevelsAndScaledLevels) {
-    // Forward factors and normAdjust4x4 by QP % 6: rows and columns even, odd, mixed.
-    constexpr int kForward[6][3] = {{13107, 5243, 8066}, {11916, 4660, 7490}, {10082, 4194, 6554},
-                                    {9362, 3647, 5825},  {8192, 3355, 5243},  {7282, 2893, 4559}};
-    constexpr int kNorm[6][3] = {{10, 16, 13}, {11, 18, 14}, {13, 20, 16},
-                                 {14, 23, 18}, {16, 25, 20}, {18, 29, 23}};
     // Rows and columns of the zig-zag scan.
     constexpr int kScan[16][2] = {{0, 0}, {0, 1}, {1, 0}, {2, 0}, {1, 1}, {0, 2}, {0, 3}, {1, 2},
                                   {2, 1}, {3, 0}, {3, 1}, {2, 2}, {1, 3}, {2, 3}, {3, 2}, {3, 3}};
@@ -97,6 +98,60 @@ TEST(Residual, LevelsAndScaledLevels) {
             ASSERT_EQ(nonzero >> n & 1, level != 0);
         }
         ASSERT_EQ(coded, nonzero != 0 ? 1u : 0u);
+    }
+}
+
+// Blocks whose error is constant have DC levels only.
+TEST(Residual, ChromaDcLevelsAndWhatTheyStandFor) {
+    Random random(3);
+    for (int iteration = 0; iteration < 52 * 40; ++iteration) {
+        const int qp = iteration % 52, bits = 16 + qp / 6;
+        const bool intra = iteration / 52 % 2;
+        const std::int64_t rounding = 2 * ((std::int64_t{1} << (bits - 1)) / (intra ? 3 : 6));
+        const int range = 127 >> random.between(0, 7);
+        int errors[2][4];
+        alignas(32) std::uint8_t src[2][64], pred[2][64], dst[2][64];
+        for (int i = 0; i < 128; ++i) {
+            int& error = errors[i / 64][i % 64 / 32 * 2 + i % 8 / 4];
+            error = i % 32 < 8 && i % 4 == 0 ? random.between(-range, range) : error;
+            pred[i / 64][i % 64] = static_cast<std::uint8_t>(random.between(range, 255 - range));
+            src[i / 64][i % 64] = static_cast<std::uint8_t>(pred[i / 64][i % 64] + error);
+        }
+        std::int16_t scan[128], dc[8];
+        std::uint16_t nonzero[8];
+        const std::uint32_t coded = zolt::scalar_kernels().code_chroma(
+            {{src[0], src[1]},
+             8,
+             pred[0],
+             {dst[0], dst[1]},
+             8,
+             intra ? &zolt::intra_quantizer(qp) : &zolt::inter_quantizer(qp),
+             scan,
+             nonzero,
+             dc});
+        ASSERT_EQ(coded & 0xff, 0u);
+        for (int c = 0; c < 2; ++c) {
+            constexpr int kSigns[4][4] = {
+                {1, 1, 1, 1}, {1, -1, 1, -1}, {1, 1, -1, -1}, {1, -1, -1, 1}};
+            for (int n = 0; n < 4; ++n) {
+                int value = 0;
+                for (int b = 0; b < 4; ++b) {
+                    value += kSigns[n][b] * 16 * errors[c][b];
+                }
+                const std::int64_t magnitude = std::min<std::int64_t>(
+                    (std::int64_t{std::abs(value)} * kForward[qp % 6][0] + rounding) >> bits, 2063);
+                ASSERT_EQ(dc[4 * c + n], value < 0 ? -magnitude : magnitude) << "QP " << qp;
+                ASSERT_EQ(coded >> (8 + 4 * c + n) & 1, magnitude != 0);
+            }
+            for (int i = 0; i < 64; ++i) {
+                const int* const signs = kSigns[i / 32 * 2 + i % 8 / 4];
+                int value = 0;
+                for (int n = 0; n < 4; ++n) {
+                    value += signs[n] * dc[4 * c + n] * kNorm[qp % 6][0] * (1 << qp / 6);
+                }
+                ASSERT_EQ(dst[c][i], std::clamp(pred[c][i] + (((value >> 1) + 32) >> 6), 0, 255));
+            }
+        }
     }
 }
 

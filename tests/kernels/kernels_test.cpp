@@ -164,14 +164,17 @@ struct Candidates {
     }
 };
 
+const zolt::Quantizer& any_quantizer(Random& random) {
+    const int qp = random.between(0, 51);
+    return random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+}
+
 // A residual kernel on blocks of `size` x `size` samples, in half of the cases with DC values of
 // their own. Predictions near the samples leave some blocks without levels.
 template <auto kernel, int size>
 void run_residual(const Kernels& k, Arena& a, Random random) {
     const Place src(a.plane[0], random, size);
-    const int qp = random.between(0, 51);
-    const zolt::Quantizer& q =
-        random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
+    const zolt::Quantizer& q = any_quantizer(random);
     std::uint8_t* const pred = size == 4 ? a.pred_4x4() : a.pred();
     const int near = random.between(0, size * size);
     for (int i = 0; i < near; ++i) {
@@ -184,6 +187,53 @@ void run_residual(const Kernels& k, Arena& a, Random random) {
         std::int16_t* const dc = random.between(0, 1) ? a.dc + 1 : nullptr;
         a.result = (k.*kernel)(src.p, src.stride, pred, q, dc, a.coef(), a.levels(), a.masks());
     }
+}
+
+// Gives a chroma component a prediction whose error has a DC coefficient or an AC one at the border
+// of the dead zone, as far as samples allow: a step between halves, or a constant.
+void predict_at_dead_zone(const std::uint8_t* src, std::ptrdiff_t stride, std::uint8_t* pred,
+                          const zolt::Quantizer& q, Random& random) {
+    const bool constant = random.between(0, 1);
+    // The first is the sum of 64 errors, the second 4 * 4 + 4 * 2 times the error in a block.
+    const int target = constant ? q.dc_dead_zone : 64 * q.dead_zone[4] / 24;
+    const int total = std::min(target + random.between(-2, 2), 64 * 255);
+    for (int i = 0; i < 64; ++i) {
+        const int error = total / 64 + (i < total % 64 ? 1 : 0);
+        const bool minus = !constant && i % 4 > 1;
+        const int sample = src[i / 8 * stride + i % 8] + (minus ? error : -error);
+        pred[i] = static_cast<std::uint8_t>(std::clamp(sample, 0, 255));
+    }
+}
+
+// Components somewhere in the planes, the reconstruction in their place or elsewhere.
+void run_code_chroma(const Kernels& k, Arena& a, Random random) {
+    const Place src(a.plane[0], random, 8);
+    const Place elsewhere(a.plane[0] + 64 * kPlaneWidth, random, 8);
+    const bool in_place = random.between(0, 1);
+    const Place& dst = in_place ? src : elsewhere;
+    const std::ptrdiff_t v = a.plane[1] - a.plane[0];
+    const zolt::Quantizer& q = any_quantizer(random);
+    for (int c = 0; c < 2; ++c) {
+        std::uint8_t* const pred = a.pred() + 64 * c;
+        const std::uint8_t* const samples = src.p + v * c;
+        const int kind = random.between(0, 3), near = random.between(0, 64);
+        if (kind == 0) {
+            predict_at_dead_zone(samples, src.stride, pred, q, random);
+        }
+        for (int i = 0; kind == 1 && i < near; ++i) {
+            const int sample = samples[i / 8 * src.stride + i % 8];
+            pred[i] = static_cast<std::uint8_t>(std::clamp(sample + random.between(-4, 4), 0, 255));
+        }
+    }
+    a.result = k.code_chroma({{src.p, src.p + v},
+                              src.stride,
+                              a.pred(),
+                              {dst.p, dst.p + v},
+                              dst.stride,
+                              &q,
+                              a.levels(),
+                              a.masks(),
+                              a.dc + 1});
 }
 
 // Runs a filter with random parameters on the edge whose samples it takes.
@@ -306,7 +356,6 @@ constexpr Case kCases[] = {
          k.chroma_8x8(a.pred(), src.p, a.plane[1] + (src.p - a.plane[0]), src.stride, fx, fy);
      }},
     {"code_residual_16x16", run_residual<&Kernels::code_residual_16x16, 16>},
-    {"code_residual_8x8", run_residual<&Kernels::code_residual_8x8, 8>},
     {"code_residual_4x4", run_residual<&Kernels::code_residual_4x4, 4>},
     {"code_luma_dc",
      [](const Kernels& k, Arena& a, Random random) {
@@ -326,16 +375,12 @@ constexpr Case kCases[] = {
          k.reconstruct_16x16(a.coef(), random.next() & random.next() & 0xffff, a.pred(), dst.p,
                              dst.stride);
      }},
-    {"reconstruct_8x8",
-     [](const Kernels& k, Arena& a, Random random) {
-         const Place dst(a.plane[0], random, 8);
-         k.reconstruct_8x8(a.coef(), random.next() & 15, a.pred(), dst.p, dst.stride);
-     }},
     {"reconstruct_4x4",
      [](const Kernels& k, Arena& a, Random random) {
          const Place dst(a.plane[0], random, 4);
          k.reconstruct_4x4(a.coef(), a.pred_4x4(), dst.p, dst.stride);
      }},
+    {"code_chroma", run_code_chroma},
     {"block_sums",
      [](const Kernels& k, Arena& a, Random random) {
          const Place src(a.plane[0], random, 16);
