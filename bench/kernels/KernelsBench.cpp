@@ -76,27 +76,19 @@ struct Case {
     void (*run)(const Kernels& k, Arena& a);
 };
 
-constexpr std::int8_t kTc0[4] = {-1, 1, 1, 2};
-constexpr std::uint32_t kStrengths = 0x01000201;
+// Edges of an inter macroblock with few levels and of an intra macroblock.
+constexpr std::uint32_t kInterEdges[4] = {0x01010201, 0, 0x02000000, 0x02000000};
+constexpr std::uint32_t kIntraEdges[4] = {zolt::kStrongEdge, 0x03030303, 0x03030303, 0x03030303};
+constexpr zolt::EdgeFilter kEdgeFilter = {40, 10, {-1, 1, 1, 2}};
 
-template <Kernels::LumaFilter Kernels::*filter>
+template <Kernels::LumaFilter Kernels::*filter, const std::uint32_t* strengths>
 void run_luma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, kStride, 40, 10, kTc0, kStrengths);
+    (k.*filter)(a.current, kStride, strengths, kEdgeFilter, kEdgeFilter);
 }
 
-template <Kernels::StrongLumaFilter Kernels::*filter>
-void run_strong_luma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, kStride, 40, 10);
-}
-
-template <Kernels::ChromaFilter Kernels::*filter>
+template <Kernels::ChromaFilter Kernels::*filter, const std::uint32_t* strengths>
 void run_chroma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, a.current + 64, kStride, 40, 10, kTc0, kStrengths);
-}
-
-template <Kernels::StrongChromaFilter Kernels::*filter>
-void run_strong_chroma(const Kernels& k, Arena& a) {
-    (k.*filter)(a.current, a.current + 64, kStride, 40, 10);
+    (k.*filter)(a.current, a.current + 64, kStride, strengths, kEdgeFilter, kEdgeFilter);
 }
 
 const zolt::Quantizer& quantizer() {
@@ -219,18 +211,19 @@ constexpr Case kCases[] = {
          k.intra_4x4_modes(a.current, kStride, a.reference(), 100, a.pred, a.coefs);
      }},
     {"code_intra_4x4", run_code_intra_4x4},
-    {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical>},
-    {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal>},
-    {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical>},
-    {"deblock_chroma_horizontal", run_chroma<&Kernels::deblock_chroma_horizontal>},
-    {"deblock_luma_vertical_strong", run_strong_luma<&Kernels::deblock_luma_vertical_strong>},
-    {"deblock_luma_horizontal_strong", run_strong_luma<&Kernels::deblock_luma_horizontal_strong>},
-    {"deblock_chroma_vertical_strong", run_strong_chroma<&Kernels::deblock_chroma_vertical_strong>},
-    {"deblock_chroma_horizontal_strong",
-     run_strong_chroma<&Kernels::deblock_chroma_horizontal_strong>},
+    {"deblock_luma_vertical", run_luma<&Kernels::deblock_luma_vertical, kInterEdges>},
+    {"deblock_luma_vertical_intra", run_luma<&Kernels::deblock_luma_vertical, kIntraEdges>},
+    {"deblock_luma_horizontal", run_luma<&Kernels::deblock_luma_horizontal, kInterEdges>},
+    {"deblock_luma_horizontal_intra", run_luma<&Kernels::deblock_luma_horizontal, kIntraEdges>},
+    {"deblock_chroma_vertical", run_chroma<&Kernels::deblock_chroma_vertical, kInterEdges>},
+    {"deblock_chroma_vertical_intra", run_chroma<&Kernels::deblock_chroma_vertical, kIntraEdges>},
+    {"deblock_chroma_horizontal", run_chroma<&Kernels::deblock_chroma_horizontal, kInterEdges>},
+    {"deblock_chroma_horizontal_intra",
+     run_chroma<&Kernels::deblock_chroma_horizontal, kIntraEdges>},
 };
+// Each of the four deblocking kernels has two.
 static_assert(offsetof(Kernels, rgb32_rows_to_iyuv) ==
-                  sizeof(const char*) + sizeof kCases / sizeof *kCases * sizeof(void (*)()),
+                  sizeof(const char*) + (sizeof kCases / sizeof *kCases - 4) * sizeof(void (*)()),
               "a kernel without a benchmark");
 
 void measure(benchmark::State& state, const Kernels& kernels, const Case& c) {

@@ -49,114 +49,39 @@ constexpr StrengthTable make_strengths() {
 }
 
 constexpr StrengthTable kStrengths = make_strengths();
-constexpr std::uint32_t kAllStrong = 0x04040404;
 constexpr std::uint32_t kAllIntra = 0x03030303;
 
 bool is_intra(std::uint8_t mode) {
     return mode == MB_INTRA4x4 || mode == MB_INTRA16x16;
 }
 
-// Exchanges rows and columns of a 4x4 bit matrix.
-unsigned transpose_mask(unsigned m) {
-    unsigned t = (m ^ m >> 3) & 0x0a0a;
-    m ^= t ^ t << 3;
-    t = (m ^ m >> 6) & 0x00cc;
-    return m ^ t ^ t << 6;
+// The first row or column of a mask of 4x4 blocks in raster order. The product has bit 4n of the
+// mask, among others, at 12 + n, and no two at one place.
+unsigned first_row(unsigned blocks) {
+    return blocks & 0xf;
+}
+unsigned first_column(unsigned blocks) {
+    return (blocks & 0x1111) * 0x1248 >> 12 & 0xf;
 }
 
-// Parameters of the edges with one QP (clause 8.7.2.2).
-struct EdgeParameters {
-    int alpha, beta;
-    const std::int8_t* tc0;  // by bS
+bool any(const std::uint32_t* strengths) {
+    return (strengths[0] | strengths[1] | strengths[2] | strengths[3]) != 0;
+}
 
-    EdgeParameters(int qp, const lfdata& lf) {
+// The filters of edges between macroblocks of two QPs (clause 8.7.2.2).
+struct EdgeFilters {
+    zolt::EdgeFilter luma, chroma;
+
+    EdgeFilters(int qp_p, int qp_q, const lfdata& lf)
+        : luma(make((qp_p + qp_q + 1) >> 1, lf)),
+          chroma(make((zolt::QP_SCALE_CR[qp_p] + zolt::QP_SCALE_CR[qp_q] + 1) >> 1, lf)) {}
+
+private:
+    static zolt::EdgeFilter make(int qp, const lfdata& lf) {
         const int index_a = std::clamp(qp + lf.alpha_offset, 0, 51);
         const int index_b = std::clamp(qp + lf.beta_offset, 0, 51);
-        alpha = alpha_tab[index_a];
-        beta = beta_tab[index_b];
-        tc0 = C0_big_tab[index_a];
-    }
-};
-
-// The filters of the vertical or of the horizontal edges, and the steps across an edge, in samples.
-struct EdgeFilters {
-    zolt::Kernels::LumaFilter luma;
-    zolt::Kernels::StrongLumaFilter luma_strong;
-    zolt::Kernels::ChromaFilter chroma;
-    zolt::Kernels::StrongChromaFilter chroma_strong;
-    std::ptrdiff_t luma_step, chroma_step;
-};
-
-// The samples of a macroblock that is being filtered.
-struct Macroblock {
-    const Picture& picture;
-    const int mb;
-    const EdgeParameters luma, chroma;  // of its internal edges
-    std::uint8_t* const y;
-    std::uint8_t* const u;
-    std::uint8_t* const v;
-
-    Macroblock(const Picture& p, int address, int mb_x, int mb_y)
-        : picture(p),
-          mb(address),
-          luma(p.g_mb_qp[address], p.g_lf_data[address]),
-          chroma(zolt::QP_SCALE_CR[p.g_mb_qp[address]], p.g_lf_data[address]),
-          y(p.g_cur_y + static_cast<std::ptrdiff_t>(16 * mb_y) * p.g_stride_luma + 16 * mb_x),
-          u(p.g_cur_u + static_cast<std::ptrdiff_t>(8 * mb_y) * p.g_stride_chroma + 8 * mb_x),
-          v(p.g_cur_v + static_cast<std::ptrdiff_t>(8 * mb_y) * p.g_stride_chroma + 8 * mb_x) {}
-
-    // One direction's edges by their strengths; neighbour: the macroblock beyond edge 0.
-    void filter_edges(const std::uint32_t* strengths, int neighbour,
-                      const EdgeFilters& filters) const {
-        if (strengths[0] != 0) {
-            filter_external_edge(strengths[0], neighbour, filters);
-        }
-        if ((strengths[1] | strengths[2] | strengths[3]) != 0) {
-            filter_internal_edges(strengths, filters);
-        }
-    }
-
-    void filter_external_edge(std::uint32_t strengths, int neighbour,
-                              const EdgeFilters& filters) const {
-        const int qp_q = picture.g_mb_qp[mb];
-        const int qp_p = picture.g_mb_qp[neighbour];
-        if (qp_q == qp_p) {
-            filter_external_edge(strengths, luma, chroma, filters);
-            return;
-        }
-        const lfdata& lf = picture.g_lf_data[mb];
-        const EdgeParameters mean_luma((qp_q + qp_p + 1) >> 1, lf);
-        const EdgeParameters mean_chroma(
-            (zolt::QP_SCALE_CR[qp_q] + zolt::QP_SCALE_CR[qp_p] + 1) >> 1, lf);
-        filter_external_edge(strengths, mean_luma, mean_chroma, filters);
-    }
-
-    void filter_external_edge(std::uint32_t strengths, const EdgeParameters& edge_luma,
-                              const EdgeParameters& edge_chroma, const EdgeFilters& filters) const {
-        if (strengths == kAllStrong) {
-            filters.luma_strong(y, picture.g_stride_luma, edge_luma.alpha, edge_luma.beta);
-            filters.chroma_strong(u, v, picture.g_stride_chroma, edge_chroma.alpha,
-                                  edge_chroma.beta);
-            return;
-        }
-        filters.luma(y, picture.g_stride_luma, edge_luma.alpha, edge_luma.beta, edge_luma.tc0,
-                     strengths);
-        filters.chroma(u, v, picture.g_stride_chroma, edge_chroma.alpha, edge_chroma.beta,
-                       edge_chroma.tc0, strengths);
-    }
-
-    void filter_internal_edges(const std::uint32_t* strengths, const EdgeFilters& filters) const {
-        for (int edge = 1; edge < 4; ++edge) {
-            if (strengths[edge] != 0) {
-                filters.luma(y + 4 * edge * filters.luma_step, picture.g_stride_luma, luma.alpha,
-                             luma.beta, luma.tc0, strengths[edge]);
-            }
-        }
-        if (strengths[2] != 0) {  // the middle one is chroma's only internal edge
-            const std::ptrdiff_t offset = 4 * filters.chroma_step;
-            filters.chroma(u + offset, v + offset, picture.g_stride_chroma, chroma.alpha,
-                           chroma.beta, chroma.tc0, strengths[2]);
-        }
+        const std::int8_t* const tc0 = C0_big_tab[index_a];
+        return {alpha_tab[index_a], beta_tab[index_b], {tc0[0], tc0[1], tc0[2], tc0[3]}};
     }
 };
 
@@ -166,50 +91,71 @@ struct Macroblock {
 // picture, in place (clause 8.7).
 void MacroblockCoder::filter_mb(int mb_x, int mb_y) {
     const int mb = mb_y * picture.g_mb_width + mb_x;
-    if (picture.g_lf_data[mb].disable_flag) {
+    const lfdata& lf = picture.g_lf_data[mb];
+    if (lf.disable_flag) {
         return;
     }
     find_edge_strengths(mb_x, mb_y);
+    const bool vertical = any(bs_ver), horizontal = any(bs_hor);
+    if (!vertical && !horizontal) {
+        return;
+    }
+    const std::ptrdiff_t luma_stride = picture.g_stride_luma;
+    const std::ptrdiff_t chroma_stride = picture.g_stride_chroma;
+    std::uint8_t* const y = picture.g_cur_y + 16 * mb_y * luma_stride + 16 * mb_x;
+    std::uint8_t* const u = picture.g_cur_u + 8 * mb_y * chroma_stride + 8 * mb_x;
+    std::uint8_t* const v = picture.g_cur_v + 8 * mb_y * chroma_stride + 8 * mb_x;
     const zolt::Kernels& k = *g_kernels;
-    const Macroblock macroblock(picture, mb, mb_x, mb_y);
-    macroblock.filter_edges(bs_ver, mb - 1,
-                            {k.deblock_luma_vertical, k.deblock_luma_vertical_strong,
-                             k.deblock_chroma_vertical, k.deblock_chroma_vertical_strong, 1, 1});
-    macroblock.filter_edges(
-        bs_hor, mb - picture.g_mb_width,
-        {k.deblock_luma_horizontal, k.deblock_luma_horizontal_strong, k.deblock_chroma_horizontal,
-         k.deblock_chroma_horizontal_strong, picture.g_stride_luma, picture.g_stride_chroma});
+    const int qp = picture.g_mb_qp[mb];
+    const EdgeFilters inner(qp, qp, lf);
+    const auto outer = [&](bool present, int neighbour) {
+        const int other = present ? picture.g_mb_qp[neighbour] : qp;
+        return other == qp ? inner : EdgeFilters(other, qp, lf);
+    };
+    if (vertical) {
+        const EdgeFilters left = outer(mb_x > 0, mb - 1);
+        k.deblock_luma_vertical(y, luma_stride, bs_ver, left.luma, inner.luma);
+        k.deblock_chroma_vertical(u, v, chroma_stride, bs_ver, left.chroma, inner.chroma);
+    }
+    if (horizontal) {
+        const EdgeFilters top = outer(mb_y > 0, mb - picture.g_mb_width);
+        k.deblock_luma_horizontal(y, luma_stride, bs_hor, top.luma, inner.luma);
+        k.deblock_chroma_horizontal(u, v, chroma_stride, bs_hor, top.chroma, inner.chroma);
+    }
 }
 
 // Boundary strengths of all edges of a macroblock (clause 8.7.2.1). Every inter macroblock has one
 // vector, so that only its outer edges can have strength 1.
 void MacroblockCoder::find_edge_strengths(int mb_x, int mb_y) {
     const int mb = mb_y * picture.g_mb_width + mb_x;
-    const bool intra = is_intra(picture.g_mb_mode[mb]);
-    const unsigned coded = picture.g_coded_blocks[mb];
-    const unsigned coded_columns = transpose_mask(coded);
-    const unsigned inside_ver = coded_columns | coded_columns << 4;
-    const unsigned inside_hor = coded | coded << 4;
-    for (int edge = 1; edge < 4; ++edge) {
-        bs_ver[edge] = intra ? kAllIntra : kStrengths.packed[0][inside_ver >> (4 * edge) & 0xf];
-        bs_hor[edge] = intra ? kAllIntra : kStrengths.packed[0][inside_hor >> (4 * edge) & 0xf];
+    const int left = mb - 1, above = mb - picture.g_mb_width;
+    if (is_intra(picture.g_mb_mode[mb])) {
+        std::fill_n(bs_ver, 4, kAllIntra);
+        std::fill_n(bs_hor, 4, kAllIntra);
+        bs_ver[0] = mb_x > 0 ? zolt::kStrongEdge : 0;
+        bs_hor[0] = mb_y > 0 ? zolt::kStrongEdge : 0;
+        return;
     }
-
+    const unsigned coded = picture.g_coded_blocks[mb];
+    for (int edge = 1; edge < 4; ++edge) {
+        const unsigned columns = (coded | coded >> 1) >> (edge - 1);
+        const unsigned rows = (coded | coded >> 4) >> (4 * (edge - 1));
+        bs_ver[edge] = kStrengths.packed[0][first_column(columns)];
+        bs_hor[edge] = kStrengths.packed[0][first_row(rows)];
+    }
     bs_ver[0] = 0;
     if (mb_x > 0) {
-        const unsigned left = transpose_mask(picture.g_coded_blocks[mb - 1]) >> 12;
-        bs_ver[0] =
-            intra || is_intra(picture.g_mb_mode[mb - 1])
-                ? kAllStrong
-                : kStrengths.packed[vectors_differ(mb, mb - 1)][(coded_columns | left) & 0xf];
+        const unsigned columns = coded | picture.g_coded_blocks[left] >> 3;
+        bs_ver[0] = is_intra(picture.g_mb_mode[left])
+                        ? zolt::kStrongEdge
+                        : kStrengths.packed[vectors_differ(mb, left)][first_column(columns)];
     }
     bs_hor[0] = 0;
     if (mb_y > 0) {
-        const int above = mb - picture.g_mb_width;
-        bs_hor[0] = intra || is_intra(picture.g_mb_mode[above])
-                        ? kAllStrong
-                        : kStrengths.packed[vectors_differ(mb, above)]
-                                           [(coded | picture.g_coded_blocks[above] >> 12) & 0xf];
+        const unsigned rows = coded | picture.g_coded_blocks[above] >> 12;
+        bs_hor[0] = is_intra(picture.g_mb_mode[above])
+                        ? zolt::kStrongEdge
+                        : kStrengths.packed[vectors_differ(mb, above)][first_row(rows)];
     }
 }
 

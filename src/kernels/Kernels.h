@@ -100,6 +100,16 @@ struct Chroma {
     std::int16_t* dc;
 };
 
+// Deblocking of edges between samples of one mean QP: alpha 0..255, beta 0..18 and tC0 0..25 by bS
+// 1..3 (clause 8.7.2.2); tc0[0] is -1, for segments that are not filtered.
+struct EdgeFilter {
+    std::uint8_t alpha, beta;
+    std::int8_t tc0[4];
+};
+
+// The boundary strengths of an edge that has bS 4.
+constexpr std::uint32_t kStrongEdge = 0x04040404;
+
 // The per-sample loops of the engine and of the colour converter. A kernel computes; orders,
 // thresholds and tie rules stay with its callers. Every entry of the scalar table is the definition
 // that the entries of the other tables must equal on every input stated here.
@@ -258,28 +268,24 @@ struct Kernels {
 
     // ---- Deblocking (clause 8.7.2) ----
 
-    // Filters one macroblock edge: pix, u and v are the first samples on the q side; "vertical"
-    // edges are crossed horizontally. Luma edges have 16 lines, chroma edges 8 of either component.
-    // strengths holds bS 0..3 of the edge's four segments, a byte each, the first lowest; tc0 is
-    // tC0 by bS, -1 for bS 0: a segment that is not filtered.
-    using LumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha, int beta,
-                                const std::int8_t* tc0, std::uint32_t strengths);
+    // Filters the four edges of a macroblock in one direction, edge n before edge n + 1: pix, u and
+    // v are its first samples; "vertical" edges are crossed horizontally and are at columns 0, 4, 8
+    // and 12. Of chroma, edges 0 and 2 are at columns 0 and 4.
+    //
+    // strengths[n] holds bS 0..3 of the four segments of edge n, a byte each, the first lowest.
+    // That of edge 0 may be kStrongEdge instead. outer is the filter of edge 0, inner that of the
+    // others. The samples beyond edge 0 are those that its filter needs; where strengths[0] is 0,
+    // up to two may be read and written as they were.
+    using LumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride,
+                                const std::uint32_t* strengths, const EdgeFilter& outer,
+                                const EdgeFilter& inner);
     using ChromaFilter = void (*)(std::uint8_t* u, std::uint8_t* v, std::ptrdiff_t stride,
-                                  int alpha, int beta, const std::int8_t* tc0,
-                                  std::uint32_t strengths);
-    // The same with bS 4.
-    using StrongLumaFilter = void (*)(std::uint8_t* pix, std::ptrdiff_t stride, int alpha,
-                                      int beta);
-    using StrongChromaFilter = void (*)(std::uint8_t* u, std::uint8_t* v, std::ptrdiff_t stride,
-                                        int alpha, int beta);
+                                  const std::uint32_t* strengths, const EdgeFilter& outer,
+                                  const EdgeFilter& inner);
     LumaFilter deblock_luma_vertical;
     LumaFilter deblock_luma_horizontal;
     ChromaFilter deblock_chroma_vertical;
     ChromaFilter deblock_chroma_horizontal;
-    StrongLumaFilter deblock_luma_vertical_strong;
-    StrongLumaFilter deblock_luma_horizontal_strong;
-    StrongChromaFilter deblock_chroma_vertical_strong;
-    StrongChromaFilter deblock_chroma_horizontal_strong;
 
     // ---- Colour conversion ----
 

@@ -7,7 +7,6 @@
 namespace zolt {
 namespace {
 
-using std::int8_t;
 using std::ptrdiff_t;
 using std::uint32_t;
 using std::uint8_t;
@@ -85,64 +84,56 @@ void filter_chroma_line_strong(uint8_t* q, ptrdiff_t step, int alpha, int beta) 
 
 // An edge of four segments: `across` leads from one sample of a line to the next, `along` from one
 // line to the next.
-template <typename FilterLine>
-void filter_edge(uint8_t* pix, ptrdiff_t along, ptrdiff_t across, int lines_per_segment, int alpha,
-                 int beta, const int8_t* tc0, uint32_t strengths, FilterLine filter_line) {
-    for (int line = 0; line < 4 * lines_per_segment; ++line) {
-        const int segment_tc0 = tc0[strengths >> (8 * (line / lines_per_segment)) & 0xff];
-        if (segment_tc0 >= 0) {
-            filter_line(pix + line * along, across, alpha, beta, segment_tc0);
+template <typename FilterLine, typename FilterLineStrong>
+void filter_edge(uint8_t* pix, ptrdiff_t along, ptrdiff_t across, int lines_per_segment,
+                 uint32_t strengths, const EdgeFilter& filter, FilterLine filter_line,
+                 FilterLineStrong filter_line_strong) {
+    for (int line = 0; line < 4 * lines_per_segment; ++line, pix += along) {
+        const uint32_t strength = strengths >> (8 * (line / lines_per_segment)) & 0xff;
+        if (strength == 4) {
+            filter_line_strong(pix, across, filter.alpha, filter.beta);
+        } else if (strength != 0) {
+            filter_line(pix, across, filter.alpha, filter.beta, filter.tc0[strength]);
         }
     }
 }
 
-void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
-                           uint32_t strengths) {
-    filter_edge(pix, stride, 1, 4, alpha, beta, tc0, strengths, filter_luma_line);
-}
-
-void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, int alpha, int beta, const int8_t* tc0,
-                             uint32_t strengths) {
-    filter_edge(pix, 1, stride, 4, alpha, beta, tc0, strengths, filter_luma_line);
-}
-
-void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                             const int8_t* tc0, uint32_t strengths) {
-    filter_edge(u, stride, 1, 2, alpha, beta, tc0, strengths, filter_chroma_line);
-    filter_edge(v, stride, 1, 2, alpha, beta, tc0, strengths, filter_chroma_line);
-}
-
-void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta,
-                               const int8_t* tc0, uint32_t strengths) {
-    filter_edge(u, 1, stride, 2, alpha, beta, tc0, strengths, filter_chroma_line);
-    filter_edge(v, 1, stride, 2, alpha, beta, tc0, strengths, filter_chroma_line);
-}
-
-void deblock_luma_vertical_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    for (int line = 0; line < 16; ++line) {
-        filter_luma_line_strong(pix + line * stride, 1, alpha, beta);
+void filter_luma_edges(uint8_t* pix, ptrdiff_t along, ptrdiff_t across, const uint32_t* strengths,
+                       const EdgeFilter& outer, const EdgeFilter& inner) {
+    for (int edge = 0; edge < 4; ++edge) {
+        filter_edge(pix + 4 * edge * across, along, across, 4, strengths[edge],
+                    edge == 0 ? outer : inner, filter_luma_line, filter_luma_line_strong);
     }
 }
 
-void deblock_luma_horizontal_strong(uint8_t* pix, ptrdiff_t stride, int alpha, int beta) {
-    for (int line = 0; line < 16; ++line) {
-        filter_luma_line_strong(pix + line, stride, alpha, beta);
+void filter_chroma_edges(uint8_t* pix, ptrdiff_t along, ptrdiff_t across, const uint32_t* strengths,
+                         const EdgeFilter& outer, const EdgeFilter& inner) {
+    for (int edge = 0; edge < 4; edge += 2) {
+        filter_edge(pix + 2 * edge * across, along, across, 2, strengths[edge],
+                    edge == 0 ? outer : inner, filter_chroma_line, filter_chroma_line_strong);
     }
 }
 
-void deblock_chroma_vertical_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha, int beta) {
-    for (int line = 0; line < 8; ++line) {
-        filter_chroma_line_strong(u + line * stride, 1, alpha, beta);
-        filter_chroma_line_strong(v + line * stride, 1, alpha, beta);
-    }
+void deblock_luma_vertical(uint8_t* pix, ptrdiff_t stride, const uint32_t* strengths,
+                           const EdgeFilter& outer, const EdgeFilter& inner) {
+    filter_luma_edges(pix, stride, 1, strengths, outer, inner);
 }
 
-void deblock_chroma_horizontal_strong(uint8_t* u, uint8_t* v, ptrdiff_t stride, int alpha,
-                                      int beta) {
-    for (int line = 0; line < 8; ++line) {
-        filter_chroma_line_strong(u + line, stride, alpha, beta);
-        filter_chroma_line_strong(v + line, stride, alpha, beta);
-    }
+void deblock_luma_horizontal(uint8_t* pix, ptrdiff_t stride, const uint32_t* strengths,
+                             const EdgeFilter& outer, const EdgeFilter& inner) {
+    filter_luma_edges(pix, 1, stride, strengths, outer, inner);
+}
+
+void deblock_chroma_vertical(uint8_t* u, uint8_t* v, ptrdiff_t stride, const uint32_t* strengths,
+                             const EdgeFilter& outer, const EdgeFilter& inner) {
+    filter_chroma_edges(u, stride, 1, strengths, outer, inner);
+    filter_chroma_edges(v, stride, 1, strengths, outer, inner);
+}
+
+void deblock_chroma_horizontal(uint8_t* u, uint8_t* v, ptrdiff_t stride, const uint32_t* strengths,
+                               const EdgeFilter& outer, const EdgeFilter& inner) {
+    filter_chroma_edges(u, 1, stride, strengths, outer, inner);
+    filter_chroma_edges(v, 1, stride, strengths, outer, inner);
 }
 
 }  // namespace
@@ -152,10 +143,6 @@ void scalar::fill_deblock(Kernels& table) {
     table.deblock_luma_horizontal = deblock_luma_horizontal;
     table.deblock_chroma_vertical = deblock_chroma_vertical;
     table.deblock_chroma_horizontal = deblock_chroma_horizontal;
-    table.deblock_luma_vertical_strong = deblock_luma_vertical_strong;
-    table.deblock_luma_horizontal_strong = deblock_luma_horizontal_strong;
-    table.deblock_chroma_vertical_strong = deblock_chroma_vertical_strong;
-    table.deblock_chroma_horizontal_strong = deblock_chroma_horizontal_strong;
 }
 
 }  // namespace zolt

@@ -236,33 +236,48 @@ void run_code_chroma(const Kernels& k, Arena& a, Random random) {
                               a.dc + 1});
 }
 
-// Runs a filter with random parameters on the edge whose samples it takes.
-template <auto filter, bool strong, typename... Samples>
-void run_filter(const Kernels& k, Random& random, std::ptrdiff_t stride, Samples... samples) {
-    const int alpha = random.between(0, 255), beta = random.between(0, 18);
-    if constexpr (strong) {
-        (k.*filter)(samples..., stride, alpha, beta);
-    } else {
-        std::int8_t tc0[4];
-        std::uint32_t strengths = 0;
-        for (int i = 0; i < 4; ++i) {
-            tc0[i] = static_cast<std::int8_t>(i == 0 ? -1 : random.between(0, 25));
-            strengths = strengths << 8 | static_cast<std::uint32_t>(random.between(0, 3));
-        }
-        (k.*filter)(samples..., stride, alpha, beta, tc0, strengths);
+// The filter of an edge between macroblocks of some QP.
+zolt::EdgeFilter random_filter(Random& random) {
+    zolt::EdgeFilter filter{};
+    filter.alpha = static_cast<std::uint8_t>(random.between(0, 255));
+    filter.beta = static_cast<std::uint8_t>(random.between(0, 18));
+    filter.tc0[0] = -1;
+    for (int strength = 1; strength < 4; ++strength) {
+        filter.tc0[strength] = static_cast<std::int8_t>(random.between(0, 25));
     }
+    return filter;
 }
 
-template <auto filter, bool strong>
+// Runs a filter on the edges of the macroblock whose samples it takes: edges without a strength,
+// with one for all segments or with any for each, the outer one strong at times.
+template <auto filter, typename... Samples>
+void run_filter(const Kernels& k, Random& random, std::ptrdiff_t stride, Samples... samples) {
+    std::uint32_t strengths[4];
+    for (std::uint32_t& edge : strengths) {
+        const int kind = random.between(0, 3);
+        const auto strength = [&] { return static_cast<std::uint32_t>(random.between(0, 3)); };
+        edge = kind == 0 ? 0 : strength() * 0x01010101U;
+        for (int i = 0; i < 4 && kind == 1; ++i) {
+            edge = edge << 8 | strength();
+        }
+    }
+    if (random.between(0, 2) == 0) {
+        strengths[0] = zolt::kStrongEdge;
+    }
+    const zolt::EdgeFilter outer = random_filter(random), inner = random_filter(random);
+    (k.*filter)(samples..., stride, strengths, outer, inner);
+}
+
+template <auto filter>
 void run_luma_filter(const Kernels& k, Arena& a, Random random) {
     const Place edge(a.plane[0], random, 4);
-    run_filter<filter, strong>(k, random, edge.stride, edge.p);
+    run_filter<filter>(k, random, edge.stride, edge.p);
 }
 
-template <auto filter, bool strong>
+template <auto filter>
 void run_chroma_filter(const Kernels& k, Arena& a, Random random) {
     const Place edge(a.plane[0], random, 4);
-    run_filter<filter, strong>(k, random, edge.stride, edge.p, a.plane[1] + (edge.p - a.plane[0]));
+    run_filter<filter>(k, random, edge.stride, edge.p, a.plane[1] + (edge.p - a.plane[0]));
 }
 
 constexpr Case kCases[] = {
@@ -413,17 +428,10 @@ constexpr Case kCases[] = {
          const std::uint8_t* neighbours = a.plane[1] + random.between(0, 100);
          k.intra_4x4_modes(src.p, src.stride, neighbours, random.sample(), a.pred_4x4(), a.coef());
      }},
-    {"deblock_luma_vertical", run_luma_filter<&Kernels::deblock_luma_vertical, false>},
-    {"deblock_luma_horizontal", run_luma_filter<&Kernels::deblock_luma_horizontal, false>},
-    {"deblock_chroma_vertical", run_chroma_filter<&Kernels::deblock_chroma_vertical, false>},
-    {"deblock_chroma_horizontal", run_chroma_filter<&Kernels::deblock_chroma_horizontal, false>},
-    {"deblock_luma_vertical_strong", run_luma_filter<&Kernels::deblock_luma_vertical_strong, true>},
-    {"deblock_luma_horizontal_strong",
-     run_luma_filter<&Kernels::deblock_luma_horizontal_strong, true>},
-    {"deblock_chroma_vertical_strong",
-     run_chroma_filter<&Kernels::deblock_chroma_vertical_strong, true>},
-    {"deblock_chroma_horizontal_strong",
-     run_chroma_filter<&Kernels::deblock_chroma_horizontal_strong, true>},
+    {"deblock_luma_vertical", run_luma_filter<&Kernels::deblock_luma_vertical>},
+    {"deblock_luma_horizontal", run_luma_filter<&Kernels::deblock_luma_horizontal>},
+    {"deblock_chroma_vertical", run_chroma_filter<&Kernels::deblock_chroma_vertical>},
+    {"deblock_chroma_horizontal", run_chroma_filter<&Kernels::deblock_chroma_horizontal>},
 };
 // All function pointers of a table have a case, those of the colour conversions elsewhere, and so
 // code_intra_4x4, which equals steps of the engine.
