@@ -97,7 +97,7 @@ const Quantizer& MacroblockCoder::luma_quantizer() const {
 void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
     const Quantizer& q = luma_quantizer();
     std::uint8_t* block =
-        g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
+        g_mb_rec_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
     const unsigned coded = g_kernels->code_residual_4x4(
         block, picture.g_stride_luma, pred, q, coefs, g_scan_levels + 16 * k, g_nonzero + k);
@@ -116,17 +116,17 @@ void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
 void MacroblockCoder::quantTransform_luma_16x16(const std::uint8_t* pred) {
     const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
     std::int16_t dc[16];
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, pred, q, dc,
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, pred, q, dc,
                                                  g_mb_coefs, g_scan_levels, g_nonzero);
     const std::uint32_t constant = g_kernels->code_luma_dc(dc, q, g_mb_coefs, g_luma_dc);
     g_luma_dc_nonzero = static_cast<std::uint16_t>(constant);
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_src_y,
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_rec_y,
                                  picture.g_stride_luma);
 }
 
 // Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
 void MacroblockCoder::quantTransform_luma_16x16P() {
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred,
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, g_mb_pred,
                                                  zolt::inter_quantizer(picture.g_mbQp), nullptr,
                                                  g_mb_coefs, g_scan_levels, g_nonzero);
     int macroblock_cost = 0;
@@ -147,7 +147,7 @@ void MacroblockCoder::quantTransform_luma_16x16P() {
     if (macroblock_cost < kMinMacroblockCost) {
         g_luma_mask = 0;
     }
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y,
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_rec_y,
                                  picture.g_stride_luma);
 }
 
@@ -159,14 +159,15 @@ void MacroblockCoder::quantTransform_chroma(const std::uint8_t* pred) {
     g_chroma_ac_mask = 0;
     g_chroma_dc_mask = 0;
     for (int component = 0; component < 2; ++component) {
-        std::uint8_t* samples = component == 0 ? g_mb_src_u : g_mb_src_v;
+        const std::uint8_t* source = component == 0 ? g_mb_src_u : g_mb_src_v;
+        std::uint8_t* reconstruction = component == 0 ? g_mb_rec_u : g_mb_rec_v;
         std::int16_t* coefs = g_mb_coefs + 256 + 64 * component;
         std::int16_t dc[4];
         const std::uint32_t ac_mask = g_kernels->code_residual_8x8(
-            samples, picture.g_stride_chroma, pred, q, dc, coefs,
-            g_scan_levels + 256 + 64 * component, g_nonzero + 16 + 4 * component);
+            source, picture.g_width / 2, pred, q, dc, coefs, g_scan_levels + 256 + 64 * component,
+            g_nonzero + 16 + 4 * component);
         const std::uint32_t dc_mask = quantize_chroma_dc(component, dc, q, coefs);
-        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, samples,
+        g_kernels->reconstruct_8x8(coefs, ac_mask | dc_mask, pred, reconstruction,
                                    picture.g_stride_chroma);
         g_chroma_ac_mask |= ac_mask << (4 * component);
         pred += 64;
