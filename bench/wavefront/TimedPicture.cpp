@@ -130,7 +130,6 @@ void TimedPicture::code_in_parts() {
             note("half", row, -1, m_picture.g_half_rows_end.load() - built);
         }
         restart_clock();
-        m_picture.load_row(row);
         coder.bits = &coder.row_bits;
         coder.row_bits.reset();
         coder.g_skip_run = 0;

@@ -22,7 +22,7 @@ struct Part {
 //
 //   before   NAL and slice header, rate control, clearing of maps, edges of the reference
 //   half     half-sample rows that a row of macroblocks may need; detail: their number
-//   begin    loading of a row of the picture, and an empty buffer for its bits
+//   begin    an empty buffer for a row's bits
 //   step     code_macroblock, then filter_mb of the macroblocks that become ready; detail: the row
 //            of the half-sample planes at which those end that the macroblock needs
 //   append   a row's bits to the NAL unit

@@ -39,7 +39,8 @@ public:
     void processCurrentMB_I();
     void processCurrentMB_P();
     void setMBOffsets();
-    void prefetch_reference() const;
+    void prefetch_samples() const;
+    void load_intra() const;
     std::ptrdiff_t first_block() const;
     void code_intra();
     void code_intra4x4();
@@ -137,9 +138,12 @@ public:
     int g_mapMBNumber = 0;                    // its address, raster order
     int g_mb_x = 0, g_mb_y = 0;               // position in macroblocks
     std::uint8_t g_mb_up = 0, g_mb_left = 0;  // 1: the macroblock above / to the left exists
-    std::uint8_t* g_mb_src_y = nullptr;       // its samples in the current picture
-    std::uint8_t* g_mb_src_u = nullptr;
-    std::uint8_t* g_mb_src_v = nullptr;
+    // Its samples in the caller's frame, strides g_width and g_width / 2. They have any alignment,
+    // and the frame may end with them.
+    const std::uint8_t *g_mb_src_y = nullptr, *g_mb_src_u = nullptr, *g_mb_src_v = nullptr;
+    // Its place in the current picture: an intra macroblock's samples until they are coded, then
+    // the reconstruction. Strides g_stride_luma and g_stride_chroma.
+    std::uint8_t *g_mb_rec_y = nullptr, *g_mb_rec_u = nullptr, *g_mb_rec_v = nullptr;
     // Neighbour availability of the 4x4 blocks in decoding order, 1: available.
     std::uint8_t g_blk_up[16] = {}, g_blk_left[16] = {};
     std::uint8_t g_blk_up_left[16] = {}, g_blk_up_right[16] = {};

@@ -66,8 +66,6 @@ public:
     // ---- frame ----
     // Clears the maps that a picture starts with.
     void initFrameParams();
-    // Copies a macroblock row of g_frame into the current picture.
-    void load_row(int mb_y);
     // The deblocked picture becomes the reference; its predecessor gives room for the next frame.
     void manageRefBuffers();
     // Copies the reference picture (g_width16 x g_height16 luma samples, then Cb and Cr, no
@@ -93,16 +91,18 @@ public:
     int g_blk_width, g_blk_height;  // 4x4 blocks per row and column
 
     // ---- The picture as a whole, written before its first macroblock ----
-    const std::uint8_t* g_frame = nullptr;  // the caller's frame, borrowed while it is coded
-    int g_mbQp = 10;                        // QP of the current picture, 0..51
-    std::uint8_t g_num_ref_active = 1;      // active list-0 references
+    // The caller's frame, borrowed while it is coded, with any alignment: g_width x g_height luma
+    // samples, then Cb and Cr, g_width / 2 x g_height / 2 each, no padding.
+    const std::uint8_t* g_frame = nullptr;
+    int g_mbQp = 10;                    // QP of the current picture, 0..51
+    std::uint8_t g_num_ref_active = 1;  // active list-0 references
     zolt::AlignedBuffer<slice_par_t> g_slp;
 
     // ---- Samples ----
     // Two pictures with borders, in one block; the planes' strides are g_stride_luma and
-    // g_stride_chroma, the pointers address sample (0, 0). The current picture holds the input
-    // frame and is overwritten by its reconstruction as coding proceeds; the two change places
-    // when it becomes the reference.
+    // g_stride_chroma, the pointers address sample (0, 0). The current picture fills with the
+    // frame's reconstruction as coding proceeds; the two change places when it becomes the
+    // reference.
     zolt::AlignedBuffer<std::uint8_t> g_alloc_images;
     std::uint8_t *g_cur_y = nullptr, *g_cur_u = nullptr, *g_cur_v = nullptr;
     std::uint8_t *g_ref_y = nullptr, *g_ref_u = nullptr, *g_ref_v = nullptr;

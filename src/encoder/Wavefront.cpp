@@ -69,12 +69,11 @@ void Wavefront::run_worker(int worker) {
     } while (mb_y < picture.g_mb_height && code_row(coder, mb_y));
 }
 
-// Loads, codes and appends a row, and deblocks the one above it. What a row needs is still in the
-// cache: its input was loaded just before. Returns false when the picture is given up.
+// Codes and appends a row, and deblocks the one above it. Returns false when the picture is given
+// up.
 bool Wavefront::code_row(MacroblockCoder& coder, int mb_y) {
     const int width = picture.g_mb_width;
     const int last = width - 1;
-    picture.load_row(mb_y);
     begin_row(coder);
     for (int mb_x = 0; mb_x < last; ++mb_x) {
         if (mb_y > 0 && !wait_for(m_rows[mb_y - 1].done, std::min(mb_x + kLead, width))) {

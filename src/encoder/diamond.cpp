@@ -291,7 +291,7 @@ MotionSearch::MotionSearch(MacroblockCoder& coder)
       m_lambda(coder.g_sad_lambda),
       m_ref(m_picture.g_ref_y + m_py * m_stride + m_px),
       m_visited(coder.g_visit_L0 + m_picture.g_visit_dim / 2 * (m_picture.g_visit_dim + 1)) {
-    m_kernels.arrange_block(coder.g_mb_src_y, m_stride, m_block);
+    m_kernels.arrange_block(coder.g_mb_src_y, m_picture.g_width, m_block);
 }
 
 // Subsampled diamond search at integer pels.

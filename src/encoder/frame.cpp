@@ -102,21 +102,6 @@ void CEncoder::encode_frame(const void* frame) {
     ++g_frame_counter;
 }
 
-void Picture::load_row(int mb_y) {
-    const std::ptrdiff_t width = g_width;
-    const std::ptrdiff_t chroma_width = g_width / 2;
-    const std::uint8_t* y = g_frame;
-    const std::uint8_t* u = y + width * g_height;
-    const std::uint8_t* v = u + chroma_width * (g_height / 2);
-    const std::ptrdiff_t row = 16 * mb_y;
-    const std::ptrdiff_t chroma_row = 8 * mb_y;
-    copy_plane(g_cur_y + row * g_stride_luma, g_stride_luma, y + row * width, width, g_width16, 16);
-    copy_plane(g_cur_u + chroma_row * g_stride_chroma, g_stride_chroma,
-               u + chroma_row * chroma_width, chroma_width, g_cwidth, 8);
-    copy_plane(g_cur_v + chroma_row * g_stride_chroma, g_stride_chroma,
-               v + chroma_row * chroma_width, chroma_width, g_cwidth, 8);
-}
-
 void Picture::copy_reference(unsigned char* dst) const {
     copy_plane(dst, g_width16, g_ref_y, g_stride_luma, g_width16, g_height16);
     dst += static_cast<std::ptrdiff_t>(g_width16) * g_height16;

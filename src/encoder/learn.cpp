@@ -264,14 +264,14 @@ int MacroblockCoder::learn16_4() {
 }
 
 void MacroblockCoder::compute_block_features() {
-    g_kernels->block_sums(g_mb_src_y, picture.g_stride_luma, g_block_sums);
+    g_kernels->block_sums(g_mb_src_y, picture.g_width, g_block_sums);
     g_kernels->hadamard_energy(g_block_sums, g_block_energy);
 }
 
 // Intra 16x16 mode of the macroblock; leaves the predictions in g_intra_pred_16x16.
 int MacroblockCoder::learn16_mode() {
     alignas(16) std::int32_t distortion[8][4];
-    g_kernels->intra_16x16_modes(g_mb_src_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
+    g_kernels->intra_16x16_modes(g_mb_rec_y, picture.g_stride_luma, g_mb_up != 0, g_mb_left != 0,
                                  g_intra_pred_16x16[0], distortion[0]);
     Candidates candidates({g_mb_up != 0, g_mb_left != 0, true, g_mb_up && g_mb_left});
     for (int step = 0; step <= kLastStep16; ++step) {
@@ -290,7 +290,7 @@ int MacroblockCoder::learn16_mode() {
 int MacroblockCoder::learn_chroma_mode() {
     constexpr int kLastStep = 11;
     alignas(32) std::int32_t distortion[kLastStep + 1][4];
-    g_kernels->intra_chroma_modes(g_mb_src_u, g_mb_src_v, picture.g_stride_chroma, g_mb_up != 0,
+    g_kernels->intra_chroma_modes(g_mb_rec_u, g_mb_rec_v, picture.g_stride_chroma, g_mb_up != 0,
                                   g_mb_left != 0, g_intra_pred_chroma[0], distortion[0]);
     Candidates candidates({true, g_mb_left != 0, g_mb_up != 0, g_mb_up && g_mb_left});
     const auto add = [&](int step) {
@@ -323,7 +323,7 @@ int MacroblockCoder::learn_chroma_mode() {
 // The elimination takes every step for all modes at once: a mode that was dropped cannot win.
 int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) {
     const std::uint8_t* src =
-        g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
+        g_mb_rec_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     const bool up = g_blk_up[k] != 0;
     const bool left = g_blk_left[k] != 0;
     std::uint8_t neighbours[16] = {};  // 13, and room for kernels to read
@@ -382,7 +382,7 @@ int MacroblockCoder::learn4_mode(int k, int predicted_mode, std::uint8_t* pred) 
 zolt::Intra4x4 MacroblockCoder::intra4x4_rule(std::int8_t* modes, std::ptrdiff_t stride,
                                               std::uint8_t* predicted) {
     zolt::Intra4x4 mb = {};
-    mb.samples = g_mb_src_y;
+    mb.samples = g_mb_rec_y;
     mb.stride = picture.g_stride_luma;
     mb.up = g_mb_up != 0;
     mb.left = g_mb_left != 0;

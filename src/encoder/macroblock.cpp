@@ -17,6 +17,29 @@ void fill_blocks(T* p, std::ptrdiff_t stride, T value) {
     }
 }
 
+// Copies size x size samples.
+template <int size>
+void copy_block(std::uint8_t* dst, std::ptrdiff_t dst_stride, const std::uint8_t* src,
+                std::ptrdiff_t src_stride) {
+    for (int y = 0; y < size; ++y) {
+        std::memcpy(dst + y * dst_stride, src + y * src_stride, size);
+    }
+}
+
+// Asks for the share of macroblock column mb_x in the samples of a macroblock row, at y, u and v: a
+// cache line of four rows of luma and of one row of either chroma plane, since 64 bytes are 4
+// macroblocks of luma and 8 of chroma.
+void prefetch_share(int mb_x, const std::uint8_t* y, const std::uint8_t* u, const std::uint8_t* v,
+                    std::ptrdiff_t stride, std::ptrdiff_t chroma_stride) {
+    const std::uint8_t* luma = y + 4 * (mb_x & 3) * stride;
+    for (int row = 0; row < 4; ++row) {
+        zolt::prefetch(luma + row * stride);
+    }
+    const std::ptrdiff_t chroma = (mb_x & 7) * chroma_stride;
+    zolt::prefetch(u + chroma);
+    zolt::prefetch(v + chroma);
+}
+
 // A mask of luma blocks in decoding order, in raster order: the two exchange the middle pairs of
 // every two block rows.
 std::uint16_t raster_mask(unsigned mask) {
@@ -42,13 +65,14 @@ void MacroblockCoder::code_macroblock(int mb_x, int mb_y) {
 // A macroblock of an I picture: decisions, levels, reconstruction, maps.
 void MacroblockCoder::processCurrentMB_I() {
     setMBOffsets();
+    prefetch_samples();
     code_intra();
 }
 
 // A macroblock of a P picture.
 void MacroblockCoder::processCurrentMB_P() {
     setMBOffsets();
-    prefetch_reference();
+    prefetch_samples();
     generatePredError16x16();
     g_skip_flag = 0;
     if (!setLearnPIMode()) {
@@ -78,30 +102,46 @@ void MacroblockCoder::setMBOffsets() {
 
     g_mb_up = g_mb_y > 0;
     g_mb_left = g_mb_x > 0;
-    g_mb_src_y = picture.g_cur_y +
-                 static_cast<std::ptrdiff_t>(16 * g_mb_y) * picture.g_stride_luma + 16 * g_mb_x;
-    const std::ptrdiff_t chroma =
-        static_cast<std::ptrdiff_t>(8 * g_mb_y) * picture.g_stride_chroma + 8 * g_mb_x;
-    g_mb_src_u = picture.g_cur_u + chroma;
-    g_mb_src_v = picture.g_cur_v + chroma;
+    const std::ptrdiff_t luma_row = 16 * g_mb_y;
+    const std::ptrdiff_t chroma_row = 8 * g_mb_y;
+    const std::ptrdiff_t width = picture.g_width;
+    const std::ptrdiff_t chroma_width = picture.g_width / 2;
+    g_mb_src_y = picture.g_frame + luma_row * width + 16 * g_mb_x;
+    g_mb_src_u =
+        picture.g_frame + width * picture.g_height + chroma_row * chroma_width + 8 * g_mb_x;
+    g_mb_src_v = g_mb_src_u + chroma_width * (picture.g_height / 2);
+    const std::ptrdiff_t chroma = chroma_row * picture.g_stride_chroma + 8 * g_mb_x;
+    g_mb_rec_y = picture.g_cur_y + luma_row * picture.g_stride_luma + 16 * g_mb_x;
+    g_mb_rec_u = picture.g_cur_u + chroma;
+    g_mb_rec_v = picture.g_cur_v + chroma;
 
     g_sad_lambda = zolt::QP2QUANT[std::max(0, picture.g_mbQp - 12)];
     g_intra_lambda = g_sad_lambda;
 }
 
-// Asks for the samples of the reference that the macroblock row below will read first: a cache line
-// of four rows of luma and of one row of either chroma plane at a time, since 64 bytes are 4
-// macroblocks of luma and 8 of chroma.
-void MacroblockCoder::prefetch_reference() const {
-    const std::ptrdiff_t luma_row = 16 * g_mb_y + 16 + 4 * (g_mb_x & 3);
-    const std::uint8_t* luma = picture.g_ref_y + luma_row * picture.g_stride_luma + 16 * g_mb_x;
-    for (int row = 0; row < 4; ++row) {
-        zolt::prefetch(luma + row * static_cast<std::ptrdiff_t>(picture.g_stride_luma));
+// Asks for samples that later macroblocks start with: the row below those of the caller's frame and
+// in P pictures of the reference, those to the right their place in the current picture. The row
+// below may be another worker's to write.
+void MacroblockCoder::prefetch_samples() const {
+    constexpr int kRight = 8;  // macroblocks
+    const std::ptrdiff_t stride = picture.g_stride_luma;
+    const std::ptrdiff_t chroma_stride = picture.g_stride_chroma;
+    if (g_mb_y + 1 < picture.g_mb_height) {
+        const std::ptrdiff_t width = picture.g_width;
+        const std::ptrdiff_t chroma = 8 * (width / 2);
+        prefetch_share(g_mb_x, g_mb_src_y + 16 * width, g_mb_src_u + chroma, g_mb_src_v + chroma,
+                       width, width / 2);
     }
-    const std::ptrdiff_t chroma_row = 8 * g_mb_y + 8 + (g_mb_x & 7);
-    const std::ptrdiff_t chroma = chroma_row * picture.g_stride_chroma + 8 * g_mb_x;
-    zolt::prefetch(picture.g_ref_u + chroma);
-    zolt::prefetch(picture.g_ref_v + chroma);
+    if (g_mb_x + kRight < picture.g_mb_width) {
+        prefetch_share(g_mb_x, g_mb_rec_y + 16 * kRight, g_mb_rec_u + 8 * kRight,
+                       g_mb_rec_v + 8 * kRight, stride, chroma_stride);
+    }
+    if (picture.g_slp->sliceType == P_SLICE) {
+        const std::ptrdiff_t luma = (16 * g_mb_y + 16) * stride + 16 * g_mb_x;
+        const std::ptrdiff_t chroma = (8 * g_mb_y + 8) * chroma_stride + 8 * g_mb_x;
+        prefetch_share(g_mb_x, picture.g_ref_y + luma, picture.g_ref_u + chroma,
+                       picture.g_ref_v + chroma, stride, chroma_stride);
+    }
 }
 
 // Entry of the macroblock's top left block in the per-4x4-block maps.
@@ -109,7 +149,16 @@ std::ptrdiff_t MacroblockCoder::first_block() const {
     return static_cast<std::ptrdiff_t>(4 * g_mb_y) * picture.g_blk_width + 4 * g_mb_x;
 }
 
+// Copies the macroblock into the current picture, where intra coding replaces it by its
+// reconstruction: its kernels read source samples and their reconstructed neighbours in one plane.
+void MacroblockCoder::load_intra() const {
+    copy_block<16>(g_mb_rec_y, picture.g_stride_luma, g_mb_src_y, picture.g_width);
+    copy_block<8>(g_mb_rec_u, picture.g_stride_chroma, g_mb_src_u, picture.g_width / 2);
+    copy_block<8>(g_mb_rec_v, picture.g_stride_chroma, g_mb_src_v, picture.g_width / 2);
+}
+
 void MacroblockCoder::code_intra() {
+    load_intra();
     fill_blocks(picture.g_blk_ref + first_block(), picture.g_blk_width, std::int8_t{-1});
     g_cur_mb_mode = learn16_4() == 16 ? MB_INTRA16x16 : MB_INTRA4x4;
     picture.g_mb_mode[g_mapMBNumber] = g_cur_mb_mode;

@@ -90,7 +90,7 @@ const Quantizer& MacroblockCoder::luma_quantizer() const {
 void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
     const Quantizer& q = luma_quantizer();
     std::uint8_t* block =
-        g_mb_src_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
+        g_mb_rec_y + 4 * zolt::luma_scan_j[k] * picture.g_stride_luma + 4 * zolt::luma_scan_i[k];
     std::int16_t* coefs = g_mb_coefs + 16 * k;
     const unsigned coded = g_kernels->code_residual_4x4(
         block, picture.g_stride_luma, pred, q, coefs, g_scan_levels + 16 * k, g_nonzero + k);
@@ -109,17 +109,17 @@ void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
 void MacroblockCoder::quantTransform_luma_16x16(const std::uint8_t* pred) {
     const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
     std::int16_t dc[16];
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, pred, q, dc,
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, pred, q, dc,
                                                  g_mb_coefs, g_scan_levels, g_nonzero);
     const std::uint32_t constant = g_kernels->code_luma_dc(dc, q, g_mb_coefs, g_luma_dc);
     g_luma_dc_nonzero = static_cast<std::uint16_t>(constant);
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_src_y,
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_rec_y,
                                  picture.g_stride_luma);
 }
 
 // Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
 void MacroblockCoder::quantTransform_luma_16x16P() {
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_stride_luma, g_mb_pred,
+    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, g_mb_pred,
                                                  zolt::inter_quantizer(picture.g_mbQp), nullptr,
                                                  g_mb_coefs, g_scan_levels, g_nonzero);
     int macroblock_cost = 0;
@@ -140,7 +140,7 @@ void MacroblockCoder::quantTransform_luma_16x16P() {
     if (macroblock_cost < kMinMacroblockCost) {
         g_luma_mask = 0;
     }
-    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_src_y,
+    g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_rec_y,
                                  picture.g_stride_luma);
 }
 
@@ -149,12 +149,11 @@ void MacroblockCoder::quantTransform_chroma(const std::uint8_t* pred) {
     const int qp = zolt::QP_SCALE_CR[picture.g_mbQp];
     const Quantizer& q =
         picture.g_slp->sliceType == I_SLICE ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
-    const std::ptrdiff_t stride = picture.g_stride_chroma;
     const std::uint32_t coded = g_kernels->code_chroma({{g_mb_src_u, g_mb_src_v},
-                                                        stride,
+                                                        picture.g_width / 2,
                                                         pred,
-                                                        {g_mb_src_u, g_mb_src_v},
-                                                        stride,
+                                                        {g_mb_rec_u, g_mb_rec_v},
+                                                        picture.g_stride_chroma,
                                                         &q,
                                                         g_scan_levels + 256,
                                                         g_nonzero + 16,

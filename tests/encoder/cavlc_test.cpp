@@ -386,6 +386,7 @@ class MacroblockResidual : public testing::Test {
 protected:
     MacroblockResidual() {
         coder_.row_bits.allocate(MacroblockCoder::kMaxMacroblockBits / 8 + 1, "row_bits");
+        picture_.g_frame = frame_;
     }
 
     // Gives the coder's macroblock random levels: `share` of 16 positions, magnitudes to `largest`.
@@ -439,6 +440,7 @@ protected:
         return levels;
     }
 
+    const std::uint8_t frame_[48 * 48 * 3 / 2] = {};
     Picture picture_{48, 48, zolt::best_kernels()};
     MacroblockCoder coder_{picture_};
     Random random_{5};

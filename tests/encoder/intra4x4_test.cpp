@@ -19,10 +19,13 @@ constexpr int kSize = 48;  // 3 x 3 macroblocks
 
 // A picture and its coder with one of the kernel tables.
 struct Bench {
+    const std::uint8_t frame[kSize * kSize * 3 / 2] = {};
     Picture picture;
     MacroblockCoder coder{picture};
 
-    explicit Bench(const Kernels& kernels) : picture(kSize, kSize, kernels) {}
+    explicit Bench(const Kernels& kernels) : picture(kSize, kSize, kernels) {
+        picture.g_frame = frame;
+    }
 
     // Draws samples, some beyond the picture too, and the modes around macroblock mb, and codes it.
     void code(int mb, Random random) {

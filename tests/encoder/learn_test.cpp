@@ -43,6 +43,7 @@ protected:
     }
 
     zolt::Kernels kernels_ = with_stand_in();
+    const std::uint8_t frame_[16 * 16 * 3 / 2] = {};
     Picture picture_{16, 16, kernels_};
     MacroblockCoder coder_{picture_};
 };
@@ -65,6 +66,7 @@ TEST_F(LearnedTree, Intra16x16Or4x4) {
         {51, {359, 291, 450, 2262, 834, 725, 1156}},
     };
     picture_.g_slp->sliceType = I_SLICE;
+    picture_.g_frame = frame_;
     coder_.setMBOffsets();
     for (const auto& [qp, t] : cases) {
         picture_.g_mbQp = qp;
@@ -100,6 +102,7 @@ TEST_F(LearnedTree, InterOrIntra) {
         {45, {1042, 421, 581, 240, 243, 96, 848, 0, 1569, 533}},
         {51, {3553, 1959, 1310, 766, 821, 126, 4231, 0, 4947, 1985}},
     };
+    picture_.g_frame = frame_;
     coder_.setMBOffsets();
     for (const auto& [qp, t] : cases) {
         picture_.g_mbQp = qp;
@@ -264,7 +267,7 @@ TEST(ModeElimination, TruncatesNegativeChromaLimitsTowardsZero) {
 
 class ModeSearch : public testing::Test {
 protected:
-    // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) around it.
+    // Makes macroblock `mb` of 3 x 3 current, with samples from draw(x, y) in it and around it.
     template <typename Draw>
     void start(int mb, Draw draw, int qp = 12) {
         for (int y = 0; y < 48; ++y) {
@@ -275,6 +278,7 @@ protected:
                 picture_.g_cur_v[y / 2 * picture_.g_stride_chroma + x / 2] = value;
             }
         }
+        picture_.g_frame = frame_;
         picture_.g_mbQp = qp;  // 12: rate weight 1
         coder_.g_mapMBNumber = mb;
         coder_.g_mb_x = mb % picture_.g_mb_width;
@@ -283,6 +287,7 @@ protected:
         coder_.set_block_availability();
     }
 
+    const std::uint8_t frame_[48 * 48 * 3 / 2] = {};
     Picture picture_{48, 48, zolt::best_kernels()};
     MacroblockCoder coder_{picture_};
 };
@@ -319,7 +324,7 @@ TEST_F(ModeSearch, KeepsThePredicted4x4Mode) {
 
 // The elimination mode by mode: a candidate that is dropped takes no further part.
 int plain_4x4_mode(const MacroblockCoder& e, int k, int predicted) {
-    const std::uint8_t* src = e.g_mb_src_y + 4 * zolt::luma_scan_j[k] * e.picture.g_stride_luma +
+    const std::uint8_t* src = e.g_mb_rec_y + 4 * zolt::luma_scan_j[k] * e.picture.g_stride_luma +
                               4 * zolt::luma_scan_i[k];
     const bool up = e.g_blk_up[k], left = e.g_blk_left[k];
     std::uint8_t neighbours[16];

@@ -579,9 +579,8 @@ TEST_P(SearchOracleMaterial, RandomNeighbourhoods) {
         const auto& tables = zolt::kernel_tables();
         const zolt::Kernels& kernels = tables.begin()[i / 4 % (tables.end() - tables.begin())];
         CEncoder e(width, height, &kernels);
+        e.picture.g_frame = source.data();
         for (int y = 0; y < height; ++y) {
-            std::copy_n(&source[static_cast<std::size_t>(y * width)], width,
-                        e.picture.g_cur_y + y * e.picture.g_stride_luma);
             std::copy_n(&reference[static_cast<std::size_t>(y * width)], width,
                         e.picture.g_ref_y + y * e.picture.g_stride_luma);
         }

@@ -193,7 +193,9 @@ TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
     };
     Kernels kernels = zolt::scalar_kernels();
     kernels.code_residual_16x16 = stand_in_residual;
+    const std::uint8_t frame[16 * 16 * 3 / 2] = {};
     Picture picture(16, 16, kernels);
+    picture.g_frame = frame;
     MacroblockCoder coder(picture);
     picture.g_slp->sliceType = P_SLICE;
     coder.setMBOffsets();
