@@ -15,9 +15,8 @@
 // done when it is coded and (x - 1, r - 1) is deblocked after it; the last one of a row also when
 // the row's bits are appended to the NAL unit. It waits for (x + 2, r - 1) to be done, or for the
 // whole row above near its end. So
-// - prediction finds its neighbours above coded and their samples not yet deblocked: the worker of
-// a
-//   row deblocks the row above itself, behind the macroblocks that it codes;
+// - prediction finds its neighbours above coded and their samples not yet deblocked: each worker
+//   deblocks the row above its own, behind the macroblocks that it codes;
 // - macroblocks are deblocked in an order in which each comes after its left, upper left, upper and
 //   upper right neighbours, as in raster order (clause 8.7);
 // - rows end in order, and each worker appends its own.
