@@ -189,8 +189,8 @@ public:
 
     // ---- Motion search ----
     // Stamp of the last search that evaluated each vector, [x + offset][y + offset].
-    zolt::AlignedBuffer<std::uint32_t> g_visit_L0;
-    std::uint32_t g_visit_stamp = 0;  // stamp of the running search
+    zolt::AlignedBuffer<std::uint8_t> g_visit_L0;
+    std::uint8_t g_visit_stamp = 0;  // stamp of the running search
 
     // ---- Deblocking: boundary strengths of the macroblock being filtered ----
     // Four segments of 8 bits each, the first lowest; edge 0 is the left or the top one.

@@ -42,9 +42,9 @@ constexpr RateTable make_mv_rate() {
 
 constexpr RateTable mv_rate = make_mv_rate();
 
-// Rate of one vector component that differs by d quarter pels from its prediction.
-int component_rate(int d) {
-    return mv_rate.bits[d + kMaxDifference];
+// Rates of one vector component, to be indexed by its value in quarter pels.
+const std::uint16_t* component_rates(int prediction) {
+    return mv_rate.bits + (kMaxDifference - prediction);
 }
 
 template <typename T>
@@ -134,25 +134,24 @@ constexpr int kFractions = 8;
 class MotionSearch {
 public:
     explicit MotionSearch(MacroblockCoder& coder);
-    void integer_stage(_mv& result);
-    void half_stage(_mv& result);
-    void quarter_stage(_mv& result);
+    void integer_stage();
+    void half_stage();
+    void quarter_stage();
+    // Writes the best candidate so far.
+    void record(_mv& result) const;
 
 private:
-    void search_integer_vectors();
+    bool try_zero();
     bool try_vectors(const Vector* vectors, int count);
     bool walk_spiral();
     bool walk_diamond();
-    bool first_visit(Vector v);
-
-    int rate_x(int x) const { return m_lambda * component_rate(x - m_pmv.x); }
-    int rate_y(int y) const { return m_lambda * component_rate(y - m_pmv.y); }
+    // Rate of a vector in quarter pels.
+    int rate(int x, int y) const { return m_lambda * (m_rates_x[x] + m_rates_y[y]); }
     // The SAD of phases 0 and 1 that a candidate with this rate must stay below. Acceptance of
     // another one can only lower it.
     int first_phases_limit(int rate) const { return m_thresholds[1] - second_share(rate); }
     bool accept(const int* sums, int rate, int first_threshold);
     void set_planes(std::ptrdiff_t position);
-    void record_fraction(_mv& result, Vector fraction) const;
 
     // The candidates of a fractional step: their directions from (x, y), `step` quarter pels long,
     // their rates, and the limits of their first phases.
@@ -161,13 +160,8 @@ private:
         std::int32_t limits[kFractions];
 
         Fractions(const MotionSearch& search, const Vector* directions, int x, int y, int step) {
-            int horizontal[3], vertical[3];
-            for (int i = -1; i <= 1; ++i) {
-                horizontal[i + 1] = search.rate_x(x + step * i);
-                vertical[i + 1] = search.rate_y(y + step * i);
-            }
             for (int n = 0; n < kFractions; ++n) {
-                rates[n] = horizontal[directions[n].x + 1] + vertical[directions[n].y + 1];
+                rates[n] = search.rate(x + step * directions[n].x, y + step * directions[n].y);
                 limits[n] = search.first_phases_limit(rates[n]);
             }
         }
@@ -181,15 +175,16 @@ private:
     Picture& m_picture;
     const zolt::Kernels& m_kernels;
     const std::ptrdiff_t m_stride;
-    const int m_px, m_py;       // the macroblock's position, samples
-    const Vector m_pmv;         // predicted vector, quarter pels
-    const int m_lambda;         // rate weight
-    const std::uint8_t* m_ref;  // the macroblock's samples in the reference
-    std::uint32_t* m_visited;   // stamp of the zero vector
+    const int m_px, m_py;                        // the macroblock's position, samples
+    const int m_lambda;                          // rate weight
+    const std::uint16_t *m_rates_x, *m_rates_y;  // of vector components in quarter pels
+    const std::uint8_t* m_ref;                   // the macroblock's samples in the reference
+    std::uint8_t* m_visited;                     // stamp of the zero vector
     int m_thresholds[3] = {kNoCost, kNoCost, kNoCost};
     int m_best_cost = kNoCost;
     int m_best_sad = 0;
-    Vector m_best = {0, 0};
+    Vector m_best = {0, 0};                // integer pels
+    Vector m_fraction = {0, 0};            // of the best candidate, quarter pels
     const std::uint8_t* m_planes[4] = {};  // samples by Plane around the candidates of a stage
     alignas(64) std::uint8_t m_block[zolt::kArrangedBlock];  // the macroblock's samples, arranged
 };
@@ -262,20 +257,21 @@ void MacroblockCoder::generateMBPred() {
     form_mv_prediction(&g_pmv_x, &g_pmv_y, 0, 0, 0, 16, 16);
     if (++g_visit_stamp == 0) {
         std::memset(g_visit_L0, 0,
-                    sizeof *g_visit_L0 * static_cast<std::size_t>(picture.g_visit_dim) *
+                    static_cast<std::size_t>(picture.g_visit_dim) *
                         static_cast<std::size_t>(picture.g_visit_dim));
         g_visit_stamp = 1;
     }
     MotionSearch search(*this);
-    _mv& result = picture.g_mv_array[g_mapMBNumber];
-    search.integer_stage(result);
-    picture.g_me_mb_L0[g_mapMBNumber] = result;
+    search.integer_stage();
+    _mv& integer = picture.g_me_mb_L0[g_mapMBNumber];
+    search.record(integer);
     if (picture.g_subpel_enable) {
         // The block, and the row below it that fractions reach.
-        picture.make_half_pixel_sds(16 * g_mb_y + result.y + 17);
-        search.half_stage(result);
-        search.quarter_stage(result);
+        picture.make_half_pixel_sds(16 * g_mb_y + integer.y + 17);
+        search.half_stage();
+        search.quarter_stage();
     }
+    search.record(picture.g_mv_array[g_mapMBNumber]);
 }
 
 namespace {
@@ -287,25 +283,25 @@ MotionSearch::MotionSearch(MacroblockCoder& coder)
       m_stride(m_picture.g_stride_luma),
       m_px(16 * coder.g_mb_x),
       m_py(16 * coder.g_mb_y),
-      m_pmv{coder.g_pmv_x, coder.g_pmv_y},
       m_lambda(coder.g_sad_lambda),
+      m_rates_x(component_rates(coder.g_pmv_x)),
+      m_rates_y(component_rates(coder.g_pmv_y)),
       m_ref(m_picture.g_ref_y + m_py * m_stride + m_px),
       m_visited(coder.g_visit_L0 + m_picture.g_visit_dim / 2 * (m_picture.g_visit_dim + 1)) {
     m_kernels.arrange_block(coder.g_mb_src_y, m_picture.g_width, m_block);
 }
 
-// Subsampled diamond search at integer pels.
-void MotionSearch::integer_stage(_mv& result) {
-    search_integer_vectors();
+void MotionSearch::record(_mv& result) const {
     result.x = static_cast<std::int16_t>(m_best.x);
     result.y = static_cast<std::int16_t>(m_best.y);
-    result.dx = 0;
-    result.dy = 0;
+    result.dx = static_cast<std::int8_t>(m_fraction.x);
+    result.dy = static_cast<std::int8_t>(m_fraction.y);
     result.sad = static_cast<std::uint32_t>(m_best_sad);
     result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
 
-void MotionSearch::search_integer_vectors() {
+// Subsampled diamond search at integer pels.
+void MotionSearch::integer_stage() {
     const int mb_width = m_picture.g_mb_width;
     const int range = m_picture.g_search_range;
     const int mb_x = m_coder.g_mb_x;
@@ -327,11 +323,9 @@ void MotionSearch::search_integer_vectors() {
             group[count++] = v;
         }
     };
-    add({0, 0});  // alone, since it often ends the search
-    if (try_vectors(group, count)) {
+    if (window_x.between(0) && window_y.between(0) && try_zero()) {
         return;
     }
-    count = 0;
     add({median<int>(top.x, left.x, top_right.x), median<int>(top.y, left.y, top_right.y)});
     add(predictor);
     if (try_vectors(group, count)) {
@@ -407,22 +401,27 @@ bool MotionSearch::walk_diamond() {
     return false;
 }
 
-// Marks a vector as visited; returns false when it already was.
-bool MotionSearch::first_visit(Vector v) {
-    std::uint32_t& stamp = m_visited[v.x * m_picture.g_visit_dim + v.y];
-    const bool first = stamp != m_coder.g_visit_stamp;
-    stamp = m_coder.g_visit_stamp;
-    return first;
+// Evaluates the zero vector, the first candidate. Returns true at an early end.
+bool MotionSearch::try_zero() {
+    *m_visited = m_coder.g_visit_stamp;
+    int sums[4];
+    m_kernels.phase_sads(m_block, m_ref, m_stride, sums);
+    const int zero_rate = rate(0, 0);
+    return accept(sums, zero_rate, 2 * (sums[0] + first_share(zero_rate))) && m_best_sad < kGoodSad;
 }
 
 // Evaluates up to kGroup vectors in order, without those that this search has already evaluated.
 // Returns true at an early end.
 bool MotionSearch::try_vectors(const Vector* vectors, int count) {
+    const int visit_dim = m_picture.g_visit_dim;
+    const std::uint8_t visit_stamp = m_coder.g_visit_stamp;
     Vector fresh[kGroup];
     const std::uint8_t* refs[kGroup];
     int n = 0;
     for (int i = 0; i < count; ++i) {
-        if (first_visit(vectors[i])) {
+        std::uint8_t& stamp = m_visited[vectors[i].x * visit_dim + vectors[i].y];
+        if (stamp != visit_stamp) {
+            stamp = visit_stamp;
             fresh[n] = vectors[i];
             refs[n++] = m_ref + vectors[i].y * m_stride + vectors[i].x;
         }
@@ -433,7 +432,7 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
     int rates[kGroup];
     std::int32_t limits[kGroup] = {};
     for (int i = 0; i < n; ++i) {
-        rates[i] = rate_x(4 * fresh[i].x) + rate_y(4 * fresh[i].y);
+        rates[i] = rate(4 * fresh[i].x, 4 * fresh[i].y);
         limits[i] = first_phases_limit(rates[i]);
     }
     unsigned passed = 1;
@@ -456,7 +455,7 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
 }
 
 // Half-pel step around the integer result.
-void MotionSearch::half_stage(_mv& result) {
+void MotionSearch::half_stage() {
     set_planes(m_best.y * m_stride + m_best.x);
     const Fractions candidates(*this, kHalfCandidates, 4 * m_best.x, 4 * m_best.y, 2);
     const zolt::HalfSamples at = {m_planes[kVertical], m_planes[kHorizontal], m_planes[kCentre]};
@@ -465,11 +464,11 @@ void MotionSearch::half_stage(_mv& result) {
     unsigned passed = m_kernels.first_phases_below_half(m_block, at, m_stride, candidates.limits);
     for (; passed != 0; passed &= passed - 1) {
         const int n = zolt::lowest_bit(passed);
-        const int rate = candidates.rates[n];
+        const int candidate_rate = candidates.rates[n];
         int sums[4];
         m_kernels.phase_sads(m_block, refs[n], m_stride, sums);
-        if (accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
-            record_fraction(result, {2 * kHalfCandidates[n].x, 2 * kHalfCandidates[n].y});
+        if (accept(sums, candidate_rate, 2 * (sums[0] + first_share(candidate_rate)))) {
+            m_fraction = {2 * kHalfCandidates[n].x, 2 * kHalfCandidates[n].y};
             if (m_best_sad < kGoodSad) {
                 return;
             }
@@ -478,8 +477,8 @@ void MotionSearch::half_stage(_mv& result) {
 }
 
 // Quarter-pel step around the half-pel result; its first threshold is tighter.
-void MotionSearch::quarter_stage(_mv& result) {
-    const Vector half = {result.dx, result.dy};
+void MotionSearch::quarter_stage() {
+    const Vector half = m_fraction;
     const int kind = std::abs(half.x) / 2 + std::abs(half.y);
     if (kind > 3) {
         exitOnError("Encountered error in quarter pixel computation. exiting!\n", -100);
@@ -501,24 +500,16 @@ void MotionSearch::quarter_stage(_mv& result) {
         const bool diagonal = cross && n >= 4;
         const std::uint8_t* a = diagonal ? refs[zolt::kCrossPairs[n - 4][0]] : centre;
         const std::uint8_t* b = refs[diagonal ? zolt::kCrossPairs[n - 4][1] : n];
-        const int rate = candidates.rates[n];
+        const int candidate_rate = candidates.rates[n];
         int sums[4];
         m_kernels.phase_sads_average(m_block, a, b, m_stride, sums);
-        if (accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
-            record_fraction(result,
-                            {half.x + kQuarterCandidates[n].x, half.y + kQuarterCandidates[n].y});
+        if (accept(sums, candidate_rate, (5 * (sums[0] + first_share(candidate_rate))) >> 2)) {
+            m_fraction = {half.x + kQuarterCandidates[n].x, half.y + kQuarterCandidates[n].y};
             if (m_best_sad < kGoodSad) {
                 return;
             }
         }
     }
-}
-
-void MotionSearch::record_fraction(_mv& result, Vector fraction) const {
-    result.dx = static_cast<std::int8_t>(fraction.x);
-    result.dy = static_cast<std::int8_t>(fraction.y);
-    result.sad = static_cast<std::uint32_t>(m_best_sad);
-    result.cost = static_cast<std::uint32_t>(m_best_cost);
 }
 
 // Points the planes at the macroblock moved by `position` samples.

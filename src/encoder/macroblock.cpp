@@ -261,10 +261,10 @@ void MacroblockCoder::predict_inter_chroma() {
 // mb_type and coded_block_pattern (Tables 7-11, 7-13; clause 7.4.5) of the coded blocks.
 void MacroblockCoder::setMBType_CBP() {
     const int chroma = g_chroma_ac_mask ? 2 : g_chroma_dc_mask ? 1 : 0;
-    int luma = 0;
-    for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
-        luma |= (g_luma_mask >> (4 * block8x8) & 0xf) ? 1 << block8x8 : 0;
-    }
+    unsigned luma = g_luma_mask;  // its bits 0, 4, 8 and 12 gather those of the 8x8 blocks
+    luma |= luma >> 1;
+    luma |= luma >> 2;
+    luma = (luma & 1) | (luma >> 3 & 2) | (luma >> 6 & 4) | (luma >> 9 & 8);
     const int intra_base = picture.g_slp->sliceType == P_SLICE ? 5 : 0;  // P: after the inter types
     switch (g_cur_mb_mode) {
         case MB_P16x16:
@@ -280,7 +280,7 @@ void MacroblockCoder::setMBType_CBP() {
         default:
             exitOnError("setMBType_CBP. Unsupported mode\n", -1);
     }
-    g_coded_block_pattern = luma + 16 * chroma;
+    g_coded_block_pattern = static_cast<int>(luma) + 16 * chroma;
 }
 
 // The vector prediction that the search used; the macroblock's neighbours have not changed since.

@@ -1,8 +1,6 @@
 #include <algorithm>
-#include <cstdlib>
 
 #include "encoder/MacroblockCoder.h"
-#include "encoder/bitops.h"
 #include "encoder/tables.h"
 
 namespace {
@@ -49,8 +47,7 @@ constexpr QuantizerTable make_quantizers(int divisor) {
 constexpr QuantizerTable kIntraQuantizers = make_quantizers(3);
 constexpr QuantizerTable kInterQuantizers = make_quantizers(6);
 
-// Cost of a level of magnitude 1 by the number of zeros before it in zig-zag order.
-constexpr std::uint8_t COEFF_COST[16] = {3, 2, 2, 1, 1, 1};
+// Cost of a block with a level beyond 1.
 constexpr int kLargeLevelCost = 9999;
 
 // An 8x8 block whose cost is lower than kMin8x8Cost, and a macroblock lower than
@@ -58,16 +55,28 @@ constexpr int kLargeLevelCost = 9999;
 constexpr int kMin8x8Cost = 5;
 constexpr int kMinMacroblockCost = 6;
 
-// Cost of an inter block's levels, added to that of the blocks before it. Counting stops where it
-// keeps the macroblock.
-int coefficient_cost(const std::int16_t* scan, unsigned nonzero, int cost) {
-    int next = 0;  // position after the last level
-    for (; nonzero != 0 && cost < kMinMacroblockCost; nonzero &= nonzero - 1) {
-        const int position = zolt::lowest_bit(nonzero);
-        cost += std::abs(scan[position]) > 1 ? kLargeLevelCost : COEFF_COST[position - next];
-        next = position + 1;
+// Numbers of set bits of each four.
+std::uint16_t count_by_fours(std::uint16_t bits) {
+    const std::uint16_t pairs = static_cast<std::uint16_t>(bits - (bits >> 1 & 0x5555));
+    return static_cast<std::uint16_t>((pairs & 0x3333) + (pairs >> 2 & 0x3333));
+}
+
+// Costs of 16 blocks whose levels are ones, from the masks of their levels in zig-zag order: by the
+// number of zeros before it a level costs 3 (none), 2 (one or two), 1 (three to five) or nothing.
+void costs_of_ones(const std::uint16_t* nonzero, std::uint16_t* costs) {
+    for (int k = 0; k < 16; ++k) {
+        const std::uint16_t levels = nonzero[k];
+        // Positions with no, at most two and at most five zeros before them.
+        const std::uint16_t none = static_cast<std::uint16_t>(levels << 1 | 1);
+        const std::uint16_t two = static_cast<std::uint16_t>(none | none << 1 | none << 2);
+        const std::uint16_t five = static_cast<std::uint16_t>(two | two << 3);
+        const std::uint16_t fours = static_cast<std::uint16_t>(count_by_fours(levels & none) +
+                                                               count_by_fours(levels & two) +
+                                                               count_by_fours(levels & five));
+        const std::uint16_t eights =
+            static_cast<std::uint16_t>((fours & 0x0f0f) + (fours >> 4 & 0x0f0f));
+        costs[k] = static_cast<std::uint16_t>((eights + (eights >> 8)) & 0xff);
     }
-    return cost;
 }
 
 }  // namespace
@@ -109,8 +118,8 @@ void MacroblockCoder::quantTransform_luma_4x4(int k, const std::uint8_t* pred) {
 void MacroblockCoder::quantTransform_luma_16x16(const std::uint8_t* pred) {
     const Quantizer& q = zolt::intra_quantizer(picture.g_mbQp);
     std::int16_t dc[16];
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, pred, q, dc,
-                                                 g_mb_coefs, g_scan_levels, g_nonzero);
+    g_luma_mask = 0xffff & g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, pred, q, dc,
+                                                          g_mb_coefs, g_scan_levels, g_nonzero);
     const std::uint32_t constant = g_kernels->code_luma_dc(dc, q, g_mb_coefs, g_luma_dc);
     g_luma_dc_nonzero = static_cast<std::uint16_t>(constant);
     g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask | constant >> 16, pred, g_mb_rec_y,
@@ -119,27 +128,22 @@ void MacroblockCoder::quantTransform_luma_16x16(const std::uint8_t* pred) {
 
 // Inter luma: 8x8 blocks and macroblocks with cheap levels only are sent without them.
 void MacroblockCoder::quantTransform_luma_16x16P() {
-    g_luma_mask = g_kernels->code_residual_16x16(g_mb_src_y, picture.g_width, g_mb_pred,
-                                                 zolt::inter_quantizer(picture.g_mbQp), nullptr,
-                                                 g_mb_coefs, g_scan_levels, g_nonzero);
+    const std::uint32_t coded = g_kernels->code_residual_16x16(
+        g_mb_src_y, picture.g_width, g_mb_pred, zolt::inter_quantizer(picture.g_mbQp), nullptr,
+        g_mb_coefs, g_scan_levels, g_nonzero);
+    std::uint16_t costs[16];
+    costs_of_ones(g_nonzero, costs);
+    unsigned kept = 0;
     int macroblock_cost = 0;
     for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
-        const unsigned blocks = 0xfu << (4 * block8x8);
-        int cost = 0;
-        for (unsigned rest = g_luma_mask & blocks; rest != 0 && cost < kMinMacroblockCost;
-             rest &= rest - 1) {
-            const int k = zolt::lowest_bit(rest);
-            cost = coefficient_cost(g_scan_levels + 16 * k, g_nonzero[k], cost);
-        }
-        if (cost < kMin8x8Cost) {
-            g_luma_mask &= ~blocks;
-        } else {
-            macroblock_cost += cost;
-        }
+        const std::uint16_t* of = costs + 4 * block8x8;
+        const bool large = (coded >> (16 + 4 * block8x8) & 0xf) != 0;
+        const int cost = large ? kLargeLevelCost : of[0] + of[1] + of[2] + of[3];
+        const bool keep = cost >= kMin8x8Cost;
+        kept |= (keep ? 0xfu : 0u) << (4 * block8x8);
+        macroblock_cost += keep ? cost : 0;
     }
-    if (macroblock_cost < kMinMacroblockCost) {
-        g_luma_mask = 0;
-    }
+    g_luma_mask = macroblock_cost >= kMinMacroblockCost ? coded & kept : 0;
     g_kernels->reconstruct_16x16(g_mb_coefs, g_luma_mask, g_mb_pred, g_mb_rec_y,
                                  picture.g_stride_luma);
 }

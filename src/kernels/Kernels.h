@@ -34,12 +34,14 @@ struct HalfSamples {
 // right, below left, above right and above left.
 inline void half_candidates(const HalfSamples& at, std::ptrdiff_t stride,
                             const std::uint8_t** blocks) {
-    const std::uint8_t* const all[8] = {
-        at.vertical, at.vertical - stride, at.horizontal,      at.horizontal - 1,
-        at.centre,   at.centre - 1,        at.centre - stride, at.centre - stride - 1};
-    for (int n = 0; n < 8; ++n) {
-        blocks[n] = all[n];
-    }
+    blocks[0] = at.vertical;
+    blocks[1] = at.vertical - stride;
+    blocks[2] = at.horizontal;
+    blocks[3] = at.horizontal - 1;
+    blocks[4] = at.centre;
+    blocks[5] = at.centre - 1;
+    blocks[6] = at.centre - stride;
+    blocks[7] = at.centre - stride - 1;
 }
 
 // The pairs of blocks whose averages are candidates 4..7 of first_phases_below_cross.
@@ -183,11 +185,12 @@ struct Kernels {
 
     // Prediction error, forward core transform and quantiser of the 16 luma blocks of a macroblock
     // in decoding order (Figure 6-10), and of one 4x4 block: level = sign(c) * min((|c| * forward +
-    // rounding) >> shift, kMaxLevel). Bit b of the result: block b has a level other than 0. Writes
-    // such a block's levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to
-    // coefs; of every block, the mask of the levels that are not 0 to nonzero (bit n: scan position
-    // n). With dc, which takes one value a block, the constant coefficients go there and 0 stands
-    // in for them, and the coefficients of blocks without levels are set to 0.
+    // rounding) >> shift, kMaxLevel). Bit b of the result: block b has a level other than 0; bit
+    // 16 + b, of the 16 blocks only: it has one other than -1, 0 and 1. Writes such a block's
+    // levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to coefs; of every
+    // block, the mask of the levels that are not 0 to nonzero (bit n: scan position n). With dc,
+    // which takes one value a block, the constant coefficients go there and 0 stands in for them,
+    // and the coefficients of blocks without levels are set to 0.
     std::uint32_t (*code_residual_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
                                          const std::uint8_t* pred, const Quantizer& quantizer,
                                          std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,

@@ -73,8 +73,8 @@ struct VectorQuantizer {
           largest(_mm256_set1_epi16(kMaxLevel)),
           shift(_mm_cvtsi32_si128(q.shift)) {}
 
-    // Quantises a block; returns the mask of its levels.
-    uint16_t quantize(__m256i c, __m256i* scaled, int16_t* scan) const {
+    // Quantises a block; returns the mask of its levels, and in bit 16 whether one is beyond 1.
+    uint32_t quantize(__m256i c, __m256i* scaled, int16_t* scan) const {
         const __m256i magnitude = _mm256_abs_epi16(c);
         const __m256i low = _mm256_mullo_epi16(magnitude, forward);
         const __m256i high = _mm256_mulhi_epu16(magnitude, forward);
@@ -82,14 +82,15 @@ struct VectorQuantizer {
             _mm256_srl_epi32(_mm256_add_epi32(_mm256_unpacklo_epi16(low, high), rounding), shift);
         const __m256i second =
             _mm256_srl_epi32(_mm256_add_epi32(_mm256_unpackhi_epi16(low, high), rounding), shift);
-        const __m256i level =
-            _mm256_sign_epi16(_mm256_min_epi16(_mm256_packs_epi32(first, second), largest), c);
+        const __m256i absolute = _mm256_min_epi16(_mm256_packs_epi32(first, second), largest);
+        const __m256i level = _mm256_sign_epi16(absolute, c);
         *scaled = _mm256_mullo_epi16(level, dequant);
         const __m256i in_order = zigzag(level);
         store_32(scan, in_order);
         const __m128i bytes = _mm_packs_epi16(low_lane(in_order), high_lane(in_order));
         const int zeros = _mm_movemask_epi8(_mm_cmpeq_epi8(bytes, _mm_setzero_si128()));
-        return static_cast<uint16_t>(~zeros);
+        const bool large = !_mm256_testz_si256(absolute, _mm256_set1_epi16(~1));
+        return (~static_cast<uint32_t>(zeros) & 0xffff) | (large ? 0x10000u : 0);
     }
 };
 
@@ -140,7 +141,7 @@ __m256i without_constants(__m256i first_column) {
 }
 
 // Codes a row of four luma blocks from the rows of their residual; dc, coefs, scan and nonzero are
-// those of the first, the masks 0 before. Returns the mask of the coded ones. The blocks are the
+// those of the first, the masks 0 before. Returns what code_residual_16x16 does. The blocks are the
 // first and those 1, 4 and 5 after it in decoding order (Figure 6-10).
 [[gnu::always_inline]] inline uint32_t code_four(__m256i* v, const Quantizer& quantizer,
                                                  int16_t* dc, int16_t* coefs, int16_t* scan,
@@ -166,14 +167,17 @@ __m256i without_constants(__m256i first_column) {
     __m256i blocks[4];
     columns_to_blocks(v, blocks);
     const VectorQuantizer vectors(quantizer);
+    uint32_t result = (coded & 3) | (coded >> 2) << 4;
     for (unsigned rest = coded; rest != 0; rest &= rest - 1) {
         const int b = __builtin_ctz(rest);
         const int place = kPlace[b];
         __m256i scaled;
-        nonzero[place] = vectors.quantize(blocks[b], &scaled, scan + 16 * place);
+        const uint32_t levels = vectors.quantize(blocks[b], &scaled, scan + 16 * place);
+        nonzero[place] = static_cast<uint16_t>(levels);
+        result |= (levels & 0x10000) << place;
         store_32(coefs + 16 * place, scaled);
     }
-    return (coded & 3) | (coded >> 2) << 4;
+    return result;
 }
 
 // First block in decoding order of block row r of a 16x16 block (Figure 6-10); its neighbours to
@@ -271,7 +275,8 @@ __m256i two_rows_of_8(const uint8_t* p, ptrdiff_t stride) {
     columns_to_blocks(v, blocks);
     for (unsigned rest = coded; rest != 0; rest &= rest - 1) {
         const int b = __builtin_ctz(rest);
-        nonzero[b] = quantizer.quantize(blocks[b], scaled + b, scan + 16 * b);
+        nonzero[b] =
+            static_cast<uint16_t>(quantizer.quantize(blocks[b], scaled + b, scan + 16 * b));
     }
     blocks_to_columns(scaled, v);
 }
@@ -289,8 +294,7 @@ __m256i constant_residual(__m256i constants) {
         _mm256_add_epi16(_mm256_shuffle_epi8(constants, to_all), _mm256_set1_epi16(32)), 6);
 }
 
-uint32_t code_chroma(const Chroma& macroblock) {
-    const Chroma chroma = macroblock;  // a copy, which no store can change
+uint32_t code_chroma(const Chroma& chroma) {
     const Quantizer& quantizer = *chroma.quantizer;
     __m256i v[2][4];  // of each component what code_four has
     uint32_t ac_mask = 0;
@@ -329,7 +333,7 @@ uint32_t code_chroma(const Chroma& macroblock) {
                       chroma.nonzero + 4 * c);
         v[c][0] = _mm256_or_si256(v[c][0], constants[c]);
         if (!inverse_four(v[c])) {
-            return scalar_kernels().code_chroma(macroblock);  // nothing is stored at dst yet
+            return scalar_kernels().code_chroma(chroma);  // nothing is stored at dst yet
         }
     }
     for (int c = 0; c < 2; ++c) {

@@ -119,17 +119,22 @@ __m512i without_constants(__m512i first_column) {
 }
 
 // Quantises eight blocks in columns, which become scaled levels, and stores the levels of those
-// that have any, with coefs their scaled ones too. Returns the mask of those. The blocks in the
-// second lane are number step and step + 1, those in the third 6 - step and 7 - step.
+// that have any, with coefs their scaled ones too. Returns the mask of those and, from bit 16 on,
+// of those with a level beyond 1. The blocks in the second lane are number step and step + 1, those
+// in the third 6 - step and 7 - step.
 [[gnu::always_inline]] inline uint32_t quantize_eight(__m512i* v, const Quantizer& quantizer,
                                                       int step, int16_t* coefs, int16_t* scan,
                                                       uint16_t* nonzero) {
     __m512i levels[4];
+    __m512i magnitudes = _mm512_setzero_si512();
     for (int j = 0; j < 4; ++j) {
         levels[j] = quantize(v[j], quantizer, j);
+        magnitudes = _mm512_or_si512(magnitudes, _mm512_abs_epi16(levels[j]));
         v[j] = _mm512_mullo_epi16(levels[j], column(quantizer.dequant, j));
     }
-    uint32_t coded = 0;
+    const uint32_t large = _mm512_test_epi64_mask(magnitudes, _mm512_set1_epi16(~1));
+    uint32_t coded = ((large & 0xc3) | (large >> 2 & 3) << step | (large >> 4 & 3) << (6 - step))
+                     << 16;
     const auto store_block = [&](int b, uint32_t mask, __m256i block_coefs, __m256i block_scan) {
         if (mask != 0) {
             nonzero[b] = static_cast<uint16_t>(mask);
@@ -165,9 +170,9 @@ __m512i without_constants(__m512i first_column) {
     return coded;
 }
 
-// Codes the eight blocks of two block rows from the rows of their residual. Returns the mask of the
-// coded ones. In decoding order (Figure 6-10) the blocks of the upper row, in the low half, are 0,
-// 1, 4, 5, those of the lower one 2, 3, 6, 7.
+// Codes the eight blocks of two block rows from the rows of their residual. Returns what
+// code_residual_16x16 does. In decoding order (Figure 6-10) the blocks of the upper row, in the low
+// half, are 0, 1, 4, 5, those of the lower one 2, 3, 6, 7.
 uint32_t code_eight(__m512i* v, const Quantizer& quantizer, int16_t* dc, int16_t* coefs,
                     int16_t* scan, uint16_t* nonzero) {
     transform_eight(v);
@@ -227,8 +232,7 @@ __m512i two_rows_of_8(const uint8_t* u, const uint8_t* v, ptrdiff_t stride) {
                                      _mm_unpacklo_epi64(load_8(v), load_8(v + 4 * stride))));
 }
 
-uint32_t code_chroma(const Chroma& macroblock) {
-    const Chroma chroma = macroblock;  // a copy, which no store can change
+uint32_t code_chroma(const Chroma& chroma) {
     const Quantizer& quantizer = *chroma.quantizer;
     __m512i v[4];
     for (int y = 0; y < 4; ++y) {
@@ -246,10 +250,10 @@ uint32_t code_chroma(const Chroma& macroblock) {
     const __m512i constants = _mm512_maskz_mov_epi16(0x11111111, _mm512_cvtepi32_epi64(dc));
     uint32_t ac_mask = 0;
     if (ac) {
-        ac_mask = quantize_eight(v, quantizer, 2, nullptr, chroma.scan, chroma.nonzero);
+        ac_mask = quantize_eight(v, quantizer, 2, nullptr, chroma.scan, chroma.nonzero) & 0xff;
         v[0] = _mm512_or_si512(v[0], constants);
         if (!inverse_eight(v)) {
-            return scalar_kernels().code_chroma(macroblock);  // nothing is stored at dst yet
+            return scalar_kernels().code_chroma(chroma);  // nothing is stored at dst yet
         }
     } else if (dc_mask != 0) {
         const __m512i all = _mm512_shuffle_epi8(

@@ -56,9 +56,10 @@ constexpr int block_y(int k) {
 }
 
 // Levels of a block in scan and their mask in nonzero, and the coefficients replaced by what the
-// levels stand for; returns whether there is a level other than 0.
-bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
+// levels stand for; returns the largest magnitude of a level.
+int quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_t* nonzero) {
     unsigned mask = 0;
+    int largest = 0;
     for (int n = 0; n < 16; ++n) {
         const int position = kZigzag[n];
         const int c = coefs[position];
@@ -69,9 +70,10 @@ bool quantize(int16_t* coefs, const Quantizer& quantizer, int16_t* scan, uint16_
         scan[n] = static_cast<int16_t>(level);
         coefs[position] = static_cast<int16_t>(level * quantizer.dequant[position]);
         mask |= (level != 0 ? 1u : 0u) << n;
+        largest = std::max(largest, magnitude);
     }
     *nonzero = static_cast<uint16_t>(mask);
-    return mask != 0;
+    return largest;
 }
 
 // The blocks of a prediction whose rows are pred_stride samples long.
@@ -88,8 +90,9 @@ uint32_t code_residual(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred
             dc[k] = block[0];
             block[0] = 0;
         }
-        if (quantize(block, quantizer, levels, nonzero + k)) {
-            coded |= 1u << k;
+        const int largest = quantize(block, quantizer, levels, nonzero + k);
+        if (largest > 0) {
+            coded |= (largest > 1 ? 0x10001u : 1u) << k;
             std::copy(levels, levels + 16, scan + 16 * k);
             std::copy(block, block + 16, coefs + 16 * k);
         } else if (dc) {
@@ -102,7 +105,7 @@ uint32_t code_residual(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred
 uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred,
                            const Quantizer& quantizer, int16_t* coefs, int16_t* scan,
                            uint16_t* nonzero) {
-    return code_residual<1, 4>(src, stride, pred, quantizer, nullptr, coefs, scan, nonzero);
+    return code_residual<1, 4>(src, stride, pred, quantizer, nullptr, coefs, scan, nonzero) & 1;
 }
 
 // The 4x4 Hadamard transform of clause 8.5.10, in place.
@@ -208,8 +211,8 @@ uint32_t code_chroma(const Chroma& chroma) {
         const uint8_t* pred = chroma.pred + 64 * c;
         int16_t dc[4], coefs[64];
         const uint32_t ac_mask =
-            code_residual<4, 8>(chroma.src[c], chroma.src_stride, pred, *chroma.quantizer, dc,
-                                coefs, chroma.scan + 64 * c, chroma.nonzero + 4 * c);
+            0xf & code_residual<4, 8>(chroma.src[c], chroma.src_stride, pred, *chroma.quantizer, dc,
+                                      coefs, chroma.scan + 64 * c, chroma.nonzero + 4 * c);
         const uint32_t levels = code_chroma_dc(dc, *chroma.quantizer, chroma.dc + 4 * c, coefs);
         reconstruct_blocks(4, coefs, 0xf, pred, 8, chroma.dst[c], chroma.dst_stride);
         coded |= (ac_mask | levels << 8) << (4 * c);

@@ -86,8 +86,9 @@ uint32_t nonzero_16(__m128i a, __m128i b) {
     return ~static_cast<uint32_t>(_mm_movemask_epi8(zeros)) & 0xffff;
 }
 
-// Quantises a block that has a coefficient beyond the dead zone; returns the mask of its levels.
-uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int16_t* coefs,
+// Quantises a block that has a coefficient beyond the dead zone; returns the mask of its levels,
+// and in bit 16 whether one of them is beyond 1.
+uint32_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int16_t* coefs,
                         int16_t* scan) {
     const __m128i rounding = _mm_set1_epi32(quantizer.rounding);
     const __m128i shift = _mm_cvtsi32_si128(quantizer.shift);
@@ -103,7 +104,10 @@ uint16_t quantize_block(__m128i c0, __m128i c1, const Quantizer& quantizer, int1
     for (int n = 0; n < 16; ++n) {
         scan[n] = levels[kZigzag[n]];
     }
-    return static_cast<uint16_t>(nonzero_16(load(scan), load(scan + 8)));
+    const __m128i one = _mm_set1_epi16(1);
+    const __m128i large = _mm_or_si128(_mm_cmpgt_epi16(absolute_16(level0), one),
+                                       _mm_cmpgt_epi16(absolute_16(level1), one));
+    return nonzero_16(load(scan), load(scan + 8)) | (_mm_movemask_epi8(large) != 0 ? 0x10000u : 0);
 }
 
 uint32_t code_luma_dc(const int16_t* dc, const Quantizer& quantizer, int16_t* coefs,
@@ -172,8 +176,8 @@ void clear_block(int16_t* block) {
     store(block + 8, _mm_setzero_si128());
 }
 
-// Codes two blocks side by side; dc, coefs, scan and nonzero are those of the first. Returns the
-// mask of the coded ones.
+// Codes two blocks side by side; dc, coefs, scan and nonzero are those of the first. Returns what
+// code_residual_16x16 does.
 uint32_t code_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptrdiff_t pred_stride,
                   const Quantizer& quantizer, int16_t* dc, int16_t* coefs, int16_t* scan,
                   uint16_t* nonzero) {
@@ -195,9 +199,10 @@ uint32_t code_two(const uint8_t* src, ptrdiff_t stride, const uint8_t* pred, ptr
     uint32_t coded = 0;
     for (int b = 0; b < 2; ++b) {
         if (leaves_dead_zone(blocks[b][0], blocks[b][1], quantizer)) {
-            coded |= 1u << b;
-            nonzero[b] = quantize_block(blocks[b][0], blocks[b][1], quantizer, coefs + 16 * b,
-                                        scan + 16 * b);
+            const uint32_t levels = quantize_block(blocks[b][0], blocks[b][1], quantizer,
+                                                   coefs + 16 * b, scan + 16 * b);
+            nonzero[b] = static_cast<uint16_t>(levels);
+            coded |= ((levels & 0x10000) | 1) << b;
         } else {
             nonzero[b] = 0;
             if (dc) {
@@ -236,7 +241,7 @@ uint32_t code_residual_4x4(const uint8_t* src, ptrdiff_t stride, const uint8_t* 
         *nonzero = 0;
         return 0;
     }
-    *nonzero = quantize_block(c0, c1, quantizer, coefs, scan);
+    *nonzero = static_cast<uint16_t>(quantize_block(c0, c1, quantizer, coefs, scan));
     return 1;
 }
 
@@ -334,10 +339,11 @@ uint32_t code_chroma(const Chroma& chroma) {
         int16_t dc[4];
         uint32_t ac_mask = 0;
         for (int n = 0; n < 4; n += 2) {
-            ac_mask |= code_two(chroma.src[c] + 2 * n * chroma.src_stride, chroma.src_stride,
-                                pred + 16 * n, 8, quantizer, dc + n, coefs + 16 * n,
-                                chroma.scan + 64 * c + 16 * n, chroma.nonzero + 4 * c + n)
-                       << n;
+            const uint32_t two =
+                code_two(chroma.src[c] + 2 * n * chroma.src_stride, chroma.src_stride,
+                         pred + 16 * n, 8, quantizer, dc + n, coefs + 16 * n,
+                         chroma.scan + 64 * c + 16 * n, chroma.nonzero + 4 * c + n);
+            ac_mask |= (two & 3) << n;
         }
         const uint32_t levels = code_chroma_dc(dc, quantizer, chroma.dc + 4 * c, coefs);
         const uint32_t mask = levels != 0 ? 0xf : ac_mask;

@@ -165,10 +165,12 @@ std::uint32_t stand_in_residual(const std::uint8_t*, std::ptrdiff_t, const std::
     for (int b = 0; b < 16; ++b) {
         std::copy(stand_in_levels[b], stand_in_levels[b] + 16, scan + 16 * b);
         nonzero[b] = 0;
+        bool large = false;
         for (int n = 0; n < 16; ++n) {
             nonzero[b] = static_cast<std::uint16_t>(nonzero[b] | (scan[16 * b + n] != 0) << n);
+            large = large || std::abs(scan[16 * b + n]) > 1;
         }
-        mask |= (nonzero[b] != 0 ? 1u : 0u) << b;
+        mask |= (nonzero[b] == 0 ? 0u : large ? 0x10001u : 1u) << b;
     }
     return mask;
 }

@@ -263,9 +263,10 @@ TEST(VisitStamps, GoRound) {
     for (int n = 0; n < sequence.pictures; ++n) {
         CEncoder& engine = around.engine();
         if (n == 2) {
-            engine.rows.coders[0]->g_visit_stamp = 0xffffffff;
+            engine.rows.coders[0]->g_visit_stamp = 0xff;
             const std::size_t dimension = static_cast<std::size_t>(engine.picture.g_visit_dim);
-            std::fill_n(engine.rows.coders[0]->g_visit_L0.data(), dimension * dimension, 1u);
+            std::fill_n(engine.rows.coders[0]->g_visit_L0.data(), dimension * dimension,
+                        std::uint8_t{1});
         }
         sequence.draw(n, picture.data());
         EXPECT_EQ(around.encode(picture.data()), plain.encode(picture.data())) << "picture " << n;
