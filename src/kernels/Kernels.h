@@ -187,10 +187,10 @@ struct Kernels {
     // in decoding order (Figure 6-10), and of one 4x4 block: level = sign(c) * min((|c| * forward +
     // rounding) >> shift, kMaxLevel). Bit b of the result: block b has a level other than 0; bit
     // 16 + b, of the 16 blocks only: it has one other than -1, 0 and 1. Writes such a block's
-    // levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to coefs; of every
-    // block, the mask of the levels that are not 0 to nonzero (bit n: scan position n). With dc,
-    // which takes one value a block, the constant coefficients go there and 0 stands in for them,
-    // and the coefficients of blocks without levels are set to 0.
+    // levels in zig-zag order (clause 8.5.6, frame) to scan and level * dequant to coefs, for a
+    // block without levels zeros or nothing; of every block, the mask of the levels that are not 0
+    // to nonzero (bit n: scan position n). With dc, which takes one value a block, the constant
+    // coefficients go there and 0 stands in for them, and coefs gets the zeros.
     std::uint32_t (*code_residual_16x16)(const std::uint8_t* src, std::ptrdiff_t stride,
                                          const std::uint8_t* pred, const Quantizer& quantizer,
                                          std::int16_t* dc, std::int16_t* coefs, std::int16_t* scan,
@@ -219,8 +219,8 @@ struct Kernels {
 
     // Both chroma components from prediction error to reconstruction (clauses 8.5.4, 8.5.11): AC
     // levels as code_residual_16x16 has them with dc; DC levels are those of the 2x2 transform of
-    // a component's constant coefficients, by the quantiser of code_luma_dc. Writes the levels of
-    // blocks that have any to scan, masks and DC levels always. Bit b of the result: block b has an
+    // a component's constant coefficients, by the quantiser of code_luma_dc. Masks and DC levels
+    // are written always. Bit b of the result: block b has an
     // AC level other than 0; bit 8 + n: DC level n is not 0.
     std::uint32_t (*code_chroma)(const Chroma& chroma);
 

@@ -118,31 +118,25 @@ __m512i without_constants(__m512i first_column) {
     return beyond != 0;
 }
 
-// Quantises eight blocks in columns, which become scaled levels, and stores the levels of those
-// that have any, with coefs their scaled ones too. Returns the mask of those and, from bit 16 on,
-// of those with a level beyond 1. The blocks in the second lane are number step and step + 1, those
-// in the third 6 - step and 7 - step.
+// Quantises eight blocks in columns, which become scaled levels, and stores the levels, with coefs
+// the scaled ones too: those of blocks that have none as well, since nobody can predict which ones
+// these are. Returns what code_residual_16x16 does. The blocks in the second lane are number step
+// and step + 1, those in the third 6 - step and 7 - step.
 [[gnu::always_inline]] inline uint32_t quantize_eight(__m512i* v, const Quantizer& quantizer,
                                                       int step, int16_t* coefs, int16_t* scan,
                                                       uint16_t* nonzero) {
     __m512i levels[4];
-    __m512i magnitudes = _mm512_setzero_si512();
+    __m512i all = _mm512_setzero_si512();  // bits of the magnitudes of a block's levels
     for (int j = 0; j < 4; ++j) {
         levels[j] = quantize(v[j], quantizer, j);
-        magnitudes = _mm512_or_si512(magnitudes, _mm512_abs_epi16(levels[j]));
+        all = _mm512_or_si512(all, _mm512_abs_epi16(levels[j]));
         v[j] = _mm512_mullo_epi16(levels[j], column(quantizer.dequant, j));
     }
-    const uint32_t large = _mm512_test_epi64_mask(magnitudes, _mm512_set1_epi16(~1));
-    uint32_t coded = ((large & 0xc3) | (large >> 2 & 3) << step | (large >> 4 & 3) << (6 - step))
-                     << 16;
     const auto store_block = [&](int b, uint32_t mask, __m256i block_coefs, __m256i block_scan) {
-        if (mask != 0) {
-            nonzero[b] = static_cast<uint16_t>(mask);
-            store_32(scan + 16 * b, block_scan);
-            if (coefs) {
-                store_32(coefs + 16 * b, block_coefs);
-            }
-            coded |= 1u << b;
+        nonzero[b] = static_cast<uint16_t>(mask);
+        store_32(scan + 16 * b, block_scan);
+        if (coefs) {
+            store_32(coefs + 16 * b, block_coefs);
         }
     };
     for (int odd = 0; odd < 2; ++odd) {
@@ -167,7 +161,12 @@ __m512i without_constants(__m512i first_column) {
             store_block(b + 6 - step, mask >> 16, high_half(blocks), high_half(in_order));
         }
     }
-    return coded;
+    const auto by_number = [step](uint32_t by_place) {
+        return (by_place & 0xc3) | (by_place >> 2 & 3) << step | (by_place >> 4 & 3) << (6 - step);
+    };
+    const uint32_t coded = _mm512_test_epi64_mask(all, all);
+    const uint32_t large = _mm512_test_epi64_mask(all, _mm512_set1_epi16(~1));
+    return by_number(coded) | by_number(large) << 16;
 }
 
 // Codes the eight blocks of two block rows from the rows of their residual. Returns what

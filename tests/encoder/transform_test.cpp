@@ -175,6 +175,34 @@ std::uint32_t stand_in_residual(const std::uint8_t*, std::ptrdiff_t, const std::
     return mask;
 }
 
+// A P macroblock with those levels.
+class StandInMacroblock {
+public:
+    StandInMacroblock() {
+        picture_.g_frame = frame_;
+        picture_.g_slp->sliceType = P_SLICE;
+        coder_.setMBOffsets();
+    }
+
+    // The mask of the blocks whose levels are sent.
+    unsigned kept() {
+        coder_.quantTransform_luma_16x16P();
+        return coder_.g_luma_mask;
+    }
+
+private:
+    static Kernels kernels() {
+        Kernels table = zolt::scalar_kernels();
+        table.code_residual_16x16 = stand_in_residual;
+        return table;
+    }
+
+    const Kernels kernels_ = kernels();
+    const std::uint8_t frame_[16 * 16 * 3 / 2] = {};
+    Picture picture_{16, 16, kernels_};
+    MacroblockCoder coder_{picture_};
+};
+
 TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
     struct Level {
         int block, position, level;
@@ -193,22 +221,50 @@ TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
         {{{8, 0, 1}, {8, 1, 1}}, 1u << 8, "the zeros before a level count from the last one"},
         {{{8, 6, 1}, {9, 8, 1}, {12, 15, 1}}, 0, "after six zeros a 1 is free"},
     };
-    Kernels kernels = zolt::scalar_kernels();
-    kernels.code_residual_16x16 = stand_in_residual;
-    const std::uint8_t frame[16 * 16 * 3 / 2] = {};
-    Picture picture(16, 16, kernels);
-    picture.g_frame = frame;
-    MacroblockCoder coder(picture);
-    picture.g_slp->sliceType = P_SLICE;
-    coder.setMBOffsets();
+    StandInMacroblock macroblock;
     for (const auto& c : cases) {
         std::fill(stand_in_levels[0], stand_in_levels[0] + 256, std::int16_t{0});
         for (const Level& l : c.levels) {
             stand_in_levels[l.block][l.position] = static_cast<std::int16_t>(l.level);
         }
-        coder.quantTransform_luma_16x16P();
-        EXPECT_EQ(coder.g_luma_mask, c.kept) << c.why;
+        EXPECT_EQ(macroblock.kept(), c.kept) << c.why;
     }
+}
+
+// Level by level, for few ones anywhere, so that costs are near the limits.
+TEST(CoefficientCost, IsThatOfEveryLevel) {
+    constexpr int kCosts[16] = {3, 2, 2, 1, 1, 1};
+    StandInMacroblock macroblock;
+    Random random(1);
+    int empty = 0, partial = 0;
+    for (int round = 0; round < 20000; ++round) {
+        const int density = random.between(1, 40);
+        unsigned coded = 0, expected = 0;
+        int costs[4] = {};
+        for (int b = 0; b < 16; ++b) {
+            int zeros = 0;
+            for (std::int16_t& level : stand_in_levels[b]) {
+                const bool one = random.between(0, 255) < density;
+                level = static_cast<std::int16_t>(!one ? 0 : random.between(0, 1) ? 1 : -1);
+                costs[b / 4] += one ? kCosts[zeros] : 0;
+                zeros = one ? 0 : zeros + 1;
+                coded |= (one ? 1u : 0u) << b;
+            }
+        }
+        int total = 0;
+        for (int block8x8 = 0; block8x8 < 4; ++block8x8) {
+            if (costs[block8x8] >= 5) {
+                total += costs[block8x8];
+                expected |= 0xfu << (4 * block8x8);
+            }
+        }
+        expected = total >= 6 ? expected & coded : 0;
+        ASSERT_EQ(macroblock.kept(), expected) << "round " << round;
+        empty += expected == 0 ? 1 : 0;
+        partial += expected != 0 && expected != coded ? 1 : 0;
+    }
+    EXPECT_GT(empty, 1000);
+    EXPECT_GT(partial, 1000);
 }
 
 }  // namespace

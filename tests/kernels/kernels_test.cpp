@@ -169,6 +169,28 @@ const zolt::Quantizer& any_quantizer(Random& random) {
     return random.between(0, 1) ? zolt::intra_quantizer(qp) : zolt::inter_quantizer(qp);
 }
 
+// Blocks of levels or coefficients before a kernel that may write zeros to those without levels or
+// leave them as they are.
+class BlocksBefore {
+public:
+    BlocksBefore(std::int16_t* blocks, int count)
+        : m_blocks(blocks), m_before(blocks, blocks + 16 * count) {}
+
+    // Puts back what stood in those without levels, where zeros do now.
+    void restore(std::uint32_t coded) {
+        for (std::size_t b = 0; b < m_before.size() / 16; ++b) {
+            std::int16_t* const block = m_blocks + 16 * b;
+            if ((coded >> b & 1) == 0 && std::count(block, block + 16, 0) == 16) {
+                std::copy_n(m_before.begin() + static_cast<std::ptrdiff_t>(16 * b), 16, block);
+            }
+        }
+    }
+
+private:
+    std::int16_t* m_blocks;
+    std::vector<std::int16_t> m_before;
+};
+
 // A residual kernel on blocks of `size` x `size` samples, in half of the cases with DC values of
 // their own. Predictions near the samples leave some blocks without levels.
 template <auto kernel, int size>
@@ -185,7 +207,12 @@ void run_residual(const Kernels& k, Arena& a, Random random) {
         a.result = (k.*kernel)(src.p, src.stride, pred, q, a.coef(), a.levels(), a.masks());
     } else {
         std::int16_t* const dc = random.between(0, 1) ? a.dc + 1 : nullptr;
+        BlocksBefore coefs(a.coef(), 16), levels(a.levels(), 16);
         a.result = (k.*kernel)(src.p, src.stride, pred, q, dc, a.coef(), a.levels(), a.masks());
+        levels.restore(a.result);
+        if (!dc) {
+            coefs.restore(a.result);
+        }
     }
 }
 
@@ -225,6 +252,7 @@ void run_code_chroma(const Kernels& k, Arena& a, Random random) {
             pred[i] = static_cast<std::uint8_t>(std::clamp(sample + random.between(-4, 4), 0, 255));
         }
     }
+    BlocksBefore levels(a.levels(), 8);
     a.result = k.code_chroma({{src.p, src.p + v},
                               src.stride,
                               a.pred(),
@@ -234,6 +262,7 @@ void run_code_chroma(const Kernels& k, Arena& a, Random random) {
                               a.levels(),
                               a.masks(),
                               a.dc + 1});
+    levels.restore(a.result);
 }
 
 // The filter of an edge between macroblocks of some QP.
