@@ -44,7 +44,7 @@ double formula(double width, double height, int workers) {
     const double maps = 159.0 / 256 * width * height + 4.5 * height;
     const double row_bits = 88 * width;
     const double nal_buffer = 1.54 * width * height + row_bits;
-    const double coder = 128 * 128 * 4 + 2500;
+    const double coder = 128 * 128 + 3800;
     const double converter = 1.5 * width * height;
     return planes + maps + nal_buffer + converter + workers * coder +
            (workers > 1 ? workers * row_bits : 0);

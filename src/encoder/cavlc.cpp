@@ -137,13 +137,17 @@ bool MacroblockCoder::encode_mb_skip() {
 }
 
 inline void MacroblockCoder::encode_I4Modes(BitCursor& out) {
-    for (int k = 0; k < 16; ++k) {
-        out.reserve(4);
-        if (g_prev_intra4x4_pred_mode_flag[k]) {
-            out.put(1, 1);
-        } else {
-            out.put(g_rem_intra4x4_pred_mode[k], 4);  // a flag of 0 and three bits
+    for (int k = 0; k < 16; k += 8) {
+        std::uint64_t eight = 0;
+        unsigned length = 0;
+        for (int n = k; n < k + 8; ++n) {
+            const bool predicted = g_prev_intra4x4_pred_mode_flag[n] != 0;
+            const unsigned size = predicted ? 1 : 4;  // a flag of 1, or of 0 and three bits
+            eight = eight << size | (predicted ? 1u : g_rem_intra4x4_pred_mode[n]);
+            length += size;
         }
+        out.reserve(length);
+        out.put(eight, length);
     }
 }
 

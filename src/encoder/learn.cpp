@@ -196,19 +196,20 @@ public:
 
     double mean_cost() const { return static_cast<double>(sum()) / number(); }
 
-    // Whether a candidate's cost passes the test, or one's that was dropped.
-    template <typename Test>
-    bool any(Test test) const {
-        return static_cast<int>(test(m_cost[0])) + static_cast<int>(test(m_cost[1])) +
-                   static_cast<int>(test(m_cost[2])) + static_cast<int>(test(m_cost[3])) !=
-               0;
+    // Whether factor times a candidate's cost equals the value, or one's that was dropped.
+    bool any_equals(int factor, int value) const {
+        int equal = 0;
+        for (int mode = 0; mode < kModes; ++mode) {
+            equal |= factor * m_cost[mode] == value ? 1 : 0;
+        }
+        return equal != 0;
     }
 
-    template <typename Test>
-    void drop(Test is_too_high) {
+    // Drops those of which factor times the cost exceeds the limit.
+    void drop_above(int factor, int limit) {
         for (int mode = 0; mode < kModes; ++mode) {
             m_before[mode] = m_enabled[mode];
-            m_enabled[mode] &= is_too_high(m_cost[mode]) ? 0 : -1;
+            m_enabled[mode] &= factor * m_cost[mode] > limit ? 0 : -1;
         }
     }
 
@@ -278,7 +279,7 @@ int MacroblockCoder::learn16_mode() {
         candidates.add(distortion[step]);
         const int limit = thresh_16[step] * candidates.sum();
         const int factor = 4 * candidates.number();
-        candidates.drop([=](int cost) { return factor * cost >= limit; });
+        candidates.drop_above(factor, limit - 1);
         if (candidates.number() < 2) {
             break;
         }
@@ -305,11 +306,11 @@ int MacroblockCoder::learn_chroma_mode() {
         // A cost exceeds an integer limit when it exceeds the real one that was rounded down.
         const int number = 5 * candidates.number();
         const int product = static_cast<int>(5 * thresh_chroma[step]) * candidates.sum();
-        if (product >= 0 && !candidates.any([=](int cost) { return number * cost == product; })) {
-            candidates.drop([=](int cost) { return number * cost > product; });
+        if (product >= 0 && !candidates.any_equals(number, product)) {
+            candidates.drop_above(number, product);
         } else {
-            const int limit = static_cast<int>(thresh_chroma[step] * candidates.mean_cost());
-            candidates.drop([limit](int cost) { return cost > limit; });
+            candidates.drop_above(1,
+                                  static_cast<int>(thresh_chroma[step] * candidates.mean_cost()));
         }
         // A single one wins, whether it would be dropped later or not.
         if (candidates.number() < 2) {
