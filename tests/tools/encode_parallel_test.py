@@ -161,9 +161,9 @@ class ParallelFailures(ParallelTest):
         zoltenc = self.logged_zoltenc('[ "$skip" != 30 ] || [ -e "$folder/bin/go" ] || sleep 4')
         with subprocess.Popen(self.command(*self.arguments, zoltenc=zoltenc), cwd=self.folder,
                               stderr=subprocess.PIPE, start_new_session=True) as process:
-            parts = self.folder / "out.264.parts"
+            parts = [self.folder / "out.264.parts" / f"0000{piece}.264" for piece in range(3)]
             deadline = time.monotonic() + 60
-            while not (parts / "00002.264").exists() or 30 not in self.runs():
+            while not all(part.exists() for part in parts) or 30 not in self.runs():
                 self.assertLess(time.monotonic(), deadline)
                 time.sleep(0.02)
             end(process.pid)
