@@ -14,9 +14,10 @@ class TempDir {
 public:
     TempDir() {
         static std::atomic<int> count{0};
-        root = std::filesystem::temp_directory_path() /
-               ("zolt-support-" + std::to_string(getpid()) + "-" + std::to_string(count++));
-        std::filesystem::create_directory(root);
+        do {  // until there is none of an earlier process of that number
+            root = std::filesystem::temp_directory_path() /
+                   ("zolt-support-" + std::to_string(getpid()) + "-" + std::to_string(count++));
+        } while (!std::filesystem::create_directory(root));
     }
     ~TempDir() {
         std::error_code ignored;
