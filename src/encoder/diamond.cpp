@@ -146,7 +146,7 @@ private:
     bool walk_spiral();
     bool walk_diamond();
     // Rate of a vector in quarter pels.
-    int rate(int x, int y) const { return m_lambda * (m_rates_x[x] + m_rates_y[y]); }
+    int rate_of(int x, int y) const { return m_lambda * (m_rates_x[x] + m_rates_y[y]); }
     // The SAD of phases 0 and 1 that a candidate with this rate must stay below. Acceptance of
     // another one can only lower it.
     int first_phases_limit(int rate) const { return m_thresholds[1] - second_share(rate); }
@@ -161,7 +161,7 @@ private:
 
         Fractions(const MotionSearch& search, const Vector* directions, int x, int y, int step) {
             for (int n = 0; n < kFractions; ++n) {
-                rates[n] = search.rate(x + step * directions[n].x, y + step * directions[n].y);
+                rates[n] = search.rate_of(x + step * directions[n].x, y + step * directions[n].y);
                 limits[n] = search.first_phases_limit(rates[n]);
             }
         }
@@ -406,8 +406,8 @@ bool MotionSearch::try_zero() {
     *m_visited = m_coder.g_visit_stamp;
     int sums[4];
     m_kernels.phase_sads(m_block, m_ref, m_stride, sums);
-    const int zero_rate = rate(0, 0);
-    return accept(sums, zero_rate, 2 * (sums[0] + first_share(zero_rate))) && m_best_sad < kGoodSad;
+    const int rate = rate_of(0, 0);
+    return accept(sums, rate, 2 * (sums[0] + first_share(rate))) && m_best_sad < kGoodSad;
 }
 
 // Evaluates up to kGroup vectors in order, without those that this search has already evaluated.
@@ -432,7 +432,7 @@ bool MotionSearch::try_vectors(const Vector* vectors, int count) {
     int rates[kGroup];
     std::int32_t limits[kGroup] = {};
     for (int i = 0; i < n; ++i) {
-        rates[i] = rate(4 * fresh[i].x, 4 * fresh[i].y);
+        rates[i] = rate_of(4 * fresh[i].x, 4 * fresh[i].y);
         limits[i] = first_phases_limit(rates[i]);
     }
     unsigned passed = 1;
@@ -464,10 +464,10 @@ void MotionSearch::half_stage() {
     unsigned passed = m_kernels.first_phases_below_half(m_block, at, m_stride, candidates.limits);
     for (; passed != 0; passed &= passed - 1) {
         const int n = zolt::lowest_bit(passed);
-        const int candidate_rate = candidates.rates[n];
+        const int rate = candidates.rates[n];
         int sums[4];
         m_kernels.phase_sads(m_block, refs[n], m_stride, sums);
-        if (accept(sums, candidate_rate, 2 * (sums[0] + first_share(candidate_rate)))) {
+        if (accept(sums, rate, 2 * (sums[0] + first_share(rate)))) {
             m_fraction = {2 * kHalfCandidates[n].x, 2 * kHalfCandidates[n].y};
             if (m_best_sad < kGoodSad) {
                 return;
@@ -500,10 +500,10 @@ void MotionSearch::quarter_stage() {
         const bool diagonal = cross && n >= 4;
         const std::uint8_t* a = diagonal ? refs[zolt::kCrossPairs[n - 4][0]] : centre;
         const std::uint8_t* b = refs[diagonal ? zolt::kCrossPairs[n - 4][1] : n];
-        const int candidate_rate = candidates.rates[n];
+        const int rate = candidates.rates[n];
         int sums[4];
         m_kernels.phase_sads_average(m_block, a, b, m_stride, sums);
-        if (accept(sums, candidate_rate, (5 * (sums[0] + first_share(candidate_rate))) >> 2)) {
+        if (accept(sums, rate, (5 * (sums[0] + first_share(rate))) >> 2)) {
             m_fraction = {half.x + kQuarterCandidates[n].x, half.y + kQuarterCandidates[n].y};
             if (m_best_sad < kGoodSad) {
                 return;

@@ -34,6 +34,7 @@ struct HalfSamples {
 // right, below left, above right and above left.
 inline void half_candidates(const HalfSamples& at, std::ptrdiff_t stride,
                             const std::uint8_t** blocks) {
+    // One by one: from an array they would be written singly and read in pairs, which waits.
     blocks[0] = at.vertical;
     blocks[1] = at.vertical - stride;
     blocks[2] = at.horizontal;
@@ -220,8 +221,8 @@ struct Kernels {
     // Both chroma components from prediction error to reconstruction (clauses 8.5.4, 8.5.11): AC
     // levels as code_residual_16x16 has them with dc; DC levels are those of the 2x2 transform of
     // a component's constant coefficients, by the quantiser of code_luma_dc. Masks and DC levels
-    // are written always. Bit b of the result: block b has an
-    // AC level other than 0; bit 8 + n: DC level n is not 0.
+    // are written always. Bit b of the result: block b has an AC level other than 0; bit 8 + n: DC
+    // level n is not 0.
     std::uint32_t (*code_chroma)(const Chroma& chroma);
 
     // ---- Features and distortions of the intra decisions ----

@@ -233,7 +233,7 @@ TEST(CoefficientCost, DropsCheapBlocksOfInterMacroblocks) {
 
 // Level by level, for few ones anywhere, so that costs are near the limits.
 TEST(CoefficientCost, IsThatOfEveryLevel) {
-    constexpr int kCosts[16] = {3, 2, 2, 1, 1, 1};
+    constexpr int COEFF_COST[16] = {3, 2, 2, 1, 1, 1};
     StandInMacroblock macroblock;
     Random random(1);
     int empty = 0, partial = 0;
@@ -246,7 +246,7 @@ TEST(CoefficientCost, IsThatOfEveryLevel) {
             for (std::int16_t& level : stand_in_levels[b]) {
                 const bool one = random.between(0, 255) < density;
                 level = static_cast<std::int16_t>(!one ? 0 : random.between(0, 1) ? 1 : -1);
-                costs[b / 4] += one ? kCosts[zeros] : 0;
+                costs[b / 4] += one ? COEFF_COST[zeros] : 0;
                 zeros = one ? 0 : zeros + 1;
                 coded |= (one ? 1u : 0u) << b;
             }
